@@ -1,0 +1,25 @@
+# The log service that __dlog_print comes from: the target device-log. The device's dlog where the
+# build finds it or is told where it is, the workstation's stand-in otherwise.
+
+set(QEL_DLOG_LIBRARY "" CACHE FILEPATH "The device's dlog library (empty: look for it)")
+
+set(_dlog "${QEL_DLOG_LIBRARY}")
+if(_dlog AND NOT EXISTS "${_dlog}")
+  message(FATAL_ERROR "QEL_DLOG_LIBRARY names ${_dlog}, which does not exist.")
+endif()
+if(NOT _dlog)
+  find_library(_dlog_found NAMES dlog NO_CACHE)
+  if(_dlog_found)
+    set(_dlog "${_dlog_found}")
+  endif()
+endif()
+
+if(_dlog)
+  add_library(device-log SHARED IMPORTED)
+  set_target_properties(device-log PROPERTIES IMPORTED_LOCATION "${_dlog}")
+  set(QEL_DLOG_USED "${_dlog}")
+else()
+  add_subdirectory(platform/dlog)
+  add_library(device-log ALIAS dlog-standin)
+  set(QEL_DLOG_USED "workstation stand-in (platform/dlog)")
+endif()

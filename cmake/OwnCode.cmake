@@ -1,0 +1,34 @@
+# What every piece of our own code is built with.
+
+set(CMAKE_C_STANDARD 99)
+set(CMAKE_CXX_STANDARD 17)
+set(CMAKE_C_STANDARD_REQUIRED ON)
+set(CMAKE_CXX_STANDARD_REQUIRED ON)
+set(CMAKE_EXPORT_COMPILE_COMMANDS ON)
+
+if(NOT CMAKE_BUILD_TYPE AND NOT CMAKE_CONFIGURATION_TYPES)
+  set(CMAKE_BUILD_TYPE Release CACHE STRING "Debug or Release" FORCE)
+endif()
+
+# The setters' assertions are part of the interface, so no build type may compile them out.
+foreach(language C CXX)
+  foreach(type RELEASE RELWITHDEBINFO MINSIZEREL)
+    string(REGEX REPLACE "(^| )[-/]DNDEBUG($| )" " " CMAKE_${language}_FLAGS_${type}
+      "${CMAKE_${language}_FLAGS_${type}}")
+  endforeach()
+endforeach()
+
+option(QEL_SANITIZE "Build with AddressSanitizer and UndefinedBehaviorSanitizer" OFF)
+if(QEL_SANITIZE)
+  add_compile_options(-fsanitize=address,undefined -fno-sanitize-recover=all -fno-omit-frame-pointer)
+  add_link_options(-fsanitize=address,undefined)
+endif()
+
+# Aborts name files as they lie in the tree, wherever the build folder is: generated ones as if
+# beside their sources. The last map that fits wins.
+add_compile_options(
+  "-fmacro-prefix-map=${PROJECT_SOURCE_DIR}/="
+  "-fmacro-prefix-map=${PROJECT_BINARY_DIR}/=")
+
+add_library(qel-own-code INTERFACE)
+target_compile_options(qel-own-code INTERFACE -Wall -Wextra -Wconversion -Werror)

@@ -1,0 +1,56 @@
+# Protocol Buffers, 2.6 series: the target protobuf26 (headers and shared library) and the compiler
+# of the schema, QEL_PROTOC. ./dev setup builds one in .deps; an existing installation, a device
+# SDK's for example, is used where QEL_PROTOBUF_ROOT names it. When cross-compiling QEL_PROTOC names
+# a compiler that runs on this machine.
+
+set(QEL_PROTOBUF_ROOT "" CACHE PATH "Installation of Protocol Buffers 2.6 (empty: the one of ./dev setup)")
+set(QEL_PROTOC "" CACHE FILEPATH "Compiler of the schema (empty: the installation's)")
+
+set(_root "${QEL_PROTOBUF_ROOT}")
+if(NOT _root)
+  set(_root "${PROJECT_SOURCE_DIR}/.deps/protobuf-2.6.1")
+endif()
+set(_protoc "${QEL_PROTOC}")
+if(NOT _protoc)
+  set(_protoc "${_root}/bin/protoc")
+endif()
+
+set(_version_header "${_root}/include/google/protobuf/stubs/common.h")
+if(NOT EXISTS "${_version_header}")
+  message(FATAL_ERROR "No Protocol Buffers 2.6 in ${_root}: run './dev setup', or let QEL_PROTOBUF_ROOT name an installation.")
+endif()
+file(STRINGS "${_version_header}" _line REGEX "#define GOOGLE_PROTOBUF_VERSION [0-9]+")
+string(REGEX MATCH "[0-9]+$" _number "${_line}")
+math(EXPR _major "${_number} / 1000000")
+math(EXPR _minor "${_number} / 1000 % 1000")
+math(EXPR _patch "${_number} % 1000")
+set(QEL_PROTOBUF_VERSION "${_major}.${_minor}.${_patch}")
+if(NOT "${_major}.${_minor}" STREQUAL "2.6")
+  message(FATAL_ERROR "This library needs Protocol Buffers 2.6, but ${_root} has ${QEL_PROTOBUF_VERSION}.")
+endif()
+
+execute_process(COMMAND "${_protoc}" --version
+  OUTPUT_VARIABLE _line ERROR_QUIET RESULT_VARIABLE _status OUTPUT_STRIP_TRAILING_WHITESPACE)
+if(NOT _status EQUAL 0)
+  message(FATAL_ERROR "The schema's compiler ${_protoc} does not run here: let QEL_PROTOC name a protoc 2.6 of this machine.")
+endif()
+string(REGEX MATCH "[0-9.]+$" _protoc_version "${_line}")
+if(NOT _protoc_version MATCHES "^2\\.6\\.")
+  message(FATAL_ERROR "This library needs the compiler of Protocol Buffers 2.6, but ${_protoc} is of ${_protoc_version}.")
+endif()
+set(QEL_PROTOC_COMMAND "${_protoc}")
+
+# Multiarch folders too: that is where a device SDK's sysroot keeps it.
+find_library(QEL_PROTOBUF_LIBRARY NAMES libprotobuf.so
+  HINTS "${_root}" PATH_SUFFIXES lib "lib/${CMAKE_LIBRARY_ARCHITECTURE}"
+  NO_DEFAULT_PATH NO_CACHE NO_CMAKE_FIND_ROOT_PATH)
+if(NOT QEL_PROTOBUF_LIBRARY)
+  message(FATAL_ERROR "No libprotobuf.so in ${_root}/lib: the runtime is linked dynamically, because other modules share its descriptor pool.")
+endif()
+
+find_package(Threads REQUIRED)
+add_library(protobuf26 SHARED IMPORTED)
+set_target_properties(protobuf26 PROPERTIES
+  IMPORTED_LOCATION "${QEL_PROTOBUF_LIBRARY}"
+  INTERFACE_INCLUDE_DIRECTORIES "${_root}/include"
+  INTERFACE_LINK_LIBRARIES Threads::Threads)

@@ -1,0 +1,55 @@
+#!/usr/bin/env bash
+# Lets the example's plug-in talk to its front end. Exits with 0 only if both ends are content.
+#
+#   run_demo.sh FOLDER [--no-log] [--port PORT] [--access-token TEXT]
+#
+# FOLDER holds the two programs. --no-log silences the library's log lines.
+set -u
+
+usage() {
+  echo 'usage: run_demo.sh FOLDER [--no-log] [--port PORT] [--access-token TEXT]' >&2
+  exit 2
+}
+
+[ $# -ge 1 ] || usage
+programs=$1
+shift
+front_end_options=()
+plugin_options=()
+while [ $# -gt 0 ]; do
+  case $1 in
+    --no-log) export DLOG_STANDIN_PRIORITY=S && shift ;;
+    --port) front_end_options+=("$1" "${2?--port takes a number}") && shift 2 ;;
+    --access-token) plugin_options+=("$1" "${2?--access-token takes a text}") && shift 2 ;;
+    *) usage ;;
+  esac
+done
+
+scratch=$(mktemp -d)
+front_end=
+cleanup() {
+  [ -z "$front_end" ] || kill "$front_end" 2>/dev/null
+  rm -rf "$scratch"
+}
+trap cleanup EXIT
+
+"$programs/front_end" "${front_end_options[@]}" --port-file "$scratch/port" &
+front_end=$!
+while [ ! -e "$scratch/port" ]; do
+  if ! kill -0 "$front_end" 2>/dev/null; then
+    front_end=
+    echo 'demo: the front end did not start' >&2
+    exit 1
+  fi
+  sleep 0.05
+done
+
+"$programs/plugin_session" "$(cat "$scratch/port")" "${plugin_options[@]}"
+plugin_status=$?
+wait "$front_end"
+front_end_status=$?
+front_end=
+if [ "$plugin_status" -ne 0 ] || [ "$front_end_status" -ne 0 ]; then
+  echo "demo: failed (plug-in $plugin_status, front end $front_end_status)" >&2
+  exit 1
+fi

@@ -1,0 +1,77 @@
+// What the exported functions share: the end of every serializer, the beginning of every
+// deserializer, and the copies that hand text to the caller. Limits, NULL tests and range tests
+// differ from function to function and stand in their bodies.
+#ifndef QEL_CALL_FRAME_H
+#define QEL_CALL_FRAME_H
+
+#include <google/protobuf/io/coded_stream.h>
+#include <google/protobuf/message_lite.h>
+#include <stdlib.h>
+#include <string.h>
+
+#include <string>
+
+#include "log-line.h"
+#include "msgspec_frontend.pb.h"
+
+namespace {
+
+using google::protobuf::MessageLite;
+using google::protobuf::io::CodedInputStream;
+
+// Hands the message's encoding to the caller, who frees it. What the outputs hold after a failure
+// is part of the interface: the length is stored before it is checked, and so is the buffer.
+int encode(const MessageLite& message, unsigned char** serialized_data, int* size,
+           CallSite site = here()) {
+  *size = message.ByteSize();
+  if (*size < 1) {
+    QEL_LOG(kLogError, site, "Invalid serialized data size : %d", *size);
+    return -1;
+  }
+  *serialized_data = static_cast<unsigned char*>(calloc(static_cast<size_t>(*size), 1));
+  if (*serialized_data == nullptr) {
+    QEL_LOG(kLogError, site, "Could not allocate memory for serialized data");
+    return -1;
+  }
+  message.SerializeWithCachedSizesToArray(*serialized_data);
+  QEL_LOG(kLogDebug, site, "%s: exit", site.function);
+  return 0;
+}
+
+// Fills the message from the received bytes. Returns the input stream, or nullptr after a failure.
+//
+// The stream is on the heap and stays allocated, by contract: only the functions that say so in the
+// public header delete it, and only after a success.
+const CodedInputStream* parse(const unsigned char* data, int size, MessageLite* message,
+                              CallSite site = here()) {
+  auto* stream = new CodedInputStream(data, size);
+  const bool parsed = message->ParseFromCodedStream(stream);
+  if (!parsed) {
+    QEL_LOG(kLogError, site, "merge error : Could not parse the received data!");
+  }
+  // Tested even so: a parse can fail at a clean end, and succeed short of one.
+  if (!stream->ConsumedEntireMessage()) {
+    QEL_LOG(kLogError, site, "ConsumedEntireMessage error :Could not parse the received data");
+    return nullptr;
+  }
+  return parsed ? stream : nullptr;
+}
+
+// A copy that the caller frees.
+char* copy_text(const std::string& text) {
+  return strdup(text.c_str());
+}
+
+// A reply's outcome, as far as the caller asks for it.
+void copy_result(const Result& result, int* resultCode, char** resultMsg) {
+  if (resultCode != nullptr) {
+    *resultCode = result.code();
+  }
+  if (resultMsg != nullptr && result.has_msg()) {
+    *resultMsg = copy_text(result.msg());
+  }
+}
+
+}  // namespace
+
+#endif

@@ -1,0 +1,51 @@
+// The log line: one shape for every line of the module.
+#ifndef QEL_LOG_LINE_H
+#define QEL_LOG_LINE_H
+
+#include <sys/syscall.h>
+#include <unistd.h>
+
+// The device's log service.
+extern "C" int __dlog_print(int log_id, int priority, const char* tag, const char* format, ...)
+    __attribute__((format(printf, 4, 5)));
+
+namespace {
+
+// Where a line says that it was logged: the exported function, and the line in the module of the
+// step concerned.
+struct CallSite {
+  const char* function;
+  int line;
+};
+
+// The caller's own place. As a default argument: the place of the call that leaves it out.
+constexpr CallSite here(const char* function = __builtin_FUNCTION(), int line = __builtin_LINE()) {
+  return {function, line};
+}
+
+// Asked of the kernel for each line: a cached id would be wrong in a forked process.
+inline int thread_id() {
+  return static_cast<int>(syscall(SYS_gettid));
+}
+
+constexpr int kMainLogBuffer = 0;
+
+// A level's dlog priority; its colour is bound to it.
+enum LogPriority { kLogDebug = 3, kLogInfo = 4, kLogWarn = 5, kLogError = 6 };
+
+}  // namespace
+
+#define QEL_COLOUR_kLogDebug "\033[32m"
+#define QEL_COLOUR_kLogInfo "\033[34m"
+#define QEL_COLOUR_kLogWarn "\033[33m"
+#define QEL_COLOUR_kLogError "\033[31m"
+
+// A macro, so that the whole format is one literal and the compiler checks it against the
+// arguments.
+#define QEL_LOG(PRIORITY, SITE, TEXT, ...)                                  \
+  __dlog_print(kMainLogBuffer, PRIORITY, "MESSAGE_PLUGIN",                  \
+               "%s: %s(%d) > " QEL_COLOUR_##PRIORITY "[%d]" TEXT "\033[0m", \
+               "qel-message-serialize.cc", (SITE).function, (SITE).line,    \
+               thread_id() __VA_OPT__(, ) __VA_ARGS__)
+
+#endif
