@@ -6,18 +6,18 @@
 set(QEL_PROTOBUF_ROOT "" CACHE PATH "Installation of Protocol Buffers 2.6 (empty: the one of ./dev setup)")
 set(QEL_PROTOC "" CACHE FILEPATH "Compiler of the schema (empty: the installation's)")
 
-set(_root "${QEL_PROTOBUF_ROOT}")
-if(NOT _root)
-  set(_root "${PROJECT_SOURCE_DIR}/.deps/protobuf-2.6.1")
+set(QEL_PROTOBUF_PREFIX "${QEL_PROTOBUF_ROOT}")
+if(NOT QEL_PROTOBUF_PREFIX)
+  set(QEL_PROTOBUF_PREFIX "${PROJECT_SOURCE_DIR}/.deps/protobuf-2.6.1")
 endif()
 set(_protoc "${QEL_PROTOC}")
 if(NOT _protoc)
-  set(_protoc "${_root}/bin/protoc")
+  set(_protoc "${QEL_PROTOBUF_PREFIX}/bin/protoc")
 endif()
 
-set(_version_header "${_root}/include/google/protobuf/stubs/common.h")
+set(_version_header "${QEL_PROTOBUF_PREFIX}/include/google/protobuf/stubs/common.h")
 if(NOT EXISTS "${_version_header}")
-  message(FATAL_ERROR "No Protocol Buffers 2.6 in ${_root}: run './dev setup', or let QEL_PROTOBUF_ROOT name an installation.")
+  message(FATAL_ERROR "No Protocol Buffers 2.6 in ${QEL_PROTOBUF_PREFIX}: run './dev setup', or let QEL_PROTOBUF_ROOT name an installation.")
 endif()
 file(STRINGS "${_version_header}" _line REGEX "#define GOOGLE_PROTOBUF_VERSION [0-9]+")
 string(REGEX MATCH "[0-9]+$" _number "${_line}")
@@ -26,7 +26,7 @@ math(EXPR _minor "${_number} / 1000 % 1000")
 math(EXPR _patch "${_number} % 1000")
 set(QEL_PROTOBUF_VERSION "${_major}.${_minor}.${_patch}")
 if(NOT "${_major}.${_minor}" STREQUAL "2.6")
-  message(FATAL_ERROR "This library needs Protocol Buffers 2.6, but ${_root} has ${QEL_PROTOBUF_VERSION}.")
+  message(FATAL_ERROR "This library needs Protocol Buffers 2.6, but ${QEL_PROTOBUF_PREFIX} has ${QEL_PROTOBUF_VERSION}.")
 endif()
 
 execute_process(COMMAND "${_protoc}" --version
@@ -42,15 +42,15 @@ set(QEL_PROTOC_COMMAND "${_protoc}")
 
 # Multiarch folders too: that is where a device SDK's sysroot keeps it.
 find_library(QEL_PROTOBUF_LIBRARY NAMES libprotobuf.so
-  HINTS "${_root}" PATH_SUFFIXES lib "lib/${CMAKE_LIBRARY_ARCHITECTURE}"
+  HINTS "${QEL_PROTOBUF_PREFIX}" PATH_SUFFIXES lib "lib/${CMAKE_LIBRARY_ARCHITECTURE}"
   NO_DEFAULT_PATH NO_CACHE NO_CMAKE_FIND_ROOT_PATH)
 if(NOT QEL_PROTOBUF_LIBRARY)
-  message(FATAL_ERROR "No libprotobuf.so in ${_root}/lib: the runtime is linked dynamically, because other modules share its descriptor pool.")
+  message(FATAL_ERROR "No libprotobuf.so in ${QEL_PROTOBUF_PREFIX}/lib: the runtime is linked dynamically, because other modules share its descriptor pool.")
 endif()
 
 find_package(Threads REQUIRED)
 add_library(protobuf26 SHARED IMPORTED)
 set_target_properties(protobuf26 PROPERTIES
   IMPORTED_LOCATION "${QEL_PROTOBUF_LIBRARY}"
-  INTERFACE_INCLUDE_DIRECTORIES "${_root}/include"
+  INTERFACE_INCLUDE_DIRECTORIES "${QEL_PROTOBUF_PREFIX}/include"
   INTERFACE_LINK_LIBRARIES Threads::Threads)

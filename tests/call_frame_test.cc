@@ -1,0 +1,406 @@
+// What all functions share: log lines, the encoded buffer, the parse and its two failure lines, the
+// kept stream. One row of a table for each function.
+
+#include <sys/syscall.h>
+#include <sys/wait.h>
+#include <unistd.h>
+
+#include <functional>
+#include <set>
+#include <thread>
+
+#include "qel-message-serialize.h"
+#include "support/exchange.h"
+#include "support/heap.h"
+
+namespace {
+
+using support::expect_log;
+using support::FailingCalloc;
+using support::HeapWatch;
+using support::hex;
+using support::kIntSentinel;
+using support::kLongSentinel;
+using support::Line;
+using support::logged_calls;
+using support::Received;
+
+int log_line_number(size_t call) { return std::get<int>(logged_calls().at(call).arguments.at(2)); }
+
+int log_thread(size_t call) { return std::get<int>(logged_calls().at(call).arguments.at(3)); }
+
+// ---- Serializers
+
+struct Serializer {
+  std::string name;
+  std::string entry;  // text
+  int length;         // of what call makes
+  std::function<int(unsigned char**, int*)> call;
+};
+
+const Serializer kSerializers[] = {
+    {"channel_auth_request_serialize", "%s start", 12,
+     [](unsigned char** data, int* size) {
+       return channel_auth_request_serialize(1, 2, 3, "a", "b", data, size);
+     }},
+    {"client_echo_reply_serialize", "%s start", 2,
+     [](unsigned char** data, int* size) { return client_echo_reply_serialize(1, data, size); }},
+    {"chat_request_serialize", "%s start", 15,
+     [](unsigned char** data, int* size) {
+       return chat_request_serialize(1, 2, 3, 0, "a", 4, 0, data, size);
+     }},
+    {"current_time_request_serialize", "%s: enter", 2,
+     [](unsigned char** data, int* size) { return current_time_request_serialize(1, data, size); }},
+};
+
+void PrintTo(const Serializer& function, std::ostream* out) { *out << function.name; }
+
+class EverySerializer : public support::ExchangeTest,
+                        public ::testing::WithParamInterface<Serializer> {
+ protected:
+  const Serializer& function_ = GetParam();
+  support::Encoded out_;
+
+  void call() { out_.status = function_.call(&out_.data, &out_.size); }
+  Line entry() const { return support::debug(function_.entry, {function_.name}); }
+};
+
+TEST_P(EverySerializer, WhenSucceeding_ReturnsZeroAndTheLength) {
+  call();
+  EXPECT_EQ(out_.status, 0);
+  EXPECT_EQ(out_.size, function_.length);
+}
+
+TEST_P(EverySerializer, WhenSucceeding_LogsEntryAndExit) {
+  call();
+  expect_log(function_.name, {entry(), support::debug("%s: exit", {function_.name})});
+}
+
+TEST_P(EverySerializer, WhenSucceeding_AllocatesOneZeroedBufferOfTheLength) {
+  HeapWatch watch;
+  call();
+  watch.stop();
+  ASSERT_EQ(watch.callocs().size(), 1u);
+  EXPECT_EQ(watch.callocs()[0].elements, static_cast<size_t>(function_.length));
+  EXPECT_EQ(watch.callocs()[0].element_size, 1u);
+}
+
+TEST_P(EverySerializer, WhenSucceeding_KeepsNothing) {
+  HeapWatch watch;
+  call();
+  watch.stop();
+  EXPECT_EQ(watch.kept(), std::vector<size_t>{});
+}
+
+TEST_P(EverySerializer, WhenBufferCannotBeAllocated_ReturnsMinusOne) {
+  {
+    const FailingCalloc fault(1);
+    call();
+  }
+  EXPECT_EQ(out_.status, -1);
+}
+
+TEST_P(EverySerializer, WhenBufferCannotBeAllocated_WritesNullAndTheLength) {
+  {
+    const FailingCalloc fault(1);
+    call();
+  }
+  EXPECT_EQ(out_.data, nullptr);
+  EXPECT_EQ(out_.size, function_.length);
+}
+
+TEST_P(EverySerializer, WhenBufferCannotBeAllocated_LogsEntryAndError) {
+  {
+    const FailingCalloc fault(1);
+    call();
+  }
+  expect_log(function_.name,
+             {entry(), support::error("Could not allocate memory for serialized data")});
+}
+
+TEST_P(EverySerializer, WhenBufferCannotBeAllocated_KeepsNothing) {
+  HeapWatch watch;
+  {
+    const FailingCalloc fault(1);
+    call();
+  }
+  watch.stop();
+  EXPECT_EQ(watch.kept(), std::vector<size_t>{});
+}
+
+TEST_P(EverySerializer, WhenLogging_NamesTheLinesOfItsSteps) {
+  call();
+  EXPECT_NE(support::module_line(log_line_number(0)).find('"' + function_.entry + '"'),
+            std::string::npos);
+  EXPECT_NE(support::module_line(log_line_number(1)).find("encode("), std::string::npos);
+}
+
+INSTANTIATE_TEST_SUITE_P(CallFrame, EverySerializer, ::testing::ValuesIn(kSerializers),
+                         [](const auto& row) { return row.param.name; });
+
+// ---- Deserializers
+
+struct Deserializer {
+  std::string name;
+  std::string entry;  // text
+  bool logs_exit;
+  bool releases_stream;  // on success
+  std::string whole;     // a representative message
+  // Where a cut leaves a valid message: between two fields, and within an embedded message between
+  // two of its fields, because the runtime takes the end of the input for the embedded message's.
+  std::set<size_t> clean_cuts;
+  std::vector<Line> detail;  // logged between entry and exit when the input is empty
+  // Calls the function and tells whether it left every output alone.
+  std::function<bool(const unsigned char*, int)> leaves_outputs;
+};
+
+const Deserializer kDeserializers[] = {
+    // requestId 150, result { code 1000, msg "ok" }
+    {"channel_auth_reply_deserialize", "%s start", false, true,
+     hex("08 96 01 12 07 08 e8 07 12 02 6f 6b"), {0, 3, 5, 8}, {},
+     [](const unsigned char* data, int size) {
+       int64_t request_id = kLongSentinel;
+       int code = kIntSentinel;
+       support::TextOutput text;
+       channel_auth_reply_deserialize(data, size, &request_id, &code, &text.text);
+       return request_id == kLongSentinel && code == kIntSentinel && text.untouched();
+     }},
+    // requestId 150
+    {"client_echo_deserialize", "%s start", true, true, hex("08 96 01"), {0}, {},
+     [](const unsigned char* data, int size) {
+       int64_t request_id = kLongSentinel;
+       client_echo_deserialize(data, size, &request_id);
+       return request_id == kLongSentinel;
+     }},
+    // userId 9, deviceId 8, requestId 7, chatroomId 6, result { code 3, msg "no" },
+    // processedMessageEntries { msgId 1, sentTime 300 }
+    {"chat_reply_deserialize", "%s: start", true, false,
+     hex("08 09 10 08 58 07 60 06 6a 06 08 03 12 02 6e 6f 72 05 08 01 10 ac 02"),
+     {0, 2, 4, 6, 8, 10, 12, 16, 18, 20},
+     {support::debug("processed msg entry size : %d", {0})},
+     [](const unsigned char* data, int size) {
+       int64_t request_id = kLongSentinel;
+       int64_t chatroom_id = kLongSentinel;
+       int code = kIntSentinel;
+       support::TextOutput text;
+       int count = kIntSentinel;
+       support::IdListOutput ids;
+       support::IdListOutput times;
+       chat_reply_deserialize(data, size, &request_id, &chatroom_id, &code, &text.text, &count,
+                              &ids.ids, &times.ids);
+       return request_id == kLongSentinel && chatroom_id == kLongSentinel && code == kIntSentinel &&
+              text.untouched() && count == kIntSentinel && ids.untouched() && times.untouched();
+     }},
+    // userId 9, deviceId 8, requestId 7, result { code 3, msg "no" }, currentTimeMillis 1500
+    {"current_time_deserialize", "%s: start", true, false,
+     hex("08 09 10 08 58 07 62 06 08 03 12 02 6e 6f 68 dc 0b"), {0, 2, 4, 6, 8, 10, 14}, {},
+     [](const unsigned char* data, int size) {
+       int64_t request_id = kLongSentinel;
+       int64_t millis = kLongSentinel;
+       int code = kIntSentinel;
+       support::TextOutput text;
+       current_time_deserialize(data, size, &request_id, &millis, &code, &text.text);
+       return request_id == kLongSentinel && millis == kLongSentinel && code == kIntSentinel &&
+              text.untouched();
+     }},
+};
+
+void PrintTo(const Deserializer& function, std::ostream* out) { *out << function.name; }
+
+// A field that no message has, number 1000, as an unknown group: its start and its end.
+const char kGroupStart[] = "c3 3e";
+const char kGroupEnd[] = "c4 3e";
+
+std::string repeated(const std::string& text, int times) {
+  std::string all;
+  for (int i = 0; i < times; ++i) {
+    all += text;
+  }
+  return all;
+}
+
+class EveryDeserializer : public support::ExchangeTest,
+                          public ::testing::WithParamInterface<Deserializer> {
+ protected:
+  const Deserializer& function_ = GetParam();
+
+  bool leaves_outputs(const std::string& bytes) const {
+    const Received received(bytes);
+    return function_.leaves_outputs(received.data(), received.size());
+  }
+  Line entry() const { return support::warn(function_.entry, {function_.name}); }
+
+  void expect_success(const std::string& bytes) {
+    EXPECT_FALSE(leaves_outputs(bytes));
+    const auto logged = logged_calls();
+    ASSERT_FALSE(logged.empty());
+    for (const auto& call : logged) {
+      EXPECT_NE(call.priority, 6) << call.format;
+    }
+    support::clear_log();
+  }
+  void expect_failure(const std::string& bytes, const std::vector<std::string>& errors) {
+    EXPECT_TRUE(leaves_outputs(bytes));
+    std::vector<Line> lines = {entry()};
+    for (const std::string& text : errors) {
+      lines.push_back(support::error(text));
+    }
+    expect_log(function_.name, lines);
+  }
+  std::vector<size_t> kept(const std::string& bytes) const {
+    HeapWatch watch;
+    leaves_outputs(bytes);
+    watch.stop();
+    return watch.kept();
+  }
+};
+
+TEST_P(EveryDeserializer, WhenInputIsEmpty_SucceedsAndLogsEntryAndExit) {
+  EXPECT_FALSE(leaves_outputs(""));
+  std::vector<Line> lines = {entry()};
+  lines.insert(lines.end(), function_.detail.begin(), function_.detail.end());
+  if (function_.logs_exit) {
+    lines.push_back(support::warn("%s: exit", {function_.name}));
+  }
+  expect_log(function_.name, lines);
+}
+
+TEST_P(EveryDeserializer, WhenMessageIsWhole_Succeeds) { expect_success(function_.whole); }
+
+TEST_P(EveryDeserializer, WhenCutWithinAField_WritesNothingAndLogsBothErrors) {
+  for (size_t cut = 0; cut < function_.whole.size(); ++cut) {
+    SCOPED_TRACE(cut);
+    if (function_.clean_cuts.count(cut) == 0) {
+      expect_failure(function_.whole.substr(0, cut),
+                     {support::kMergeError, support::kStreamError});
+    }
+  }
+}
+
+TEST_P(EveryDeserializer, WhenCutBetweenFields_Succeeds) {
+  for (const size_t cut : function_.clean_cuts) {
+    SCOPED_TRACE(cut);
+    expect_success(function_.whole.substr(0, cut));
+  }
+}
+
+TEST_P(EveryDeserializer, WhenCutWithinATag_WritesNothingAndLogsTheStreamErrorAlone) {
+  expect_failure(function_.whole + hex("c3"), {support::kStreamError});
+}
+
+TEST_P(EveryDeserializer, WhenAnUnknownGroupIsNotEnded_WritesNothingAndLogsTheMergeErrorAlone) {
+  expect_failure(function_.whole + hex(kGroupStart), {support::kMergeError});
+}
+
+TEST_P(EveryDeserializer, WhenAGroupEndsThatNeverStarted_WritesNothingAndLogsTheStreamErrorAlone) {
+  expect_failure(function_.whole + hex(kGroupEnd), {support::kStreamError});
+}
+
+TEST_P(EveryDeserializer, WhenATagIsZero_WritesNothingAndLogsTheStreamErrorAlone) {
+  expect_failure(function_.whole + hex("00"), {support::kStreamError});
+}
+
+TEST_P(EveryDeserializer, WhenAWireTypeDoesNotExist_WritesNothingAndLogsBothErrors) {
+  expect_failure(hex("0f") + function_.whole, {support::kMergeError, support::kStreamError});
+}
+
+TEST_P(EveryDeserializer, WhenAVarintIsTooLong_WritesNothingAndLogsBothErrors) {
+  expect_failure(hex("08 ff ff ff ff ff ff ff ff ff ff 01"),
+                 {support::kMergeError, support::kStreamError});
+}
+
+TEST_P(EveryDeserializer, WhenAFieldIsUnknown_Succeeds) {
+  expect_success(function_.whole + support::Wire().text(1000, "unknown").bytes());
+}
+
+TEST_P(EveryDeserializer, WhenGroupsNestAsDeepAsTheRuntimeAllows_Succeeds) {
+  expect_success(hex(repeated(kGroupStart, 100) + repeated(kGroupEnd, 100)));
+}
+
+TEST_P(EveryDeserializer, WhenGroupsNestDeeper_WritesNothingAndLogsBothErrors) {
+  expect_failure(hex(repeated(kGroupStart, 101) + repeated(kGroupEnd, 101)),
+                 {support::kMergeError, support::kStreamError});
+}
+
+TEST_P(EveryDeserializer, WhenSucceeding_KeepsTheStreamUnlessItReleasesIt) {
+  const std::vector<size_t> one_stream = {support::kStreamSize};
+  EXPECT_EQ(kept(function_.whole), function_.releases_stream ? std::vector<size_t>{} : one_stream);
+}
+
+TEST_P(EveryDeserializer, WhenTheParseFails_KeepsTheStream) {
+  EXPECT_EQ(kept(hex(kGroupStart)), std::vector<size_t>{support::kStreamSize});
+}
+
+TEST_P(EveryDeserializer, WhenTheStreamDoesNotEndCleanly_KeepsTheStream) {
+  EXPECT_EQ(kept(hex("00")), std::vector<size_t>{support::kStreamSize});
+}
+
+TEST_P(EveryDeserializer, WhenLogging_NamesTheLinesOfItsSteps) {
+  leaves_outputs(function_.whole.substr(0, 1));  // logs entry and both errors
+  ASSERT_EQ(logged_calls().size(), 3u);
+  EXPECT_NE(support::module_line(log_line_number(0)).find('"' + function_.entry + '"'),
+            std::string::npos);
+  EXPECT_NE(support::module_line(log_line_number(1)).find("parse("), std::string::npos);
+  EXPECT_NE(support::module_line(log_line_number(2)).find("parse("), std::string::npos);
+}
+
+TEST_P(EveryDeserializer, WhenLoggingItsLastLine_NamesThatLine) {
+  leaves_outputs("");
+  const std::string text = function_.logs_exit ? "%s: exit" : function_.entry;
+  EXPECT_NE(support::module_line(log_line_number(logged_calls().size() - 1)).find('"' + text + '"'),
+            std::string::npos);
+}
+
+INSTANTIATE_TEST_SUITE_P(CallFrame, EveryDeserializer, ::testing::ValuesIn(kDeserializers),
+                         [](const auto& row) { return row.param.name; });
+
+// ---- The log line
+
+class LogLine : public support::ExchangeTest {
+ protected:
+  support::Encoded out_;
+
+  void call() { out_.status = client_echo_reply_serialize(1, &out_.data, &out_.size); }
+};
+
+TEST_F(LogLine, OfAnEntry_HasTheWholeFormatInOneLiteral) {
+  call();
+  EXPECT_EQ(logged_calls().at(0).format, "%s: %s(%d) > \033[32m[%d]%s start\033[0m");
+}
+
+TEST_F(LogLine, OfAFailedParse_HasTheWholeFormatInOneLiteral) {
+  int64_t request_id = 0;
+  const Received received(hex("08"));
+  client_echo_deserialize(received.data(), received.size(), &request_id);
+  EXPECT_EQ(logged_calls().at(0).format, "%s: %s(%d) > \033[33m[%d]%s start\033[0m");
+  EXPECT_EQ(logged_calls().at(1).format,
+            "%s: %s(%d) > \033[31m[%d]merge error : Could not parse the received data!\033[0m");
+  EXPECT_EQ(logged_calls().at(2).format,
+            "%s: %s(%d) > \033[31m[%d]ConsumedEntireMessage error :Could not parse the received "
+            "data\033[0m");
+}
+
+TEST_F(LogLine, OfAnotherThread_CarriesThatThreadsId) {
+  int id = 0;
+  std::thread([&] {
+    id = static_cast<int>(syscall(SYS_gettid));
+    call();
+  }).join();
+  EXPECT_NE(id, static_cast<int>(getpid()));
+  EXPECT_EQ(log_thread(0), id);
+}
+
+TEST_F(LogLine, OfAForkedProcess_CarriesItsOwnThreadId) {
+  call();  // whatever might be cached is cached now
+  support::clear_log();
+  const pid_t child = fork();
+  if (child == 0) {
+    client_echo_reply_serialize(1, &out_.data, &out_.size);
+    _exit(log_thread(1) == static_cast<int>(getpid()) ? 0 : 1);
+  }
+  int status = -1;
+  ASSERT_EQ(waitpid(child, &status, 0), child);
+  EXPECT_EQ(status, 0);
+}
+
+}  // namespace

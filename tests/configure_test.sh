@@ -1,0 +1,85 @@
+#!/usr/bin/env bash
+# configure_test.sh CASE SOURCE PROTOBUF-ROOT LIBRARY CXX: what the build says and refuses when it is
+# configured. LIBRARY stands for a device's dlog.
+set -euo pipefail
+source=$2
+protobuf=$3
+library=$4
+cxx=$5
+scratch=$(mktemp -d)
+trap 'rm -rf "$scratch"' EXIT
+
+# configure OPTION...: its messages, as one line, go to $messages.
+configure() {
+  local status=0
+  cmake -S "$source" -B "$scratch/build" -G Ninja -DCMAKE_CXX_COMPILER="$cxx" -DBUILD_TESTING=OFF \
+    "$@" >"$scratch/messages" 2>&1 || status=$?
+  messages=$(tr -s ' \n' '  ' <"$scratch/messages")
+  return "$status"
+}
+
+expect() {
+  [[ $messages == *"$1"* ]] && return
+  printf 'expected: %s\nsaid: %s\n' "$1" "$messages" >&2
+  exit 1
+}
+
+refused() {
+  ! configure "$@" && return
+  echo 'was not refused' >&2
+  exit 1
+}
+
+case $1 in
+  another_series_of_headers)
+    mkdir -p "$scratch/other/include/google/protobuf/stubs"
+    echo '#define GOOGLE_PROTOBUF_VERSION 3021012' >"$scratch/other/include/google/protobuf/stubs/common.h"
+    refused -DQEL_PROTOBUF_ROOT="$scratch/other"
+    expect "This library needs Protocol Buffers 2.6, but $scratch/other has 3.21.12."
+    ;;
+  another_series_of_compiler)
+    printf '#!/bin/sh\necho libprotoc 3.21.12\n' >"$scratch/protoc"
+    chmod +x "$scratch/protoc"
+    refused -DQEL_PROTOBUF_ROOT="$protobuf" -DQEL_PROTOC="$scratch/protoc"
+    expect "This library needs the compiler of Protocol Buffers 2.6, but $scratch/protoc is of 3.21.12."
+    ;;
+  no_runtime)
+    refused -DQEL_PROTOBUF_ROOT="$scratch/nowhere"
+    expect "No Protocol Buffers 2.6 in $scratch/nowhere: run './dev setup', or let QEL_PROTOBUF_ROOT name an installation."
+    ;;
+  compiler_that_does_not_run)
+    refused -DQEL_PROTOBUF_ROOT="$protobuf" -DQEL_PROTOC="$scratch/nowhere"
+    expect "The schema's compiler $scratch/nowhere does not run here: let QEL_PROTOC name a protoc 2.6 of this machine."
+    ;;
+  device_log_that_is_named)
+    configure -DQEL_PROTOBUF_ROOT="$protobuf" -DQEL_DLOG_LIBRARY="$library"
+    expect "log service $library "
+    ;;
+  device_log_that_is_found)
+    mkdir "$scratch/lib"
+    cp "$library" "$scratch/lib/libdlog.so"
+    configure -DQEL_PROTOBUF_ROOT="$protobuf" -DCMAKE_LIBRARY_PATH="$scratch/lib"
+    expect "log service $scratch/lib/libdlog.so "
+    ;;
+  device_log_that_is_missing)
+    refused -DQEL_PROTOBUF_ROOT="$protobuf" -DQEL_DLOG_LIBRARY="$scratch/nowhere.so"
+    expect "QEL_DLOG_LIBRARY names $scratch/nowhere.so, which does not exist."
+    ;;
+  no_device_log)
+    configure -DQEL_PROTOBUF_ROOT="$protobuf"
+    expect 'log service workstation stand-in (platform/dlog)'
+    ;;
+  build_types_keep_assertions)
+    for type in Release RelWithDebInfo MinSizeRel; do
+      rm -rf "$scratch/build"
+      configure -DQEL_PROTOBUF_ROOT="$protobuf" -DCMAKE_BUILD_TYPE="$type"
+      if grep 'NDEBUG' "$scratch/build/build.ninja"; then
+        exit 1
+      fi
+    done
+    ;;
+  *)
+    echo "no such case: $1" >&2
+    exit 1
+    ;;
+esac

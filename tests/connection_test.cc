@@ -1,0 +1,326 @@
+// Channel authentication, echo, and the service's clock.
+
+#include <limits>
+
+#include "qel-message-serialize.h"
+#include "support/exchange.h"
+#include "support/process_death.h"
+
+namespace {
+
+using support::Encoded;
+using support::ExchangeTest;
+using support::hex;
+using support::kIntSentinel;
+using support::kLongSentinel;
+using support::Received;
+using support::TextOutput;
+using support::to_hex;
+
+constexpr int64_t kSmallest = std::numeric_limits<int64_t>::min();
+constexpr int64_t kLargest = std::numeric_limits<int64_t>::max();
+
+// ---- channel_auth_request_serialize
+
+class ChannelAuthRequestSerialize : public ExchangeTest {
+ protected:
+  Encoded out_;
+
+  void call(int64_t request, int64_t user, int64_t device, const char* app, const char* token) {
+    out_.status =
+        channel_auth_request_serialize(request, user, device, app, token, &out_.data, &out_.size);
+  }
+};
+
+TEST_F(ChannelAuthRequestSerialize, WhenCalled_EncodesTheFiveArguments) {
+  call(1, 2, 300, "app", "tok");
+  ASSERT_EQ(out_.status, 0);
+  EXPECT_EQ(to_hex(out_.data, out_.size), "08 01 10 02 18 ac 02 2a 03 61 70 70 32 03 74 6f 6b");
+}
+
+TEST_F(ChannelAuthRequestSerialize, WhenValuesAreZeroAndEmpty_EncodesThemAsPresent) {
+  call(0, 0, 0, "", "");
+  ASSERT_EQ(out_.status, 0);
+  EXPECT_EQ(to_hex(out_.data, out_.size), "08 00 10 00 18 00 2a 00 32 00");
+}
+
+TEST_F(ChannelAuthRequestSerialize, WhenIdsAreNegative_EncodesTenByteVarints) {
+  call(-1, kSmallest, kLargest, "", "");
+  ASSERT_EQ(out_.status, 0);
+  EXPECT_EQ(to_hex(out_.data, out_.size),
+            "08 ff ff ff ff ff ff ff ff ff 01 10 80 80 80 80 80 80 80 80 80 01 "
+            "18 ff ff ff ff ff ff ff ff 7f 2a 00 32 00");
+}
+
+TEST_F(ChannelAuthRequestSerialize, WhenCalled_LogsNoAccessToken) {
+  call(1, 2, 3, "the-app", "the-secret");
+  for (const auto& logged : support::logged_calls()) {
+    EXPECT_EQ(logged.format.find("the-secret"), std::string::npos);
+    for (const auto& argument : logged.arguments) {
+      EXPECT_NE(argument, support::LogArgument(std::string("the-secret")));
+    }
+  }
+}
+
+TEST_F(ChannelAuthRequestSerialize, WhenAppIdIsNull_Faults) {
+  EXPECT_EXIT(call(1, 2, 3, nullptr, ""), support::faults, "");
+}
+
+TEST_F(ChannelAuthRequestSerialize, WhenAccessTokenIsNull_Faults) {
+  EXPECT_EXIT(call(1, 2, 3, "", nullptr), support::faults, "");
+}
+
+// ---- channel_auth_reply_deserialize
+
+class ChannelAuthReplyDeserialize : public ExchangeTest {
+ protected:
+  int64_t request_id_ = kLongSentinel;
+  int code_ = kIntSentinel;
+  TextOutput text_;
+
+  void call(const std::string& bytes) {
+    const Received received(bytes);
+    channel_auth_reply_deserialize(received.data(), received.size(), &request_id_, &code_,
+                                   &text_.text);
+  }
+};
+
+TEST_F(ChannelAuthReplyDeserialize, WhenReplyIsWhole_WritesAllOutputs) {
+  call(hex("08 96 01 12 06 08 e8 07 12 01 6f"));
+  EXPECT_EQ(request_id_, 150);
+  EXPECT_EQ(code_, 1000);
+  EXPECT_STREQ(text_.text, "o");
+}
+
+TEST_F(ChannelAuthReplyDeserialize, WhenIdAndCodeAreNegative_WritesThem) {
+  call(hex("08 ff ff ff ff ff ff ff ff ff 01 12 0b 08 fe ff ff ff ff ff ff ff ff 01"));
+  EXPECT_EQ(request_id_, -1);
+  EXPECT_EQ(code_, -2);
+}
+
+TEST_F(ChannelAuthReplyDeserialize, WhenInputIsEmpty_WritesZerosAndNull) {
+  call("");
+  EXPECT_EQ(request_id_, 0);
+  EXPECT_EQ(code_, 0);
+  EXPECT_EQ(text_.text, nullptr);
+}
+
+TEST_F(ChannelAuthReplyDeserialize, WhenResultIsAbsent_WritesZeroAndNull) {
+  call(hex("08 05"));
+  EXPECT_EQ(request_id_, 5);
+  EXPECT_EQ(code_, 0);
+  EXPECT_EQ(text_.text, nullptr);
+}
+
+TEST_F(ChannelAuthReplyDeserialize, WhenResultIsEmpty_WritesZeroAndNull) {
+  call(hex("08 05 12 00"));
+  EXPECT_EQ(code_, 0);
+  EXPECT_EQ(text_.text, nullptr);
+}
+
+TEST_F(ChannelAuthReplyDeserialize, WhenTextIsAbsent_WritesNull) {
+  call(hex("08 05 12 02 08 07"));
+  EXPECT_EQ(code_, 7);
+  EXPECT_EQ(text_.text, nullptr);
+}
+
+TEST_F(ChannelAuthReplyDeserialize, WhenTextIsEmptyButPresent_WritesEmptyText) {
+  call(hex("08 05 12 02 12 00"));
+  EXPECT_EQ(code_, 0);
+  EXPECT_STREQ(text_.text, "");
+}
+
+TEST_F(ChannelAuthReplyDeserialize, WhenRequestIdIsNull_Faults) {
+  EXPECT_EXIT(channel_auth_reply_deserialize(nullptr, 0, nullptr, &code_, &text_.text),
+              support::faults, "");
+}
+
+TEST_F(ChannelAuthReplyDeserialize, WhenResultCodeIsNull_Faults) {
+  EXPECT_EXIT(channel_auth_reply_deserialize(nullptr, 0, &request_id_, nullptr, &text_.text),
+              support::faults, "");
+}
+
+TEST_F(ChannelAuthReplyDeserialize, WhenResultMsgIsNull_Faults) {
+  EXPECT_EXIT(channel_auth_reply_deserialize(nullptr, 0, &request_id_, &code_, nullptr),
+              support::faults, "");
+}
+
+// ---- client_echo_reply_serialize
+
+class ClientEchoReplySerialize : public ExchangeTest {
+ protected:
+  Encoded out_;
+
+  void call(int64_t request) {
+    out_.status = client_echo_reply_serialize(request, &out_.data, &out_.size);
+  }
+};
+
+TEST_F(ClientEchoReplySerialize, WhenIdIsZero_EncodesTwoBytes) {
+  call(0);
+  ASSERT_EQ(out_.status, 0);
+  EXPECT_EQ(to_hex(out_.data, out_.size), "08 00");
+}
+
+TEST_F(ClientEchoReplySerialize, WhenIdIsNegative_EncodesTenByteVarint) {
+  call(-1);
+  ASSERT_EQ(out_.status, 0);
+  EXPECT_EQ(to_hex(out_.data, out_.size), "08 ff ff ff ff ff ff ff ff ff 01");
+}
+
+// ---- client_echo_deserialize
+
+class ClientEchoDeserialize : public ExchangeTest {
+ protected:
+  int64_t request_id_ = kLongSentinel;
+
+  void call(const std::string& bytes) {
+    const Received received(bytes);
+    client_echo_deserialize(received.data(), received.size(), &request_id_);
+  }
+};
+
+TEST_F(ClientEchoDeserialize, WhenProbeIsWhole_WritesItsId) {
+  call(hex("08 96 01"));
+  EXPECT_EQ(request_id_, 150);
+}
+
+TEST_F(ClientEchoDeserialize, WhenIdIsSmallest_WritesIt) {
+  call(hex("08 80 80 80 80 80 80 80 80 80 01"));
+  EXPECT_EQ(request_id_, kSmallest);
+}
+
+TEST_F(ClientEchoDeserialize, WhenInputIsEmpty_WritesZero) {
+  call("");
+  EXPECT_EQ(request_id_, 0);
+}
+
+TEST_F(ClientEchoDeserialize, WhenRequestIdIsNull_Faults) {
+  EXPECT_EXIT(client_echo_deserialize(nullptr, 0, nullptr), support::faults, "");
+}
+
+// ---- current_time_request_serialize
+
+class CurrentTimeRequestSerialize : public ExchangeTest {
+ protected:
+  Encoded out_;
+
+  void call(int64_t request) {
+    out_.status = current_time_request_serialize(request, &out_.data, &out_.size);
+  }
+};
+
+TEST_F(CurrentTimeRequestSerialize, WhenIdIsZero_EncodesTwoBytes) {
+  call(0);
+  ASSERT_EQ(out_.status, 0);
+  EXPECT_EQ(to_hex(out_.data, out_.size), "58 00");
+}
+
+TEST_F(CurrentTimeRequestSerialize, WhenIdIsLargest_EncodesNineByteVarint) {
+  call(kLargest);
+  ASSERT_EQ(out_.status, 0);
+  EXPECT_EQ(to_hex(out_.data, out_.size), "58 ff ff ff ff ff ff ff ff 7f");
+}
+
+// ---- current_time_deserialize
+
+class CurrentTimeDeserialize : public ExchangeTest {
+ protected:
+  int64_t request_id_ = kLongSentinel;
+  int64_t millis_ = kLongSentinel;
+  int code_ = kIntSentinel;
+  TextOutput text_;
+
+  void call(const std::string& bytes) {
+    const Received received(bytes);
+    current_time_deserialize(received.data(), received.size(), &request_id_, &millis_, &code_,
+                             &text_.text);
+  }
+};
+
+// userId 9, deviceId 8, requestId 7, result { code 3, msg "no" }, currentTimeMillis 1500
+const char kTimeReply[] = "08 09 10 08 58 07 62 06 08 03 12 02 6e 6f 68 dc 0b";
+
+TEST_F(CurrentTimeDeserialize, WhenReplyIsWhole_WritesAllOutputs) {
+  call(hex(kTimeReply));
+  EXPECT_EQ(request_id_, 7);
+  EXPECT_EQ(millis_, 1500);
+  EXPECT_EQ(code_, 3);
+  EXPECT_STREQ(text_.text, "no");
+}
+
+TEST_F(CurrentTimeDeserialize, WhenTimeIsZeroButPresent_WritesZero) {
+  call(hex("68 00"));
+  EXPECT_EQ(millis_, 0);
+}
+
+TEST_F(CurrentTimeDeserialize, WhenTimeIsAbsent_WritesMinusOne) {
+  call(hex("58 07"));
+  EXPECT_EQ(request_id_, 7);
+  EXPECT_EQ(millis_, -1);
+}
+
+TEST_F(CurrentTimeDeserialize, WhenInputIsEmpty_WritesZeroAndMinusOneAlone) {
+  call("");
+  EXPECT_EQ(request_id_, 0);
+  EXPECT_EQ(millis_, -1);
+  EXPECT_EQ(code_, kIntSentinel);
+  EXPECT_TRUE(text_.untouched());
+}
+
+TEST_F(CurrentTimeDeserialize, WhenResultIsAbsent_LeavesCodeAndText) {
+  call(hex("58 07 68 01"));
+  EXPECT_EQ(code_, kIntSentinel);
+  EXPECT_TRUE(text_.untouched());
+}
+
+TEST_F(CurrentTimeDeserialize, WhenResultIsEmpty_WritesCodeZeroAndLeavesText) {
+  call(hex("58 07 62 00"));
+  EXPECT_EQ(code_, 0);
+  EXPECT_TRUE(text_.untouched());
+}
+
+TEST_F(CurrentTimeDeserialize, WhenTextIsAbsent_WritesCodeAndLeavesText) {
+  call(hex("58 07 62 02 08 05"));
+  EXPECT_EQ(code_, 5);
+  EXPECT_TRUE(text_.untouched());
+}
+
+TEST_F(CurrentTimeDeserialize, WhenTextIsEmptyButPresent_WritesEmptyText) {
+  call(hex("62 02 12 00"));
+  EXPECT_STREQ(text_.text, "");
+}
+
+TEST_F(CurrentTimeDeserialize, WhenCodeAndTextAreNull_WritesTheOtherTwo) {
+  const Received received(hex(kTimeReply));
+  current_time_deserialize(received.data(), received.size(), &request_id_, &millis_, nullptr,
+                           nullptr);
+  EXPECT_EQ(request_id_, 7);
+  EXPECT_EQ(millis_, 1500);
+}
+
+TEST_F(CurrentTimeDeserialize, WhenCodeIsNull_WritesText) {
+  const Received received(hex(kTimeReply));
+  current_time_deserialize(received.data(), received.size(), &request_id_, &millis_, nullptr,
+                           &text_.text);
+  EXPECT_STREQ(text_.text, "no");
+}
+
+TEST_F(CurrentTimeDeserialize, WhenTextIsNull_WritesCode) {
+  const Received received(hex(kTimeReply));
+  current_time_deserialize(received.data(), received.size(), &request_id_, &millis_, &code_,
+                           nullptr);
+  EXPECT_EQ(code_, 3);
+}
+
+TEST_F(CurrentTimeDeserialize, WhenRequestIdIsNull_Faults) {
+  EXPECT_EXIT(current_time_deserialize(nullptr, 0, nullptr, &millis_, &code_, &text_.text),
+              support::faults, "");
+}
+
+TEST_F(CurrentTimeDeserialize, WhenCurrentTimeMillisIsNull_Faults) {
+  EXPECT_EXIT(current_time_deserialize(nullptr, 0, &request_id_, nullptr, &code_, &text_.text),
+              support::faults, "");
+}
+
+}  // namespace

@@ -1,0 +1,94 @@
+#!/usr/bin/env bash
+# dev_test.sh CASE SOURCE: what ./dev says when the machine lets it down. It runs from a copy in a
+# scratch folder, with commands of the machine replaced by others.
+set -euo pipefail
+scratch=$(mktemp -d)
+trap 'rm -rf "$scratch"' EXIT
+mkdir "$scratch/checkout" "$scratch/bin"
+cp "$2/dev" "$scratch/checkout/dev"
+archive=protobuf2_2.6.1.orig.tar.gz
+
+# replace COMMAND BODY
+replace() {
+  printf '#!/bin/bash\n%s\n' "$2" >"$scratch/bin/$1"
+  chmod +x "$scratch/bin/$1"
+}
+
+# run FOLDER [VARIABLE=VALUE...]: './dev setup' must fail; its last line goes to $last.
+run() {
+  local folder=$1 status=0
+  shift
+  env PATH="$scratch/bin:$PATH" QEL_PROTOBUF_ROOT= "$@" "$folder/dev" setup >"$scratch/out" 2>&1 ||
+    status=$?
+  last=$(tail -n 1 "$scratch/out")
+  [ "$status" -eq 1 ] || refuse "exit status $status"
+}
+
+refuse() {
+  printf '%s\n' "$*" >&2
+  cat "$scratch/out" >&2
+  exit 1
+}
+
+# expect PATTERN: what the last line looks like.
+# shellcheck disable=SC2053
+expect() { [[ $last == $1 ]] || refuse "expected as the last line: $1"; }
+
+all_installed() { replace dpkg-query 'echo installed'; }
+
+case $1 in
+  no_mirror_for_packages)
+    replace dpkg-query 'exit 1'
+    replace apt-get 'echo "E: cannot resolve the mirror"; exit 100'
+    replace sudo '"$@"'
+    run "$scratch/checkout"
+    expect 'dev: install Debian packages: *: failed; check that the machine reaches a Debian mirror *'
+    grep -q 'E: cannot resolve the mirror' "$scratch/out" || refuse 'the end of the log is missing'
+    ;;
+  neither_root_nor_sudo)
+    replace dpkg-query 'exit 1'
+    replace id 'echo 1000'
+    # Only what the script needs until then, and no sudo.
+    for command in bash dirname mkdir flock cat grep; do
+      ln -s "$(command -v "$command")" "$scratch/bin/$command"
+    done
+    run "$scratch/checkout" PATH="$scratch/bin"
+    expect "dev: packages are missing, and this is neither root nor is there sudo: run as root 'apt-get install g++ *'"
+    ;;
+  no_mirror_for_sources)
+    all_installed
+    replace apt-get 'echo "E: cannot resolve the mirror"; exit 100'
+    run "$scratch/checkout"
+    expect 'dev: fetch the source of Protocol Buffers 2.6.1 *: failed; check that the machine reaches a Debian mirror *'
+    ;;
+  wrong_checksum)
+    all_installed
+    replace apt-get "case \$* in *source*) echo wrong >$archive ;; esac"
+    run "$scratch/checkout"
+    expect "dev: $archive has the SHA-256 * instead of dbbd7bdd* and was removed: call ./dev again, *"
+    [ ! -e "$scratch/checkout/.deps/$archive" ] || refuse 'the wrong archive is still there'
+    ;;
+  no_compiler)
+    all_installed
+    run "$scratch/checkout" CXX=no-such-compiler
+    expect "dev: no compiler: 'no-such-compiler' is not a command; install g++ *"
+    ;;
+  path_with_a_blank)
+    all_installed
+    mv "$scratch/checkout" "$scratch/check out"
+    run "$scratch/check out"
+    expect "dev: the Protocol Buffers build cannot take the path '$scratch/check out': move the checkout *"
+    ;;
+  broken_build_of_the_runtime)
+    all_installed
+    mkdir "$scratch/checkout/.deps"
+    echo broken >"$scratch/checkout/.deps/$archive"
+    replace sha256sum "echo 'dbbd7bdd2381633995404de65a945ff1a7610b0da14593051b4738c90c6dd164  $archive'"
+    run "$scratch/checkout"
+    expect 'dev: build Protocol Buffers 2.6.1 *: failed; the log says why; call ./dev again *'
+    [ ! -e "$scratch/checkout/.deps/protobuf-2.6.1/complete" ] || refuse 'the half-done build counts as done'
+    ;;
+  *)
+    refuse "no such case: $1"
+    ;;
+esac

@@ -1,0 +1,156 @@
+// The workstation's log service. On its own: the other test programs bring one of theirs.
+
+#include <fcntl.h>
+#include <gtest/gtest.h>
+#include <regex.h>
+#include <sys/syscall.h>
+#include <termios.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <cstdlib>
+#include <string>
+#include <thread>
+
+extern "C" int __dlog_print(int log_id, int priority, const char* tag, const char* format, ...);
+
+namespace {
+
+// What write puts on standard error while that is connected to the descriptor into; read from from.
+template <typename Write>
+std::string captured(int into, int from, const Write& write) {
+  const int before = dup(STDERR_FILENO);
+  dup2(into, STDERR_FILENO);
+  write();
+  dup2(before, STDERR_FILENO);
+  close(before);
+
+  std::string text;
+  char chunk[8192];
+  fcntl(from, F_SETFL, O_NONBLOCK);
+  for (ssize_t n = 0; (n = read(from, chunk, sizeof chunk)) > 0;) {
+    text.append(chunk, static_cast<size_t>(n));
+  }
+  return text;
+}
+
+template <typename Write>
+std::string on_pipe(const Write& write) {
+  int ends[2];
+  EXPECT_EQ(pipe(ends), 0);
+  std::string text = captured(ends[1], ends[0], write);
+  close(ends[0]);
+  close(ends[1]);
+  return text;
+}
+
+template <typename Write>
+std::string on_terminal(const Write& write) {
+  const int master = posix_openpt(O_RDWR | O_NOCTTY);
+  EXPECT_GE(master, 0);
+  EXPECT_EQ(grantpt(master), 0);
+  EXPECT_EQ(unlockpt(master), 0);
+  const int slave = open(ptsname(master), O_RDWR | O_NOCTTY);
+  EXPECT_GE(slave, 0);
+  termios mode;
+  tcgetattr(slave, &mode);
+  cfmakeraw(&mode);  // line ends as they are written
+  tcsetattr(slave, TCSANOW, &mode);
+  std::string text = captured(slave, master, write);
+  close(slave);
+  close(master);
+  return text;
+}
+
+bool matches(const std::string& text, const std::string& pattern) {
+  regex_t compiled;
+  EXPECT_EQ(regcomp(&compiled, pattern.c_str(), REG_EXTENDED | REG_NOSUB), 0);
+  const bool found = regexec(&compiled, text.c_str(), 0, nullptr, 0) == 0;
+  regfree(&compiled);
+  return found;
+}
+
+// The line's text, behind time, priority, tag, process and thread.
+std::string text_of(const std::string& line) {
+  const size_t at = line.find(": ");
+  return at == std::string::npos ? "no line: " + line : line.substr(at + 2);
+}
+
+TEST(DlogStandin, WhenCalled_PrintsTimePriorityTagProcessAndThread) {
+  const std::string line =
+      on_pipe([] { __dlog_print(0, 5, "TAG", "%s is %d and %lld", "x", -1, 5000000000LL); });
+  const std::string process = std::to_string(getpid());
+  const std::string pattern = "^[0-2][0-9]:[0-5][0-9]:[0-6][0-9]\\.[0-9]{3} W TAG P" + process + " T" +
+                              process + ": x is -1 and 5000000000\n$";
+  EXPECT_TRUE(matches(line, pattern)) << line;
+}
+
+TEST(DlogStandin, WhenCalledByAnotherThread_PrintsThatThreadsId) {
+  long id = 0;
+  const std::string line = on_pipe([&] {
+    std::thread([&] {
+      id = syscall(SYS_gettid);
+      __dlog_print(0, 3, "TAG", "text");
+    }).join();
+  });
+  EXPECT_NE(line.find(" T" + std::to_string(id) + ": text\n"), std::string::npos) << line;
+}
+
+TEST(DlogStandin, OfEachPriority_PrintsTheLetter) {
+  const std::string letters = "??VDIWEFS?";
+  for (int priority = 0; priority < static_cast<int>(letters.size()); ++priority) {
+    const std::string line = on_pipe([&] { __dlog_print(0, priority, "TAG", "text"); });
+    EXPECT_EQ(line.substr(13, 2), letters.substr(static_cast<size_t>(priority), 1) + " ");
+  }
+}
+
+TEST(DlogStandin, WhenPriorityIsNegative_PrintsAQuestionMark) {
+  const std::string line = on_pipe([] { __dlog_print(0, -1, "TAG", "text"); });
+  EXPECT_EQ(line.substr(13, 2), "? ");
+}
+
+TEST(DlogStandin, OnATerminal_KeepsColours) {
+  const std::string line = on_terminal([] { __dlog_print(0, 6, "T", "a \033[31m[%d]b\033[0m", 7); });
+  EXPECT_EQ(text_of(line), "a \033[31m[7]b\033[0m\n");
+}
+
+TEST(DlogStandin, ElsewhereThanOnATerminal_RemovesColours) {
+  const std::string line = on_pipe([] { __dlog_print(0, 6, "T", "a \033[31m[%d]b\033[0m", 7); });
+  EXPECT_EQ(text_of(line), "a [7]b\n");
+}
+
+TEST(DlogStandin, WhenTextHasALineBreak_StaysOneLine) {
+  const std::string line = on_pipe([] { __dlog_print(0, 3, "T", "count=3\n\033[0m"); });
+  EXPECT_EQ(text_of(line), "count=3\\n\n");
+}
+
+TEST(DlogStandin, WhenTextIsTooLong_PrintsOneLineOf4096Bytes) {
+  const std::string text(10000, 'x');
+  const std::string line = on_pipe([&] { __dlog_print(0, 3, "T", "%s", text.c_str()); });
+  EXPECT_LE(line.size(), 4096u);
+  EXPECT_GT(line.size(), 4000u);
+  EXPECT_EQ(std::count(line.begin(), line.end(), '\n'), 1);
+  EXPECT_EQ(line.back(), '\n');
+}
+
+TEST(DlogStandin, WhenTagIsTooLong_PrintsOneLine) {
+  const std::string tag(10000, 'x');
+  const std::string line = on_pipe([&] { __dlog_print(0, 3, tag.c_str(), "text"); });
+  EXPECT_LE(line.size(), 4096u);
+  EXPECT_EQ(line.back(), '\n');
+}
+
+TEST(DlogStandin, WhenAPriorityIsAskedFor_PrintsItAndThoseAbove) {
+  setenv("DLOG_STANDIN_PRIORITY", "W", 1);
+  EXPECT_EQ(on_pipe([] { __dlog_print(0, 4, "T", "text"); }), "");
+  EXPECT_NE(on_pipe([] { __dlog_print(0, 5, "T", "text"); }), "");
+  unsetenv("DLOG_STANDIN_PRIORITY");
+}
+
+TEST(DlogStandin, WhenSilenceIsAskedFor_PrintsNothing) {
+  setenv("DLOG_STANDIN_PRIORITY", "S", 1);
+  EXPECT_EQ(on_pipe([] { __dlog_print(0, 6, "T", "text"); }), "");
+  unsetenv("DLOG_STANDIN_PRIORITY");
+}
+
+}  // namespace

@@ -1,0 +1,116 @@
+#include "support/heap.h"
+
+#include <dlfcn.h>
+
+#include <algorithm>
+#include <array>
+#include <cstdlib>
+#include <cstring>
+#include <new>
+
+namespace {
+
+constexpr size_t kMost = 4096;
+
+// Plain arrays: nothing here may allocate.
+struct Record {
+  bool on = false;
+  size_t callocs = 0;
+  std::array<support::HeapWatch::Block, kMost> calloc_blocks = {};
+  size_t news = 0;
+  std::array<std::pair<void*, size_t>, kMost> new_blocks = {};
+};
+
+thread_local Record record;
+thread_local int callocs_until_failure = 0;
+
+using Calloc = void* (*)(size_t, size_t);
+
+// Serves the dynamic loader's own wishes while it looks the real function up.
+void* early_calloc(size_t size) {
+  alignas(16) static char memory[65536];
+  static size_t used = 0;
+  const size_t at = used;
+  used += (size + 15) / 16 * 16;
+  return used <= sizeof memory ? memory + at : nullptr;
+}
+
+Calloc real_calloc() {
+  static Calloc found = nullptr;
+  static bool searching = false;
+  if (found == nullptr && !searching) {
+    searching = true;
+    void* symbol = dlsym(RTLD_NEXT, "calloc");
+    std::memcpy(&found, &symbol, sizeof found);
+    searching = false;
+  }
+  return found;
+}
+
+}  // namespace
+
+// In the program itself, so that every library's calls come here.
+extern "C" void* calloc(size_t elements, size_t element_size) noexcept {
+  const Calloc real = real_calloc();
+  if (real == nullptr) {
+    return early_calloc(elements * element_size);
+  }
+  if (callocs_until_failure > 0 && --callocs_until_failure == 0) {
+    return nullptr;
+  }
+  if (record.on && record.callocs < kMost) {
+    record.calloc_blocks[record.callocs++] = {elements, element_size};
+  }
+  return real(elements, element_size);
+}
+
+void* operator new(size_t size) {
+  void* block = std::malloc(size > 0 ? size : 1);
+  if (block == nullptr) {
+    throw std::bad_alloc();
+  }
+  if (record.on && record.news < kMost) {
+    record.new_blocks[record.news++] = {block, size};
+  }
+  return block;
+}
+
+void operator delete(void* block) noexcept {
+  for (size_t i = 0; record.on && i < record.news; ++i) {
+    if (record.new_blocks[i].first == block) {
+      record.new_blocks[i] = record.new_blocks[--record.news];
+      break;
+    }
+  }
+  std::free(block);
+}
+
+void operator delete(void* block, size_t /*size*/) noexcept { operator delete(block); }
+
+namespace support {
+
+FailingCalloc::FailingCalloc(int n) { callocs_until_failure = n; }
+FailingCalloc::~FailingCalloc() { callocs_until_failure = 0; }
+
+HeapWatch::HeapWatch() {
+  record.callocs = 0;
+  record.news = 0;
+  record.on = true;
+}
+
+void HeapWatch::stop() {
+  if (!record.on) {
+    return;
+  }
+  record.on = false;  // before the vectors below allocate
+  callocs_.assign(record.calloc_blocks.begin(), record.calloc_blocks.begin() + record.callocs);
+  for (size_t i = 0; i < record.news; ++i) {
+    kept_.push_back(record.new_blocks[i].second);
+  }
+  std::sort(kept_.begin(), kept_.end());
+}
+
+HeapPause::HeapPause() : was_on_(record.on) { record.on = false; }
+HeapPause::~HeapPause() { record.on = was_on_; }
+
+}  // namespace support

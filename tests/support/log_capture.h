@@ -1,0 +1,49 @@
+// The tests' own __dlog_print: keeps every call with all its arguments.
+#ifndef TESTS_SUPPORT_LOG_CAPTURE_H
+#define TESTS_SUPPORT_LOG_CAPTURE_H
+
+#include <ostream>
+#include <string>
+#include <variant>
+#include <vector>
+
+namespace support {
+
+// One variadic argument, of the type that its conversion names: %d, %lld, %s.
+using LogArgument = std::variant<int, long long, std::string>;
+
+struct LogCall {
+  int log_id;
+  int priority;
+  std::string tag;
+  std::string format;
+  std::vector<LogArgument> arguments;
+  int thread;  // that called
+};
+
+// What is expected of one line, but for the frame that all lines share.
+struct Line {
+  int priority;
+  std::string text;
+  std::vector<LogArgument> arguments;
+};
+
+Line debug(std::string text, std::vector<LogArgument> arguments = {});
+Line warn(std::string text, std::vector<LogArgument> arguments = {});
+Line error(std::string text, std::vector<LogArgument> arguments = {});
+
+// All calls since the last clear_log(), of all threads, in order.
+std::vector<LogCall> logged_calls();
+void clear_log();
+
+// The log holds exactly these lines: each in the frame of its priority, naming the module, the
+// function, a line of that function that is not above the line before, and the calling thread.
+// Clears the log.
+void expect_log(const std::string& function, const std::vector<Line>& lines);
+
+// Line number of the module's source, from 1.
+std::string module_line(int number);
+
+}  // namespace support
+
+#endif
