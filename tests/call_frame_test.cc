@@ -25,9 +25,13 @@ using support::Line;
 using support::logged_calls;
 using support::Received;
 
-int log_line_number(size_t call) { return std::get<int>(logged_calls().at(call).arguments.at(2)); }
+int log_line_number(size_t call) {
+  return std::get<int>(logged_calls().at(call).arguments.at(2));
+}
 
-int log_thread(size_t call) { return std::get<int>(logged_calls().at(call).arguments.at(3)); }
+int log_thread(size_t call) {
+  return std::get<int>(logged_calls().at(call).arguments.at(3));
+}
 
 // ---- Serializers
 
@@ -53,7 +57,9 @@ const Serializer kSerializers[] = {
      [](unsigned char** data, int* size) { return current_time_request_serialize(1, data, size); }},
 };
 
-void PrintTo(const Serializer& function, std::ostream* out) { *out << function.name; }
+void PrintTo(const Serializer& function, std::ostream* out) {
+  *out << function.name;
+}
 
 class EverySerializer : public support::ExchangeTest,
                         public ::testing::WithParamInterface<Serializer> {
@@ -156,8 +162,13 @@ struct Deserializer {
 
 const Deserializer kDeserializers[] = {
     // requestId 150, result { code 1000, msg "ok" }
-    {"channel_auth_reply_deserialize", "%s start", false, true,
-     hex("08 96 01 12 07 08 e8 07 12 02 6f 6b"), {0, 3, 5, 8}, {},
+    {"channel_auth_reply_deserialize",
+     "%s start",
+     false,
+     true,
+     hex("08 96 01 12 07 08 e8 07 12 02 6f 6b"),
+     {0, 3, 5, 8},
+     {},
      [](const unsigned char* data, int size) {
        int64_t request_id = kLongSentinel;
        int code = kIntSentinel;
@@ -166,7 +177,13 @@ const Deserializer kDeserializers[] = {
        return request_id == kLongSentinel && code == kIntSentinel && text.untouched();
      }},
     // requestId 150
-    {"client_echo_deserialize", "%s start", true, true, hex("08 96 01"), {0}, {},
+    {"client_echo_deserialize",
+     "%s start",
+     true,
+     true,
+     hex("08 96 01"),
+     {0},
+     {},
      [](const unsigned char* data, int size) {
        int64_t request_id = kLongSentinel;
        client_echo_deserialize(data, size, &request_id);
@@ -174,7 +191,10 @@ const Deserializer kDeserializers[] = {
      }},
     // userId 9, deviceId 8, requestId 7, chatroomId 6, result { code 3, msg "no" },
     // processedMessageEntries { msgId 1, sentTime 300 }
-    {"chat_reply_deserialize", "%s: start", true, false,
+    {"chat_reply_deserialize",
+     "%s: start",
+     true,
+     false,
      hex("08 09 10 08 58 07 60 06 6a 06 08 03 12 02 6e 6f 72 05 08 01 10 ac 02"),
      {0, 2, 4, 6, 8, 10, 12, 16, 18, 20},
      {support::debug("processed msg entry size : %d", {0})},
@@ -192,8 +212,13 @@ const Deserializer kDeserializers[] = {
               text.untouched() && count == kIntSentinel && ids.untouched() && times.untouched();
      }},
     // userId 9, deviceId 8, requestId 7, result { code 3, msg "no" }, currentTimeMillis 1500
-    {"current_time_deserialize", "%s: start", true, false,
-     hex("08 09 10 08 58 07 62 06 08 03 12 02 6e 6f 68 dc 0b"), {0, 2, 4, 6, 8, 10, 14}, {},
+    {"current_time_deserialize",
+     "%s: start",
+     true,
+     false,
+     hex("08 09 10 08 58 07 62 06 08 03 12 02 6e 6f 68 dc 0b"),
+     {0, 2, 4, 6, 8, 10, 14},
+     {},
      [](const unsigned char* data, int size) {
        int64_t request_id = kLongSentinel;
        int64_t millis = kLongSentinel;
@@ -205,7 +230,9 @@ const Deserializer kDeserializers[] = {
      }},
 };
 
-void PrintTo(const Deserializer& function, std::ostream* out) { *out << function.name; }
+void PrintTo(const Deserializer& function, std::ostream* out) {
+  *out << function.name;
+}
 
 // A field that no message has, number 1000, as an unknown group: its start and its end.
 const char kGroupStart[] = "c3 3e";
@@ -265,14 +292,15 @@ TEST_P(EveryDeserializer, WhenInputIsEmpty_SucceedsAndLogsEntryAndExit) {
   expect_log(function_.name, lines);
 }
 
-TEST_P(EveryDeserializer, WhenMessageIsWhole_Succeeds) { expect_success(function_.whole); }
+TEST_P(EveryDeserializer, WhenMessageIsWhole_Succeeds) {
+  expect_success(function_.whole);
+}
 
 TEST_P(EveryDeserializer, WhenCutWithinAField_WritesNothingAndLogsBothErrors) {
   for (size_t cut = 0; cut < function_.whole.size(); ++cut) {
     SCOPED_TRACE(cut);
     if (function_.clean_cuts.count(cut) == 0) {
-      expect_failure(function_.whole.substr(0, cut),
-                     {support::kMergeError, support::kStreamError});
+      expect_failure(function_.whole.substr(0, cut), {support::kMergeError, support::kStreamError});
     }
   }
 }

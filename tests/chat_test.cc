@@ -58,8 +58,7 @@ class ChatRequestSerialize : public ExchangeTest {
 TEST_F(ChatRequestSerialize, WhenCalled_EncodesOneMessageAndNoIdsOfTheSender) {
   call(1, 300, 5, 1, "hi", 60);
   ASSERT_EQ(out_.status, 0);
-  EXPECT_EQ(to_hex(out_.data, out_.size),
-            "58 01 60 ac 02 6a 0a 08 05 10 01 1a 02 68 69 20 3c");
+  EXPECT_EQ(to_hex(out_.data, out_.size), "58 01 60 ac 02 6a 0a 08 05 10 01 1a 02 68 69 20 3c");
 }
 
 TEST_F(ChatRequestSerialize, WhenValuesAreZeroAndEmpty_EncodesThemAsPresent) {
@@ -196,7 +195,9 @@ class ChatReplyDeserialize : public ExchangeTest {
   }
   support::Line start() const { return support::warn("%s: start", {name_}); }
   support::Line exit() const { return support::warn("%s: exit", {name_}); }
-  static support::Line entries(int n) { return support::debug("processed msg entry size : %d", {n}); }
+  static support::Line entries(int n) {
+    return support::debug("processed msg entry size : %d", {n});
+  }
   static support::Line allocation_error() {
     return support::error("memory allocation error(msgId, sentTime)");
   }
@@ -383,18 +384,16 @@ TEST_F(ChatReplyDeserialize, WhenCountIsNull_Faults) {
 
 TEST_F(ChatReplyDeserialize, WhenMsgIdsIsNullAndThereAreEntries_Faults) {
   const Received received(hex(kChatReply));
-  EXPECT_EXIT(
-      chat_reply_deserialize(received.data(), received.size(), &request_id_, &chatroom_id_, &code_,
-                             &text_.text, &count_, nullptr, &times_.ids),
-      support::faults, "");
+  EXPECT_EXIT(chat_reply_deserialize(received.data(), received.size(), &request_id_, &chatroom_id_,
+                                     &code_, &text_.text, &count_, nullptr, &times_.ids),
+              support::faults, "");
 }
 
 TEST_F(ChatReplyDeserialize, WhenSentTimesIsNullAndThereAreEntries_Faults) {
   const Received received(hex(kChatReply));
-  EXPECT_EXIT(
-      chat_reply_deserialize(received.data(), received.size(), &request_id_, &chatroom_id_, &code_,
-                             &text_.text, &count_, &ids_.ids, nullptr),
-      support::faults, "");
+  EXPECT_EXIT(chat_reply_deserialize(received.data(), received.size(), &request_id_, &chatroom_id_,
+                                     &code_, &text_.text, &count_, &ids_.ids, nullptr),
+              support::faults, "");
 }
 
 }  // namespace

@@ -80,8 +80,8 @@ TEST(DlogStandin, WhenCalled_PrintsTimePriorityTagProcessAndThread) {
   const std::string line =
       on_pipe([] { __dlog_print(0, 5, "TAG", "%s is %d and %lld", "x", -1, 5000000000LL); });
   const std::string process = std::to_string(getpid());
-  const std::string pattern = "^[0-2][0-9]:[0-5][0-9]:[0-6][0-9]\\.[0-9]{3} W TAG P" + process + " T" +
-                              process + ": x is -1 and 5000000000\n$";
+  const std::string pattern = "^[0-2][0-9]:[0-5][0-9]:[0-6][0-9]\\.[0-9]{3} W TAG P" + process +
+                              " T" + process + ": x is -1 and 5000000000\n$";
   EXPECT_TRUE(matches(line, pattern)) << line;
 }
 
@@ -110,7 +110,8 @@ TEST(DlogStandin, WhenPriorityIsNegative_PrintsAQuestionMark) {
 }
 
 TEST(DlogStandin, OnATerminal_KeepsColours) {
-  const std::string line = on_terminal([] { __dlog_print(0, 6, "T", "a \033[31m[%d]b\033[0m", 7); });
+  const std::string line =
+      on_terminal([] { __dlog_print(0, 6, "T", "a \033[31m[%d]b\033[0m", 7); });
   EXPECT_EQ(text_of(line), "a \033[31m[7]b\033[0m\n");
 }
 

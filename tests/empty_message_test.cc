@@ -7,15 +7,22 @@
 #include "support/heap.h"
 
 // In the program itself, so that the library's virtual calls come here.
-int ChannelAuthRequest::ByteSize() const { return 0; }
-int ClientEchoReply::ByteSize() const { return 0; }
-int ChatRequest::ByteSize() const { return 0; }
-int CurrentTimeRequest::ByteSize() const { return 0; }
+int ChannelAuthRequest::ByteSize() const {
+  return 0;
+}
+int ClientEchoReply::ByteSize() const {
+  return 0;
+}
+int ChatRequest::ByteSize() const {
+  return 0;
+}
+int CurrentTimeRequest::ByteSize() const {
+  return 0;
+}
 
 namespace {
 
 using support::Encoded;
-using support::Line;
 
 class EmptyMessage : public support::ExchangeTest {
  protected:

@@ -1,5 +1,5 @@
-// The example's two programs against another end that misbehaves: each must stop by itself, say why,
-// and exit with 1.
+// The example's two programs against another end that misbehaves: each must stop by itself, say
+// why, and exit with 1.
 
 #include <arpa/inet.h>
 #include <fcntl.h>
@@ -18,8 +18,6 @@
 
 #include "../examples/framing.h"
 #include "support/wire.h"
-
-extern char** environ;
 
 namespace {
 
@@ -42,7 +40,8 @@ class Program {
       arguments.push_back(word.data());
     }
     arguments.push_back(nullptr);
-    EXPECT_EQ(posix_spawn(&process_, arguments[0], &actions, nullptr, arguments.data(), environ), 0);
+    EXPECT_EQ(posix_spawn(&process_, arguments[0], &actions, nullptr, arguments.data(), environ),
+              0);
     posix_spawn_file_actions_destroy(&actions);
     close(ends[1]);
   }
@@ -78,10 +77,10 @@ sockaddr_in loopback(int port) {
 }
 
 void send_message(int connection, const std::string& name, const std::string& bytes) {
-  EXPECT_EQ(frame_send(connection, name.c_str(),
-                       reinterpret_cast<const unsigned char*>(bytes.data()),
-                       static_cast<int>(bytes.size())),
-            0);
+  EXPECT_EQ(
+      frame_send(connection, name.c_str(), reinterpret_cast<const unsigned char*>(bytes.data()),
+                 static_cast<int>(bytes.size())),
+      0);
 }
 
 // The name of the next message, or "" at the connection's end.
@@ -158,13 +157,21 @@ TEST_F(PluginSession, WhenTheConnectionEnds_Fails) {
 }
 
 TEST_F(PluginSession, WhenAFrameIsCutShort_Fails) {
-  ASSERT_EQ(send(connection_, "\x10" "Chan", 5, 0), 5);
+  ASSERT_EQ(send(connection_,
+                 "\x10"
+                 "Chan",
+                 5, 0),
+            5);
   shutdown(connection_, SHUT_RDWR);
   expect_failure("the connection ended or fell silent where a reply was due");
 }
 
 TEST_F(PluginSession, WhenAFrameClaimsTooLongAMessage_Fails) {
-  ASSERT_EQ(send(connection_, "\x01" "X\x7f\xff\xff\xff", 6, 0), 6);
+  ASSERT_EQ(send(connection_,
+                 "\x01"
+                 "X\x7f\xff\xff\xff",
+                 6, 0),
+            6);
   expect_failure("the connection ended or fell silent where a reply was due");
 }
 
@@ -224,7 +231,8 @@ class FrontEnd : public ::testing::Test {
   void TearDown() override { close(connection_); }
 
   static Wire auth() {
-    return Wire().number(1, 1).number(2, 2).number(3, 3).text(5, "app").text(6, "example-access-token");
+    return Wire().number(1, 1).number(2, 2).number(3, 3).text(5, "app").text(
+        6, "example-access-token");
   }
   void authenticate() {
     send_message(connection_, "ChannelAuthRequest", auth().bytes());
@@ -299,7 +307,11 @@ TEST_F(FrontEnd, WhenTheSessionEndsTooEarly_Fails) {
 }
 
 TEST_F(FrontEnd, WhenTheConnectionBreaksWithinAFrame_Fails) {
-  ASSERT_EQ(send(connection_, "\x10" "Chan", 5, 0), 5);
+  ASSERT_EQ(send(connection_,
+                 "\x10"
+                 "Chan",
+                 5, 0),
+            5);
   expect_failure("the connection broke or fell silent");
 }
 

@@ -54,18 +54,19 @@ TEST(Interop, OfChatRequest_PeerReadsOneMessage) {
 }
 
 TEST(Interop, OfChannelAuthReply_ReadsWhatThePeerWrote) {
-  const Received received(peer_encode(
-      "ChannelAuthReply",
-      "requestId: 77 result { code: -3 msg: 'Gr\\303\\274\\303\\237e' subCode: 5 "
-      "wrongReceiverDetail { invalidReceivers: 1 } }"));
+  const Received received(
+      peer_encode("ChannelAuthReply",
+                  "requestId: 77 result { code: -3 msg: 'Gr\\303\\274\\303\\237e' subCode: 5 "
+                  "wrongReceiverDetail { invalidReceivers: 1 } }"));
   int64_t request_id = kLongSentinel;
   int code = kIntSentinel;
   support::TextOutput text;
   channel_auth_reply_deserialize(received.data(), received.size(), &request_id, &code, &text.text);
   EXPECT_EQ(request_id, 77);
   EXPECT_EQ(code, -3);
-  EXPECT_STREQ(text.text, "Gr\xc3\xbc\xc3\x9f"
-                          "e");
+  EXPECT_STREQ(text.text,
+               "Gr\xc3\xbc\xc3\x9f"
+               "e");
 }
 
 TEST(Interop, OfClientEcho_ReadsWhatThePeerWrote) {

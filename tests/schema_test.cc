@@ -308,8 +308,8 @@ TEST(IsValid, OfMsgType_AcceptsItsMembersAlone) {
 }
 
 TEST(IsValid, OfNotiType_AcceptsItsMembersAlone) {
-  EXPECT_EQ(accepted(&NotiType_IsValid), (std::set<int>{0,  1,  2,  3,  4,  5,  6,  7,  20,
-                                                        21, 22, 23, 24, 25, 30, 31, 32, 33}));
+  EXPECT_EQ(accepted(&NotiType_IsValid),
+            (std::set<int>{0, 1, 2, 3, 4, 5, 6, 7, 20, 21, 22, 23, 24, 25, 30, 31, 32, 33}));
 }
 
 TEST(IsValid, OfIsTypingContentType_AcceptsItsMembersAlone) {

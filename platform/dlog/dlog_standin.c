@@ -28,8 +28,10 @@ int __dlog_print(int log_id, int priority, const char* tag, const char* format, 
     __attribute__((format(printf, 4, 5)));
 
 static char priority_letter(int priority) {
-  int known = priority >= 0 && priority < (int)sizeof(priority_letters) - 1;
-  return known ? priority_letters[priority] : '?';
+  if (priority < 0 || priority >= (int)sizeof(priority_letters) - 1) {
+    return priority_letters[0];
+  }
+  return priority_letters[priority];
 }
 
 static int is_printed(int priority) {

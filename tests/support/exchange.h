@@ -103,8 +103,7 @@ constexpr size_t kStreamSize = sizeof(google::protobuf::io::CodedInputStream);
 
 // The two error texts of a parse.
 inline const char kMergeError[] = "merge error : Could not parse the received data!";
-inline const char kStreamError[] =
-    "ConsumedEntireMessage error :Could not parse the received data";
+inline const char kStreamError[] = "ConsumedEntireMessage error :Could not parse the received data";
 
 }  // namespace support
 

@@ -85,12 +85,18 @@ void operator delete(void* block) noexcept {
   std::free(block);
 }
 
-void operator delete(void* block, size_t /*size*/) noexcept { operator delete(block); }
+void operator delete(void* block, size_t /*size*/) noexcept {
+  operator delete(block);
+}
 
 namespace support {
 
-FailingCalloc::FailingCalloc(int n) { callocs_until_failure = n; }
-FailingCalloc::~FailingCalloc() { callocs_until_failure = 0; }
+FailingCalloc::FailingCalloc(int n) {
+  callocs_until_failure = n;
+}
+FailingCalloc::~FailingCalloc() {
+  callocs_until_failure = 0;
+}
 
 HeapWatch::HeapWatch() {
   record.callocs = 0;
@@ -110,7 +116,11 @@ void HeapWatch::stop() {
   std::sort(kept_.begin(), kept_.end());
 }
 
-HeapPause::HeapPause() : was_on_(record.on) { record.on = false; }
-HeapPause::~HeapPause() { record.on = was_on_; }
+HeapPause::HeapPause() : was_on_(record.on) {
+  record.on = false;
+}
+HeapPause::~HeapPause() {
+  record.on = was_on_;
+}
 
 }  // namespace support

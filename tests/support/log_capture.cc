@@ -52,7 +52,8 @@ std::pair<int, int> lines_of(const std::string& function) {
   int first = 0;
   for (size_t i = 0; i < source.size(); ++i) {
     const std::string& line = source[i];
-    if (line.rfind("int " + function + "(", 0) == 0 || line.rfind("void " + function + "(", 0) == 0) {
+    if (line.rfind("int " + function + "(", 0) == 0 ||
+        line.rfind("void " + function + "(", 0) == 0) {
       first = static_cast<int>(i) + 1;
     }
     if (first != 0 && line == "}") {

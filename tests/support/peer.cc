@@ -16,18 +16,19 @@ std::string read_file(const std::string& path) {
 }
 
 // Runs protoc with the given input and returns its output.
-std::string run_peer(const std::string& mode, const std::string& message, const std::string& input) {
+std::string run_peer(const std::string& mode, const std::string& message,
+                     const std::string& input) {
   char folder[] = "/tmp/peer-XXXXXX";
   if (mkdtemp(folder) == nullptr) {
     throw std::runtime_error("no temporary folder");
   }
   const std::string base = folder;
   std::ofstream(base + "/in", std::ios::binary) << input;
-  const std::string command = "'" QEL_PEER_PROTOC "' --proto_path='" QEL_SCHEMA_FOLDER "' --" + mode +
-                              "=" + message + " msgspec_frontend.proto <" + base + "/in >" + base +
-                              "/out 2>" + base + "/messages";
+  const std::string command = "'" QEL_PEER_PROTOC "' --proto_path='" QEL_SCHEMA_FOLDER "' --" +
+                              mode + "=" + message + " msgspec_frontend.proto <" + base + "/in >" +
+                              base + "/out 2>" + base + "/messages";
   const int status = std::system(command.c_str());
-  const std::string output = read_file(base + "/out");
+  std::string output = read_file(base + "/out");
   const std::string messages = read_file(base + "/messages");
   for (const char* name : {"/in", "/out", "/messages"}) {
     unlink((base + name).c_str());

@@ -9,7 +9,9 @@
 
 namespace support {
 
-inline bool aborts(int status) { return WIFSIGNALED(status) && WTERMSIG(status) == SIGABRT; }
+inline bool aborts(int status) {
+  return WIFSIGNALED(status) && WTERMSIG(status) == SIGABRT;
+}
 
 // A NULL pointer that is read or written through.
 inline bool faults(int status) {

@@ -69,6 +69,8 @@ Wire& Wire::text(int field, const std::string& value) {
   return *this;
 }
 
-Wire& Wire::message(int field, const Wire& value) { return text(field, value.bytes()); }
+Wire& Wire::message(int field, const Wire& value) {
+  return text(field, value.bytes());
+}
 
 }  // namespace support

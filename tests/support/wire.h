@@ -17,9 +17,9 @@ std::string to_hex(const unsigned char* bytes, int size);
 // Builds a message field by field, with an encoder of its own.
 class Wire {
  public:
-  Wire& number(int field, int64_t value);                  // int32, int64, bool, enumerations
-  Wire& text(int field, const std::string& value);         // string, bytes
-  Wire& message(int field, const Wire& value);             // an embedded message
+  Wire& number(int field, int64_t value);           // int32, int64, bool, enumerations
+  Wire& text(int field, const std::string& value);  // string, bytes
+  Wire& message(int field, const Wire& value);      // an embedded message
   const std::string& bytes() const { return bytes_; }
 
  private:
