@@ -363,6 +363,15 @@ TEST_P(EveryDeserializer, WhenTheStreamDoesNotEndCleanly_KeepsTheStream) {
   EXPECT_EQ(kept(hex("00")), std::vector<size_t>{support::kStreamSize});
 }
 
+TEST_P(EveryDeserializer, WhenTheStreamCannotBeAllocated_ThrowsAfterItsEntryLine) {
+  const Received received(function_.whole);
+  {
+    const support::FailingNew fault(1);
+    EXPECT_THROW(function_.leaves_outputs(received.data(), received.size()), std::bad_alloc);
+  }
+  expect_log(function_.name, {entry()});
+}
+
 TEST_P(EveryDeserializer, WhenLogging_NamesTheLinesOfItsSteps) {
   leaves_outputs(function_.whole.substr(0, 1));  // logs entry and both errors
   ASSERT_EQ(logged_calls().size(), 3u);

@@ -170,6 +170,17 @@ TEST_F(ChatRequestSerialize, WhenMultiByteTextHas40000Bytes_EncodesIt) {
   EXPECT_EQ(out_.bytes(), expected(0, text));
 }
 
+TEST_F(ChatRequestSerialize, WhenTheTextCannotBeCopied_ThrowsAndDestroysTheMessage) {
+  support::HeapWatch watch;
+  {
+    const support::FailingNew fault(3);  // after the list of messages and the message in it
+    EXPECT_THROW(call_with_text("x"), std::bad_alloc);
+  }
+  watch.stop();
+  EXPECT_EQ(watch.kept(), std::vector<size_t>{});
+  EXPECT_TRUE(out_.untouched());
+}
+
 TEST_F(ChatRequestSerialize, WhenTextIsTooLongAndTypeOutOfRange_NamesTheType) {
   call(1, 2, 3, 31, std::string(40001, 'x').c_str(), 4);
   expect_refused(support::error("msgType is out of range(0~6)"));
@@ -320,6 +331,11 @@ TEST_F(ChatReplyDeserialize, WhenResultIsEmpty_WritesCodeZeroAndLeavesText) {
 TEST_F(ChatReplyDeserialize, WhenTextIsEmptyButPresent_WritesEmptyText) {
   call(hex("6a 02 12 00"));
   EXPECT_STREQ(text_.text, "");
+}
+
+TEST_F(ChatReplyDeserialize, WhenTextHoldsANul_CopiesUpToIt) {
+  call(hex("6a 05 12 03 61 00 62"));
+  EXPECT_STREQ(text_.text, "a");
 }
 
 TEST_F(ChatReplyDeserialize, WhenTheFirstFourOutputsAreNull_WritesTheOthers) {

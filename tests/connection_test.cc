@@ -4,6 +4,7 @@
 
 #include "qel-message-serialize.h"
 #include "support/exchange.h"
+#include "support/heap.h"
 #include "support/process_death.h"
 
 namespace {
@@ -143,6 +144,11 @@ TEST_F(ChannelAuthReplyDeserialize, WhenResultCodeIsNull_Faults) {
 TEST_F(ChannelAuthReplyDeserialize, WhenResultMsgIsNull_Faults) {
   EXPECT_EXIT(channel_auth_reply_deserialize(nullptr, 0, &request_id_, &code_, nullptr),
               support::faults, "");
+}
+
+TEST_F(ChannelAuthReplyDeserialize, WhenTextHoldsANul_CopiesUpToIt) {
+  call(hex("12 05 12 03 61 00 62"));
+  EXPECT_STREQ(text_.text, "a");
 }
 
 // ---- client_echo_reply_serialize
@@ -311,6 +317,18 @@ TEST_F(CurrentTimeDeserialize, WhenTextIsNull_WritesCode) {
   current_time_deserialize(received.data(), received.size(), &request_id_, &millis_, &code_,
                            nullptr);
   EXPECT_EQ(code_, 3);
+}
+
+TEST_F(CurrentTimeDeserialize, WhenTheStreamCannotBeAllocated_WritesNothing) {
+  {
+    const support::FailingNew fault(1);
+    EXPECT_THROW(current_time_deserialize(nullptr, 0, &request_id_, &millis_, &code_, &text_.text),
+                 std::bad_alloc);
+  }
+  EXPECT_EQ(request_id_, kLongSentinel);
+  EXPECT_EQ(millis_, kLongSentinel);
+  EXPECT_EQ(code_, kIntSentinel);
+  EXPECT_TRUE(text_.untouched());
 }
 
 TEST_F(CurrentTimeDeserialize, WhenRequestIdIsNull_Faults) {

@@ -23,6 +23,8 @@ struct Record {
 
 thread_local Record record;
 thread_local int callocs_until_failure = 0;
+thread_local int news_until_failure = 0;
+thread_local bool paused = false;
 
 using Calloc = void* (*)(size_t, size_t);
 
@@ -55,6 +57,9 @@ extern "C" void* calloc(size_t elements, size_t element_size) noexcept {
   if (real == nullptr) {
     return early_calloc(elements * element_size);
   }
+  if (paused) {
+    return real(elements, element_size);
+  }
   if (callocs_until_failure > 0 && --callocs_until_failure == 0) {
     return nullptr;
   }
@@ -65,11 +70,12 @@ extern "C" void* calloc(size_t elements, size_t element_size) noexcept {
 }
 
 void* operator new(size_t size) {
-  void* block = std::malloc(size > 0 ? size : 1);
+  const bool fails = !paused && news_until_failure > 0 && --news_until_failure == 0;
+  void* block = fails ? nullptr : std::malloc(size > 0 ? size : 1);
   if (block == nullptr) {
     throw std::bad_alloc();
   }
-  if (record.on && record.news < kMost) {
+  if (record.on && !paused && record.news < kMost) {
     record.new_blocks[record.news++] = {block, size};
   }
   return block;
@@ -98,6 +104,14 @@ FailingCalloc::~FailingCalloc() {
   callocs_until_failure = 0;
 }
 
+FailingNew::FailingNew(int n) {
+  news_until_failure = n;
+}
+
+FailingNew::~FailingNew() {
+  news_until_failure = 0;
+}
+
 HeapWatch::HeapWatch() {
   record.callocs = 0;
   record.news = 0;
@@ -116,11 +130,11 @@ void HeapWatch::stop() {
   std::sort(kept_.begin(), kept_.end());
 }
 
-HeapPause::HeapPause() : was_on_(record.on) {
-  record.on = false;
+HeapPause::HeapPause() {
+  paused = true;
 }
 HeapPause::~HeapPause() {
-  record.on = was_on_;
+  paused = false;
 }
 
 }  // namespace support

@@ -1,4 +1,4 @@
-// The heap under observation: callocs that fail on demand, and the blocks of operator new.
+// The heap under observation: allocations that fail on demand, and the blocks of operator new.
 #ifndef TESTS_SUPPORT_HEAP_H
 #define TESTS_SUPPORT_HEAP_H
 
@@ -14,6 +14,15 @@ class FailingCalloc {
   ~FailingCalloc();
   FailingCalloc(const FailingCalloc&) = delete;
   FailingCalloc& operator=(const FailingCalloc&) = delete;
+};
+
+// While it lives, the n-th operator new of this thread from its construction on throws, n from 1.
+class FailingNew {
+ public:
+  explicit FailingNew(int n);
+  ~FailingNew();
+  FailingNew(const FailingNew&) = delete;
+  FailingNew& operator=(const FailingNew&) = delete;
 };
 
 // Watches the calling thread from its construction until stop().
@@ -41,16 +50,13 @@ class HeapWatch {
   std::vector<size_t> kept_;
 };
 
-// While it lives, the watch does not see what the calling thread does: for the tests' own blocks.
+// While it lives, the calling thread's allocations neither fail nor show: for the tests' own.
 class HeapPause {
  public:
   HeapPause();
   ~HeapPause();
   HeapPause(const HeapPause&) = delete;
   HeapPause& operator=(const HeapPause&) = delete;
-
- private:
-  bool was_on_;
 };
 
 }  // namespace support
