@@ -9,9 +9,8 @@
 #include <set>
 #include <thread>
 
-#include "qel-message-serialize.h"
-#include "support/exchange.h"
 #include "support/heap.h"
+#include "support/outputs.h"
 
 namespace {
 
@@ -19,11 +18,8 @@ using support::expect_log;
 using support::FailingCalloc;
 using support::HeapWatch;
 using support::hex;
-using support::kIntSentinel;
-using support::kLongSentinel;
 using support::Line;
 using support::logged_calls;
-using support::Received;
 
 int log_line_number(size_t call) {
   return std::get<int>(logged_calls().at(call).arguments.at(2));
@@ -67,7 +63,7 @@ class EverySerializer : public support::ExchangeTest,
   const Serializer& function_ = GetParam();
   support::Encoded out_;
 
-  void call() { out_.status = function_.call(&out_.data, &out_.size); }
+  void call() { out_.status = function_.call(&out_.data.block, &out_.size); }
   Line entry() const { return support::debug(function_.entry, {function_.name}); }
 };
 
@@ -111,7 +107,7 @@ TEST_P(EverySerializer, WhenBufferCannotBeAllocated_WritesNullAndTheLength) {
     const FailingCalloc fault(1);
     call();
   }
-  EXPECT_EQ(out_.data, nullptr);
+  EXPECT_EQ(out_.data.block, nullptr);
   EXPECT_EQ(out_.size, function_.length);
 }
 
@@ -157,8 +153,15 @@ struct Deserializer {
   std::set<size_t> clean_cuts;
   std::vector<Line> detail;  // logged between entry and exit when the input is empty
   // Calls the function and tells whether it left every output alone.
-  std::function<bool(const unsigned char*, int)> leaves_outputs;
+  bool (*leaves_outputs)(const std::string& bytes);
 };
+
+template <typename Outputs>
+bool leaves(const std::string& bytes) {
+  Outputs outputs;
+  outputs.read(bytes);
+  return outputs.untouched();
+}
 
 const Deserializer kDeserializers[] = {
     // requestId 150, result { code 1000, msg "ok" }
@@ -169,13 +172,7 @@ const Deserializer kDeserializers[] = {
      hex("08 96 01 12 07 08 e8 07 12 02 6f 6b"),
      {0, 3, 5, 8},
      {},
-     [](const unsigned char* data, int size) {
-       int64_t request_id = kLongSentinel;
-       int code = kIntSentinel;
-       support::TextOutput text;
-       channel_auth_reply_deserialize(data, size, &request_id, &code, &text.text);
-       return request_id == kLongSentinel && code == kIntSentinel && text.untouched();
-     }},
+     leaves<support::ChannelAuthReplyOutputs>},
     // requestId 150
     {"client_echo_deserialize",
      "%s start",
@@ -184,11 +181,7 @@ const Deserializer kDeserializers[] = {
      hex("08 96 01"),
      {0},
      {},
-     [](const unsigned char* data, int size) {
-       int64_t request_id = kLongSentinel;
-       client_echo_deserialize(data, size, &request_id);
-       return request_id == kLongSentinel;
-     }},
+     leaves<support::ClientEchoOutputs>},
     // userId 9, deviceId 8, requestId 7, chatroomId 6, result { code 3, msg "no" },
     // processedMessageEntries { msgId 1, sentTime 300 }
     {"chat_reply_deserialize",
@@ -198,19 +191,7 @@ const Deserializer kDeserializers[] = {
      hex("08 09 10 08 58 07 60 06 6a 06 08 03 12 02 6e 6f 72 05 08 01 10 ac 02"),
      {0, 2, 4, 6, 8, 10, 12, 16, 18, 20},
      {support::debug("processed msg entry size : %d", {0})},
-     [](const unsigned char* data, int size) {
-       int64_t request_id = kLongSentinel;
-       int64_t chatroom_id = kLongSentinel;
-       int code = kIntSentinel;
-       support::TextOutput text;
-       int count = kIntSentinel;
-       support::IdListOutput ids;
-       support::IdListOutput times;
-       chat_reply_deserialize(data, size, &request_id, &chatroom_id, &code, &text.text, &count,
-                              &ids.ids, &times.ids);
-       return request_id == kLongSentinel && chatroom_id == kLongSentinel && code == kIntSentinel &&
-              text.untouched() && count == kIntSentinel && ids.untouched() && times.untouched();
-     }},
+     leaves<support::ChatReplyOutputs>},
     // userId 9, deviceId 8, requestId 7, result { code 3, msg "no" }, currentTimeMillis 1500
     {"current_time_deserialize",
      "%s: start",
@@ -219,15 +200,7 @@ const Deserializer kDeserializers[] = {
      hex("08 09 10 08 58 07 62 06 08 03 12 02 6e 6f 68 dc 0b"),
      {0, 2, 4, 6, 8, 10, 14},
      {},
-     [](const unsigned char* data, int size) {
-       int64_t request_id = kLongSentinel;
-       int64_t millis = kLongSentinel;
-       int code = kIntSentinel;
-       support::TextOutput text;
-       current_time_deserialize(data, size, &request_id, &millis, &code, &text.text);
-       return request_id == kLongSentinel && millis == kLongSentinel && code == kIntSentinel &&
-              text.untouched();
-     }},
+     leaves<support::CurrentTimeOutputs>},
 };
 
 void PrintTo(const Deserializer& function, std::ostream* out) {
@@ -251,10 +224,7 @@ class EveryDeserializer : public support::ExchangeTest,
  protected:
   const Deserializer& function_ = GetParam();
 
-  bool leaves_outputs(const std::string& bytes) const {
-    const Received received(bytes);
-    return function_.leaves_outputs(received.data(), received.size());
-  }
+  bool leaves_outputs(const std::string& bytes) const { return function_.leaves_outputs(bytes); }
   Line entry() const { return support::warn(function_.entry, {function_.name}); }
 
   void expect_success(const std::string& bytes) {
@@ -364,10 +334,9 @@ TEST_P(EveryDeserializer, WhenTheStreamDoesNotEndCleanly_KeepsTheStream) {
 }
 
 TEST_P(EveryDeserializer, WhenTheStreamCannotBeAllocated_ThrowsAfterItsEntryLine) {
-  const Received received(function_.whole);
   {
     const support::FailingNew fault(1);
-    EXPECT_THROW(function_.leaves_outputs(received.data(), received.size()), std::bad_alloc);
+    EXPECT_THROW(leaves_outputs(function_.whole), std::bad_alloc);
   }
   expect_log(function_.name, {entry()});
 }
@@ -397,7 +366,7 @@ class LogLine : public support::ExchangeTest {
  protected:
   support::Encoded out_;
 
-  void call() { out_.status = client_echo_reply_serialize(1, &out_.data, &out_.size); }
+  void call() { out_.status = client_echo_reply_serialize(1, &out_.data.block, &out_.size); }
 };
 
 TEST_F(LogLine, OfAnEntry_HasTheWholeFormatInOneLiteral) {
@@ -406,9 +375,8 @@ TEST_F(LogLine, OfAnEntry_HasTheWholeFormatInOneLiteral) {
 }
 
 TEST_F(LogLine, OfAFailedParse_HasTheWholeFormatInOneLiteral) {
-  int64_t request_id = 0;
-  const Received received(hex("08"));
-  client_echo_deserialize(received.data(), received.size(), &request_id);
+  support::ClientEchoOutputs out;
+  out.read(hex("08"));
   EXPECT_EQ(logged_calls().at(0).format, "%s: %s(%d) > \033[33m[%d]%s start\033[0m");
   EXPECT_EQ(logged_calls().at(1).format,
             "%s: %s(%d) > \033[31m[%d]merge error : Could not parse the received data!\033[0m");
@@ -432,7 +400,7 @@ TEST_F(LogLine, OfAForkedProcess_CarriesItsOwnThreadId) {
   support::clear_log();
   const pid_t child = fork();
   if (child == 0) {
-    client_echo_reply_serialize(1, &out_.data, &out_.size);
+    client_echo_reply_serialize(1, &out_.data.block, &out_.size);
     _exit(log_thread(1) == static_cast<int>(getpid()) ? 0 : 1);
   }
   int status = -1;

@@ -2,9 +2,9 @@
 
 #include <limits>
 
-#include "qel-message-serialize.h"
 #include "support/exchange.h"
 #include "support/heap.h"
+#include "support/outputs.h"
 #include "support/process_death.h"
 
 namespace {
@@ -36,7 +36,7 @@ class ChatRequestSerialize : public ExchangeTest {
   void call(int64_t request, int64_t chatroom, int64_t id, int type, const char* text, int ttl,
             int reserved = 0) {
     out_.status = chat_request_serialize(request, chatroom, id, type, text, ttl, reserved,
-                                         &out_.data, &out_.size);
+                                         &out_.data.block, &out_.size);
   }
   void call_with_type(int type) { call(1, 2, 3, type, "x", 4); }
   void call_with_text(const char* text) { call(1, 2, 3, 0, text, 4); }
@@ -58,19 +58,19 @@ class ChatRequestSerialize : public ExchangeTest {
 TEST_F(ChatRequestSerialize, WhenCalled_EncodesOneMessageAndNoIdsOfTheSender) {
   call(1, 300, 5, 1, "hi", 60);
   ASSERT_EQ(out_.status, 0);
-  EXPECT_EQ(to_hex(out_.data, out_.size), "58 01 60 ac 02 6a 0a 08 05 10 01 1a 02 68 69 20 3c");
+  EXPECT_EQ(to_hex(out_.bytes()), "58 01 60 ac 02 6a 0a 08 05 10 01 1a 02 68 69 20 3c");
 }
 
 TEST_F(ChatRequestSerialize, WhenValuesAreZeroAndEmpty_EncodesThemAsPresent) {
   call(0, 0, 0, 0, "", 0);
   ASSERT_EQ(out_.status, 0);
-  EXPECT_EQ(to_hex(out_.data, out_.size), "58 00 60 00 6a 08 08 00 10 00 1a 00 20 00");
+  EXPECT_EQ(to_hex(out_.bytes()), "58 00 60 00 6a 08 08 00 10 00 1a 00 20 00");
 }
 
 TEST_F(ChatRequestSerialize, WhenValuesAreNegative_EncodesTenByteVarints) {
   call(-1, kSmallest, -2, 0, "", kSmallestInt);
   ASSERT_EQ(out_.status, 0);
-  EXPECT_EQ(to_hex(out_.data, out_.size),
+  EXPECT_EQ(to_hex(out_.bytes()),
             "58 ff ff ff ff ff ff ff ff ff 01 60 80 80 80 80 80 80 80 80 80 01 "
             "6a 1a 08 fe ff ff ff ff ff ff ff ff 01 10 00 1a 00 20 80 80 80 80 f8 ff ff ff ff 01");
 }
@@ -78,7 +78,7 @@ TEST_F(ChatRequestSerialize, WhenValuesAreNegative_EncodesTenByteVarints) {
 TEST_F(ChatRequestSerialize, WhateverReserved_EncodesTheSame) {
   for (const int reserved : {1, -1, kSmallestInt, kLargestInt}) {
     Encoded out;
-    out.status = chat_request_serialize(1, 2, 3, 0, "x", 4, reserved, &out.data, &out.size);
+    out.status = chat_request_serialize(1, 2, 3, 0, "x", 4, reserved, &out.data.block, &out.size);
     ASSERT_EQ(out.status, 0);
     EXPECT_EQ(to_hex(out.bytes()), to_hex(expected(0, "x"))) << reserved;
   }
@@ -87,7 +87,7 @@ TEST_F(ChatRequestSerialize, WhateverReserved_EncodesTheSame) {
 TEST_F(ChatRequestSerialize, WhenTypeIsAMember_EncodesIt) {
   for (const int type : {0, 1, 2, 3, 4, 5, 6, 10, 30}) {
     Encoded out;
-    out.status = chat_request_serialize(1, 2, 3, type, "x", 4, 0, &out.data, &out.size);
+    out.status = chat_request_serialize(1, 2, 3, type, "x", 4, 0, &out.data.block, &out.size);
     ASSERT_EQ(out.status, 0) << type;
     EXPECT_EQ(to_hex(out.bytes()), to_hex(expected(type, "x")));
   }
@@ -191,19 +191,8 @@ TEST_F(ChatRequestSerialize, WhenTextIsTooLongAndTypeOutOfRange_NamesTheType) {
 class ChatReplyDeserialize : public ExchangeTest {
  protected:
   const std::string name_ = "chat_reply_deserialize";
-  int64_t request_id_ = kLongSentinel;
-  int64_t chatroom_id_ = kLongSentinel;
-  int code_ = kIntSentinel;
-  TextOutput text_;
-  int count_ = kIntSentinel;
-  IdListOutput ids_;
-  IdListOutput times_;
+  support::ChatReplyOutputs out_;
 
-  void call(const std::string& bytes) {
-    const Received received(bytes);
-    chat_reply_deserialize(received.data(), received.size(), &request_id_, &chatroom_id_, &code_,
-                           &text_.text, &count_, &ids_.ids, &times_.ids);
-  }
   support::Line start() const { return support::warn("%s: start", {name_}); }
   support::Line exit() const { return support::warn("%s: exit", {name_}); }
   static support::Line entries(int n) {
@@ -220,30 +209,30 @@ const char kChatReply[] =
     "08 09 10 08 58 07 60 06 6a 06 08 03 12 02 6e 6f 72 05 08 01 10 ac 02 72 05 08 02 10 90 03";
 
 TEST_F(ChatReplyDeserialize, WhenReplyIsWhole_WritesIdsAndResult) {
-  call(hex(kChatReply));
-  EXPECT_EQ(request_id_, 7);
-  EXPECT_EQ(chatroom_id_, 6);
-  EXPECT_EQ(code_, 3);
-  EXPECT_STREQ(text_.text, "no");
+  out_.read(hex(kChatReply));
+  EXPECT_EQ(out_.request_id, 7);
+  EXPECT_EQ(out_.chatroom_id, 6);
+  EXPECT_EQ(out_.code, 3);
+  EXPECT_STREQ(out_.text.block, "no");
 }
 
 TEST_F(ChatReplyDeserialize, WhenReplyHasTwoEntries_WritesTwoArraysInOrder) {
-  call(hex(kChatReply));
-  ASSERT_EQ(count_, 2);
-  EXPECT_EQ(ids_.ids[0], 1);
-  EXPECT_EQ(ids_.ids[1], 2);
-  EXPECT_EQ(times_.ids[0], 300);
-  EXPECT_EQ(times_.ids[1], 400);
+  out_.read(hex(kChatReply));
+  ASSERT_EQ(out_.count, 2);
+  EXPECT_EQ(out_.ids.block[0], 1);
+  EXPECT_EQ(out_.ids.block[1], 2);
+  EXPECT_EQ(out_.times.block[0], 300);
+  EXPECT_EQ(out_.times.block[1], 400);
 }
 
 TEST_F(ChatReplyDeserialize, WhenReplyHasTwoEntries_LogsTheirNumberAtDebugLevel) {
-  call(hex(kChatReply));
+  out_.read(hex(kChatReply));
   expect_log(name_, {start(), entries(2), exit()});
 }
 
 TEST_F(ChatReplyDeserialize, WhenReplyHasEntries_AllocatesTwoZeroedArrays) {
   support::HeapWatch watch;
-  call(hex(kChatReply));
+  out_.read(hex(kChatReply));
   watch.stop();
   ASSERT_EQ(watch.callocs().size(), 2u);
   for (const auto& block : watch.callocs()) {
@@ -253,10 +242,10 @@ TEST_F(ChatReplyDeserialize, WhenReplyHasEntries_AllocatesTwoZeroedArrays) {
 }
 
 TEST_F(ChatReplyDeserialize, WhenReplyHasOneEntry_WritesArraysOfOne) {
-  call(hex("72 04 08 05 10 06"));
-  ASSERT_EQ(count_, 1);
-  EXPECT_EQ(ids_.ids[0], 5);
-  EXPECT_EQ(times_.ids[0], 6);
+  out_.read(hex("72 04 08 05 10 06"));
+  ASSERT_EQ(out_.count, 1);
+  EXPECT_EQ(out_.ids.block[0], 5);
+  EXPECT_EQ(out_.times.block[0], 6);
 }
 
 TEST_F(ChatReplyDeserialize, WhenReplyHas1000Entries_WritesThemAll) {
@@ -264,152 +253,154 @@ TEST_F(ChatReplyDeserialize, WhenReplyHas1000Entries_WritesThemAll) {
   for (int i = 0; i < 1000; ++i) {
     reply.message(14, Wire().number(1, i - 500).number(2, kSmallest + i));
   }
-  call(reply.bytes());
-  ASSERT_EQ(count_, 1000);
+  out_.read(reply.bytes());
+  ASSERT_EQ(out_.count, 1000);
   for (int i = 0; i < 1000; ++i) {
-    ASSERT_EQ(ids_.ids[i], i - 500);
-    ASSERT_EQ(times_.ids[i], kSmallest + i);
+    ASSERT_EQ(out_.ids.block[i], i - 500);
+    ASSERT_EQ(out_.times.block[i], kSmallest + i);
   }
 }
 
 TEST_F(ChatReplyDeserialize, WhenReplyHasNoEntries_WritesCountZeroAndLeavesArrays) {
-  call(hex("58 07"));
-  EXPECT_EQ(count_, 0);
-  EXPECT_TRUE(ids_.untouched());
-  EXPECT_TRUE(times_.untouched());
+  out_.read(hex("58 07"));
+  EXPECT_EQ(out_.count, 0);
+  EXPECT_TRUE(out_.ids.untouched());
+  EXPECT_TRUE(out_.times.untouched());
   expect_log(name_, {start(), entries(0), exit()});
 }
 
 TEST_F(ChatReplyDeserialize, WhenSentTimesAreAbsent_WritesZeros) {
-  call(hex("72 02 08 05 72 02 08 06"));
-  ASSERT_EQ(count_, 2);
-  EXPECT_EQ(ids_.ids[0], 5);
-  EXPECT_EQ(ids_.ids[1], 6);
-  EXPECT_EQ(times_.ids[0], 0);
-  EXPECT_EQ(times_.ids[1], 0);
+  out_.read(hex("72 02 08 05 72 02 08 06"));
+  ASSERT_EQ(out_.count, 2);
+  EXPECT_EQ(out_.ids.block[0], 5);
+  EXPECT_EQ(out_.ids.block[1], 6);
+  EXPECT_EQ(out_.times.block[0], 0);
+  EXPECT_EQ(out_.times.block[1], 0);
 }
 
 TEST_F(ChatReplyDeserialize, WhenAMsgIdIsAbsent_WritesZeroAtItsIndex) {
-  call(hex("72 02 10 05 72 04 08 06 10 07"));
-  ASSERT_EQ(count_, 2);
-  EXPECT_EQ(ids_.ids[0], 0);
-  EXPECT_EQ(ids_.ids[1], 6);
-  EXPECT_EQ(times_.ids[0], 5);
-  EXPECT_EQ(times_.ids[1], 7);
+  out_.read(hex("72 02 10 05 72 04 08 06 10 07"));
+  ASSERT_EQ(out_.count, 2);
+  EXPECT_EQ(out_.ids.block[0], 0);
+  EXPECT_EQ(out_.ids.block[1], 6);
+  EXPECT_EQ(out_.times.block[0], 5);
+  EXPECT_EQ(out_.times.block[1], 7);
 }
 
 TEST_F(ChatReplyDeserialize, WhenAnEntryIsEmpty_WritesZerosAtItsIndex) {
-  call(hex("72 00 72 04 08 06 10 07"));
-  ASSERT_EQ(count_, 2);
-  EXPECT_EQ(ids_.ids[0], 0);
-  EXPECT_EQ(times_.ids[0], 0);
+  out_.read(hex("72 00 72 04 08 06 10 07"));
+  ASSERT_EQ(out_.count, 2);
+  EXPECT_EQ(out_.ids.block[0], 0);
+  EXPECT_EQ(out_.times.block[0], 0);
 }
 
 TEST_F(ChatReplyDeserialize, WhenInputIsEmpty_WritesZeroIdsAndCountAlone) {
-  call("");
-  EXPECT_EQ(request_id_, 0);
-  EXPECT_EQ(chatroom_id_, 0);
-  EXPECT_EQ(count_, 0);
-  EXPECT_EQ(code_, kIntSentinel);
-  EXPECT_TRUE(text_.untouched());
-  EXPECT_TRUE(ids_.untouched());
-  EXPECT_TRUE(times_.untouched());
+  out_.read("");
+  EXPECT_EQ(out_.request_id, 0);
+  EXPECT_EQ(out_.chatroom_id, 0);
+  EXPECT_EQ(out_.count, 0);
+  EXPECT_EQ(out_.code, kIntSentinel);
+  EXPECT_TRUE(out_.text.untouched());
+  EXPECT_TRUE(out_.ids.untouched());
+  EXPECT_TRUE(out_.times.untouched());
 }
 
 TEST_F(ChatReplyDeserialize, WhenResultIsAbsent_LeavesCodeAndText) {
-  call(hex("58 07 60 06"));
-  EXPECT_EQ(code_, kIntSentinel);
-  EXPECT_TRUE(text_.untouched());
+  out_.read(hex("58 07 60 06"));
+  EXPECT_EQ(out_.code, kIntSentinel);
+  EXPECT_TRUE(out_.text.untouched());
 }
 
 TEST_F(ChatReplyDeserialize, WhenResultIsEmpty_WritesCodeZeroAndLeavesText) {
-  call(hex("6a 00"));
-  EXPECT_EQ(code_, 0);
-  EXPECT_TRUE(text_.untouched());
+  out_.read(hex("6a 00"));
+  EXPECT_EQ(out_.code, 0);
+  EXPECT_TRUE(out_.text.untouched());
 }
 
 TEST_F(ChatReplyDeserialize, WhenTextIsEmptyButPresent_WritesEmptyText) {
-  call(hex("6a 02 12 00"));
-  EXPECT_STREQ(text_.text, "");
+  out_.read(hex("6a 02 12 00"));
+  EXPECT_STREQ(out_.text.block, "");
 }
 
 TEST_F(ChatReplyDeserialize, WhenTextHoldsANul_CopiesUpToIt) {
-  call(hex("6a 05 12 03 61 00 62"));
-  EXPECT_STREQ(text_.text, "a");
+  out_.read(hex("6a 05 12 03 61 00 62"));
+  EXPECT_STREQ(out_.text.block, "a");
 }
 
 TEST_F(ChatReplyDeserialize, WhenTheFirstFourOutputsAreNull_WritesTheOthers) {
   const Received received(hex(kChatReply));
   chat_reply_deserialize(received.data(), received.size(), nullptr, nullptr, nullptr, nullptr,
-                         &count_, &ids_.ids, &times_.ids);
-  ASSERT_EQ(count_, 2);
-  EXPECT_EQ(ids_.ids[1], 2);
-  EXPECT_EQ(times_.ids[1], 400);
+                         &out_.count, &out_.ids.block, &out_.times.block);
+  ASSERT_EQ(out_.count, 2);
+  EXPECT_EQ(out_.ids.block[1], 2);
+  EXPECT_EQ(out_.times.block[1], 400);
 }
 
 TEST_F(ChatReplyDeserialize, WhenArraysAreNullAndThereAreNoEntries_WritesCountZero) {
   const Received received(hex("58 07"));
-  chat_reply_deserialize(received.data(), received.size(), &request_id_, &chatroom_id_, &code_,
-                         &text_.text, &count_, nullptr, nullptr);
-  EXPECT_EQ(count_, 0);
+  chat_reply_deserialize(received.data(), received.size(), &out_.request_id, &out_.chatroom_id,
+                         &out_.code, &out_.text.block, &out_.count, nullptr, nullptr);
+  EXPECT_EQ(out_.count, 0);
   expect_log(name_, {start(), entries(0), exit()});
 }
 
 TEST_F(ChatReplyDeserialize, WhenFirstArrayCannotBeAllocated_WritesCountZeroAndKeepsTheSecond) {
   {
     const FailingCalloc fault(1);
-    call(hex(kChatReply));
+    out_.read(hex(kChatReply));
   }
-  EXPECT_EQ(count_, 0);
-  EXPECT_EQ(ids_.ids, nullptr);
-  ASSERT_NE(times_.ids, nullptr);
-  EXPECT_FALSE(times_.untouched());
-  EXPECT_EQ(times_.ids[1], 0);
+  EXPECT_EQ(out_.count, 0);
+  EXPECT_EQ(out_.ids.block, nullptr);
+  ASSERT_NE(out_.times.block, nullptr);
+  EXPECT_FALSE(out_.times.untouched());
+  EXPECT_EQ(out_.times.block[1], 0);
   expect_log(name_, {start(), entries(2), allocation_error()});
 }
 
 TEST_F(ChatReplyDeserialize, WhenSecondArrayCannotBeAllocated_WritesCountZeroAndKeepsTheFirst) {
   {
     const FailingCalloc fault(2);
-    call(hex(kChatReply));
+    out_.read(hex(kChatReply));
   }
-  EXPECT_EQ(count_, 0);
-  ASSERT_NE(ids_.ids, nullptr);
-  EXPECT_FALSE(ids_.untouched());
-  EXPECT_EQ(ids_.ids[1], 0);
-  EXPECT_EQ(times_.ids, nullptr);
+  EXPECT_EQ(out_.count, 0);
+  ASSERT_NE(out_.ids.block, nullptr);
+  EXPECT_FALSE(out_.ids.untouched());
+  EXPECT_EQ(out_.ids.block[1], 0);
+  EXPECT_EQ(out_.times.block, nullptr);
   expect_log(name_, {start(), entries(2), allocation_error()});
 }
 
 TEST_F(ChatReplyDeserialize, WhenAnArrayCannotBeAllocated_HasWrittenTheOutputsBeforeIt) {
   {
     const FailingCalloc fault(1);
-    call(hex(kChatReply));
+    out_.read(hex(kChatReply));
   }
-  EXPECT_EQ(request_id_, 7);
-  EXPECT_EQ(chatroom_id_, 6);
-  EXPECT_EQ(code_, 3);
-  EXPECT_STREQ(text_.text, "no");
+  EXPECT_EQ(out_.request_id, 7);
+  EXPECT_EQ(out_.chatroom_id, 6);
+  EXPECT_EQ(out_.code, 3);
+  EXPECT_STREQ(out_.text.block, "no");
 }
 
 TEST_F(ChatReplyDeserialize, WhenCountIsNull_Faults) {
-  EXPECT_EXIT(chat_reply_deserialize(nullptr, 0, &request_id_, &chatroom_id_, &code_, &text_.text,
-                                     nullptr, &ids_.ids, &times_.ids),
+  EXPECT_EXIT(chat_reply_deserialize(nullptr, 0, &out_.request_id, &out_.chatroom_id, &out_.code,
+                                     &out_.text.block, nullptr, &out_.ids.block, &out_.times.block),
               support::faults, "");
 }
 
 TEST_F(ChatReplyDeserialize, WhenMsgIdsIsNullAndThereAreEntries_Faults) {
   const Received received(hex(kChatReply));
-  EXPECT_EXIT(chat_reply_deserialize(received.data(), received.size(), &request_id_, &chatroom_id_,
-                                     &code_, &text_.text, &count_, nullptr, &times_.ids),
-              support::faults, "");
+  EXPECT_EXIT(
+      chat_reply_deserialize(received.data(), received.size(), &out_.request_id, &out_.chatroom_id,
+                             &out_.code, &out_.text.block, &out_.count, nullptr, &out_.times.block),
+      support::faults, "");
 }
 
 TEST_F(ChatReplyDeserialize, WhenSentTimesIsNullAndThereAreEntries_Faults) {
   const Received received(hex(kChatReply));
-  EXPECT_EXIT(chat_reply_deserialize(received.data(), received.size(), &request_id_, &chatroom_id_,
-                                     &code_, &text_.text, &count_, &ids_.ids, nullptr),
-              support::faults, "");
+  EXPECT_EXIT(
+      chat_reply_deserialize(received.data(), received.size(), &out_.request_id, &out_.chatroom_id,
+                             &out_.code, &out_.text.block, &out_.count, &out_.ids.block, nullptr),
+      support::faults, "");
 }
 
 }  // namespace

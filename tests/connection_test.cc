@@ -2,9 +2,9 @@
 
 #include <limits>
 
-#include "qel-message-serialize.h"
 #include "support/exchange.h"
 #include "support/heap.h"
+#include "support/outputs.h"
 #include "support/process_death.h"
 
 namespace {
@@ -28,27 +28,27 @@ class ChannelAuthRequestSerialize : public ExchangeTest {
   Encoded out_;
 
   void call(int64_t request, int64_t user, int64_t device, const char* app, const char* token) {
-    out_.status =
-        channel_auth_request_serialize(request, user, device, app, token, &out_.data, &out_.size);
+    out_.status = channel_auth_request_serialize(request, user, device, app, token,
+                                                 &out_.data.block, &out_.size);
   }
 };
 
 TEST_F(ChannelAuthRequestSerialize, WhenCalled_EncodesTheFiveArguments) {
   call(1, 2, 300, "app", "tok");
   ASSERT_EQ(out_.status, 0);
-  EXPECT_EQ(to_hex(out_.data, out_.size), "08 01 10 02 18 ac 02 2a 03 61 70 70 32 03 74 6f 6b");
+  EXPECT_EQ(to_hex(out_.bytes()), "08 01 10 02 18 ac 02 2a 03 61 70 70 32 03 74 6f 6b");
 }
 
 TEST_F(ChannelAuthRequestSerialize, WhenValuesAreZeroAndEmpty_EncodesThemAsPresent) {
   call(0, 0, 0, "", "");
   ASSERT_EQ(out_.status, 0);
-  EXPECT_EQ(to_hex(out_.data, out_.size), "08 00 10 00 18 00 2a 00 32 00");
+  EXPECT_EQ(to_hex(out_.bytes()), "08 00 10 00 18 00 2a 00 32 00");
 }
 
 TEST_F(ChannelAuthRequestSerialize, WhenIdsAreNegative_EncodesTenByteVarints) {
   call(-1, kSmallest, kLargest, "", "");
   ASSERT_EQ(out_.status, 0);
-  EXPECT_EQ(to_hex(out_.data, out_.size),
+  EXPECT_EQ(to_hex(out_.bytes()),
             "08 ff ff ff ff ff ff ff ff ff 01 10 80 80 80 80 80 80 80 80 80 01 "
             "18 ff ff ff ff ff ff ff ff 7f 2a 00 32 00");
 }
@@ -75,80 +75,73 @@ TEST_F(ChannelAuthRequestSerialize, WhenAccessTokenIsNull_Faults) {
 
 class ChannelAuthReplyDeserialize : public ExchangeTest {
  protected:
-  int64_t request_id_ = kLongSentinel;
-  int code_ = kIntSentinel;
-  TextOutput text_;
-
-  void call(const std::string& bytes) {
-    const Received received(bytes);
-    channel_auth_reply_deserialize(received.data(), received.size(), &request_id_, &code_,
-                                   &text_.text);
-  }
+  support::ChannelAuthReplyOutputs out_;
 };
 
 TEST_F(ChannelAuthReplyDeserialize, WhenReplyIsWhole_WritesAllOutputs) {
-  call(hex("08 96 01 12 06 08 e8 07 12 01 6f"));
-  EXPECT_EQ(request_id_, 150);
-  EXPECT_EQ(code_, 1000);
-  EXPECT_STREQ(text_.text, "o");
+  out_.read(hex("08 96 01 12 06 08 e8 07 12 01 6f"));
+  EXPECT_EQ(out_.request_id, 150);
+  EXPECT_EQ(out_.code, 1000);
+  EXPECT_STREQ(out_.text.block, "o");
 }
 
 TEST_F(ChannelAuthReplyDeserialize, WhenIdAndCodeAreNegative_WritesThem) {
-  call(hex("08 ff ff ff ff ff ff ff ff ff 01 12 0b 08 fe ff ff ff ff ff ff ff ff 01"));
-  EXPECT_EQ(request_id_, -1);
-  EXPECT_EQ(code_, -2);
+  out_.read(hex("08 ff ff ff ff ff ff ff ff ff 01 12 0b 08 fe ff ff ff ff ff ff ff ff 01"));
+  EXPECT_EQ(out_.request_id, -1);
+  EXPECT_EQ(out_.code, -2);
 }
 
 TEST_F(ChannelAuthReplyDeserialize, WhenInputIsEmpty_WritesZerosAndNull) {
-  call("");
-  EXPECT_EQ(request_id_, 0);
-  EXPECT_EQ(code_, 0);
-  EXPECT_EQ(text_.text, nullptr);
+  out_.read("");
+  EXPECT_EQ(out_.request_id, 0);
+  EXPECT_EQ(out_.code, 0);
+  EXPECT_EQ(out_.text.block, nullptr);
 }
 
 TEST_F(ChannelAuthReplyDeserialize, WhenResultIsAbsent_WritesZeroAndNull) {
-  call(hex("08 05"));
-  EXPECT_EQ(request_id_, 5);
-  EXPECT_EQ(code_, 0);
-  EXPECT_EQ(text_.text, nullptr);
+  out_.read(hex("08 05"));
+  EXPECT_EQ(out_.request_id, 5);
+  EXPECT_EQ(out_.code, 0);
+  EXPECT_EQ(out_.text.block, nullptr);
 }
 
 TEST_F(ChannelAuthReplyDeserialize, WhenResultIsEmpty_WritesZeroAndNull) {
-  call(hex("08 05 12 00"));
-  EXPECT_EQ(code_, 0);
-  EXPECT_EQ(text_.text, nullptr);
+  out_.read(hex("08 05 12 00"));
+  EXPECT_EQ(out_.code, 0);
+  EXPECT_EQ(out_.text.block, nullptr);
 }
 
 TEST_F(ChannelAuthReplyDeserialize, WhenTextIsAbsent_WritesNull) {
-  call(hex("08 05 12 02 08 07"));
-  EXPECT_EQ(code_, 7);
-  EXPECT_EQ(text_.text, nullptr);
+  out_.read(hex("08 05 12 02 08 07"));
+  EXPECT_EQ(out_.code, 7);
+  EXPECT_EQ(out_.text.block, nullptr);
 }
 
 TEST_F(ChannelAuthReplyDeserialize, WhenTextIsEmptyButPresent_WritesEmptyText) {
-  call(hex("08 05 12 02 12 00"));
-  EXPECT_EQ(code_, 0);
-  EXPECT_STREQ(text_.text, "");
+  out_.read(hex("08 05 12 02 12 00"));
+  EXPECT_EQ(out_.code, 0);
+  EXPECT_STREQ(out_.text.block, "");
 }
 
 TEST_F(ChannelAuthReplyDeserialize, WhenRequestIdIsNull_Faults) {
-  EXPECT_EXIT(channel_auth_reply_deserialize(nullptr, 0, nullptr, &code_, &text_.text),
+  EXPECT_EXIT(channel_auth_reply_deserialize(nullptr, 0, nullptr, &out_.code, &out_.text.block),
               support::faults, "");
 }
 
 TEST_F(ChannelAuthReplyDeserialize, WhenResultCodeIsNull_Faults) {
-  EXPECT_EXIT(channel_auth_reply_deserialize(nullptr, 0, &request_id_, nullptr, &text_.text),
-              support::faults, "");
+  EXPECT_EXIT(
+      channel_auth_reply_deserialize(nullptr, 0, &out_.request_id, nullptr, &out_.text.block),
+      support::faults, "");
 }
 
 TEST_F(ChannelAuthReplyDeserialize, WhenResultMsgIsNull_Faults) {
-  EXPECT_EXIT(channel_auth_reply_deserialize(nullptr, 0, &request_id_, &code_, nullptr),
+  EXPECT_EXIT(channel_auth_reply_deserialize(nullptr, 0, &out_.request_id, &out_.code, nullptr),
               support::faults, "");
 }
 
 TEST_F(ChannelAuthReplyDeserialize, WhenTextHoldsANul_CopiesUpToIt) {
-  call(hex("12 05 12 03 61 00 62"));
-  EXPECT_STREQ(text_.text, "a");
+  out_.read(hex("12 05 12 03 61 00 62"));
+  EXPECT_STREQ(out_.text.block, "a");
 }
 
 // ---- client_echo_reply_serialize
@@ -158,47 +151,42 @@ class ClientEchoReplySerialize : public ExchangeTest {
   Encoded out_;
 
   void call(int64_t request) {
-    out_.status = client_echo_reply_serialize(request, &out_.data, &out_.size);
+    out_.status = client_echo_reply_serialize(request, &out_.data.block, &out_.size);
   }
 };
 
 TEST_F(ClientEchoReplySerialize, WhenIdIsZero_EncodesTwoBytes) {
   call(0);
   ASSERT_EQ(out_.status, 0);
-  EXPECT_EQ(to_hex(out_.data, out_.size), "08 00");
+  EXPECT_EQ(to_hex(out_.bytes()), "08 00");
 }
 
 TEST_F(ClientEchoReplySerialize, WhenIdIsNegative_EncodesTenByteVarint) {
   call(-1);
   ASSERT_EQ(out_.status, 0);
-  EXPECT_EQ(to_hex(out_.data, out_.size), "08 ff ff ff ff ff ff ff ff ff 01");
+  EXPECT_EQ(to_hex(out_.bytes()), "08 ff ff ff ff ff ff ff ff ff 01");
 }
 
 // ---- client_echo_deserialize
 
 class ClientEchoDeserialize : public ExchangeTest {
  protected:
-  int64_t request_id_ = kLongSentinel;
-
-  void call(const std::string& bytes) {
-    const Received received(bytes);
-    client_echo_deserialize(received.data(), received.size(), &request_id_);
-  }
+  support::ClientEchoOutputs out_;
 };
 
 TEST_F(ClientEchoDeserialize, WhenProbeIsWhole_WritesItsId) {
-  call(hex("08 96 01"));
-  EXPECT_EQ(request_id_, 150);
+  out_.read(hex("08 96 01"));
+  EXPECT_EQ(out_.request_id, 150);
 }
 
 TEST_F(ClientEchoDeserialize, WhenIdIsSmallest_WritesIt) {
-  call(hex("08 80 80 80 80 80 80 80 80 80 01"));
-  EXPECT_EQ(request_id_, kSmallest);
+  out_.read(hex("08 80 80 80 80 80 80 80 80 80 01"));
+  EXPECT_EQ(out_.request_id, kSmallest);
 }
 
 TEST_F(ClientEchoDeserialize, WhenInputIsEmpty_WritesZero) {
-  call("");
-  EXPECT_EQ(request_id_, 0);
+  out_.read("");
+  EXPECT_EQ(out_.request_id, 0);
 }
 
 TEST_F(ClientEchoDeserialize, WhenRequestIdIsNull_Faults) {
@@ -212,133 +200,127 @@ class CurrentTimeRequestSerialize : public ExchangeTest {
   Encoded out_;
 
   void call(int64_t request) {
-    out_.status = current_time_request_serialize(request, &out_.data, &out_.size);
+    out_.status = current_time_request_serialize(request, &out_.data.block, &out_.size);
   }
 };
 
 TEST_F(CurrentTimeRequestSerialize, WhenIdIsZero_EncodesTwoBytes) {
   call(0);
   ASSERT_EQ(out_.status, 0);
-  EXPECT_EQ(to_hex(out_.data, out_.size), "58 00");
+  EXPECT_EQ(to_hex(out_.bytes()), "58 00");
 }
 
 TEST_F(CurrentTimeRequestSerialize, WhenIdIsLargest_EncodesNineByteVarint) {
   call(kLargest);
   ASSERT_EQ(out_.status, 0);
-  EXPECT_EQ(to_hex(out_.data, out_.size), "58 ff ff ff ff ff ff ff ff 7f");
+  EXPECT_EQ(to_hex(out_.bytes()), "58 ff ff ff ff ff ff ff ff 7f");
 }
 
 // ---- current_time_deserialize
 
 class CurrentTimeDeserialize : public ExchangeTest {
  protected:
-  int64_t request_id_ = kLongSentinel;
-  int64_t millis_ = kLongSentinel;
-  int code_ = kIntSentinel;
-  TextOutput text_;
-
-  void call(const std::string& bytes) {
-    const Received received(bytes);
-    current_time_deserialize(received.data(), received.size(), &request_id_, &millis_, &code_,
-                             &text_.text);
-  }
+  support::CurrentTimeOutputs out_;
 };
 
 // userId 9, deviceId 8, requestId 7, result { code 3, msg "no" }, currentTimeMillis 1500
 const char kTimeReply[] = "08 09 10 08 58 07 62 06 08 03 12 02 6e 6f 68 dc 0b";
 
 TEST_F(CurrentTimeDeserialize, WhenReplyIsWhole_WritesAllOutputs) {
-  call(hex(kTimeReply));
-  EXPECT_EQ(request_id_, 7);
-  EXPECT_EQ(millis_, 1500);
-  EXPECT_EQ(code_, 3);
-  EXPECT_STREQ(text_.text, "no");
+  out_.read(hex(kTimeReply));
+  EXPECT_EQ(out_.request_id, 7);
+  EXPECT_EQ(out_.millis, 1500);
+  EXPECT_EQ(out_.code, 3);
+  EXPECT_STREQ(out_.text.block, "no");
 }
 
 TEST_F(CurrentTimeDeserialize, WhenTimeIsZeroButPresent_WritesZero) {
-  call(hex("68 00"));
-  EXPECT_EQ(millis_, 0);
+  out_.read(hex("68 00"));
+  EXPECT_EQ(out_.millis, 0);
 }
 
 TEST_F(CurrentTimeDeserialize, WhenTimeIsAbsent_WritesMinusOne) {
-  call(hex("58 07"));
-  EXPECT_EQ(request_id_, 7);
-  EXPECT_EQ(millis_, -1);
+  out_.read(hex("58 07"));
+  EXPECT_EQ(out_.request_id, 7);
+  EXPECT_EQ(out_.millis, -1);
 }
 
 TEST_F(CurrentTimeDeserialize, WhenInputIsEmpty_WritesZeroAndMinusOneAlone) {
-  call("");
-  EXPECT_EQ(request_id_, 0);
-  EXPECT_EQ(millis_, -1);
-  EXPECT_EQ(code_, kIntSentinel);
-  EXPECT_TRUE(text_.untouched());
+  out_.read("");
+  EXPECT_EQ(out_.request_id, 0);
+  EXPECT_EQ(out_.millis, -1);
+  EXPECT_EQ(out_.code, kIntSentinel);
+  EXPECT_TRUE(out_.text.untouched());
 }
 
 TEST_F(CurrentTimeDeserialize, WhenResultIsAbsent_LeavesCodeAndText) {
-  call(hex("58 07 68 01"));
-  EXPECT_EQ(code_, kIntSentinel);
-  EXPECT_TRUE(text_.untouched());
+  out_.read(hex("58 07 68 01"));
+  EXPECT_EQ(out_.code, kIntSentinel);
+  EXPECT_TRUE(out_.text.untouched());
 }
 
 TEST_F(CurrentTimeDeserialize, WhenResultIsEmpty_WritesCodeZeroAndLeavesText) {
-  call(hex("58 07 62 00"));
-  EXPECT_EQ(code_, 0);
-  EXPECT_TRUE(text_.untouched());
+  out_.read(hex("58 07 62 00"));
+  EXPECT_EQ(out_.code, 0);
+  EXPECT_TRUE(out_.text.untouched());
 }
 
 TEST_F(CurrentTimeDeserialize, WhenTextIsAbsent_WritesCodeAndLeavesText) {
-  call(hex("58 07 62 02 08 05"));
-  EXPECT_EQ(code_, 5);
-  EXPECT_TRUE(text_.untouched());
+  out_.read(hex("58 07 62 02 08 05"));
+  EXPECT_EQ(out_.code, 5);
+  EXPECT_TRUE(out_.text.untouched());
 }
 
 TEST_F(CurrentTimeDeserialize, WhenTextIsEmptyButPresent_WritesEmptyText) {
-  call(hex("62 02 12 00"));
-  EXPECT_STREQ(text_.text, "");
+  out_.read(hex("62 02 12 00"));
+  EXPECT_STREQ(out_.text.block, "");
 }
 
 TEST_F(CurrentTimeDeserialize, WhenCodeAndTextAreNull_WritesTheOtherTwo) {
   const Received received(hex(kTimeReply));
-  current_time_deserialize(received.data(), received.size(), &request_id_, &millis_, nullptr,
-                           nullptr);
-  EXPECT_EQ(request_id_, 7);
-  EXPECT_EQ(millis_, 1500);
+  current_time_deserialize(received.data(), received.size(), &out_.request_id, &out_.millis,
+                           nullptr, nullptr);
+  EXPECT_EQ(out_.request_id, 7);
+  EXPECT_EQ(out_.millis, 1500);
 }
 
 TEST_F(CurrentTimeDeserialize, WhenCodeIsNull_WritesText) {
   const Received received(hex(kTimeReply));
-  current_time_deserialize(received.data(), received.size(), &request_id_, &millis_, nullptr,
-                           &text_.text);
-  EXPECT_STREQ(text_.text, "no");
+  current_time_deserialize(received.data(), received.size(), &out_.request_id, &out_.millis,
+                           nullptr, &out_.text.block);
+  EXPECT_STREQ(out_.text.block, "no");
 }
 
 TEST_F(CurrentTimeDeserialize, WhenTextIsNull_WritesCode) {
   const Received received(hex(kTimeReply));
-  current_time_deserialize(received.data(), received.size(), &request_id_, &millis_, &code_,
-                           nullptr);
-  EXPECT_EQ(code_, 3);
+  current_time_deserialize(received.data(), received.size(), &out_.request_id, &out_.millis,
+                           &out_.code, nullptr);
+  EXPECT_EQ(out_.code, 3);
 }
 
 TEST_F(CurrentTimeDeserialize, WhenTheStreamCannotBeAllocated_WritesNothing) {
   {
     const support::FailingNew fault(1);
-    EXPECT_THROW(current_time_deserialize(nullptr, 0, &request_id_, &millis_, &code_, &text_.text),
+    EXPECT_THROW(current_time_deserialize(nullptr, 0, &out_.request_id, &out_.millis, &out_.code,
+                                          &out_.text.block),
                  std::bad_alloc);
   }
-  EXPECT_EQ(request_id_, kLongSentinel);
-  EXPECT_EQ(millis_, kLongSentinel);
-  EXPECT_EQ(code_, kIntSentinel);
-  EXPECT_TRUE(text_.untouched());
+  EXPECT_EQ(out_.request_id, kLongSentinel);
+  EXPECT_EQ(out_.millis, kLongSentinel);
+  EXPECT_EQ(out_.code, kIntSentinel);
+  EXPECT_TRUE(out_.text.untouched());
 }
 
 TEST_F(CurrentTimeDeserialize, WhenRequestIdIsNull_Faults) {
-  EXPECT_EXIT(current_time_deserialize(nullptr, 0, nullptr, &millis_, &code_, &text_.text),
-              support::faults, "");
+  EXPECT_EXIT(
+      current_time_deserialize(nullptr, 0, nullptr, &out_.millis, &out_.code, &out_.text.block),
+      support::faults, "");
 }
 
 TEST_F(CurrentTimeDeserialize, WhenCurrentTimeMillisIsNull_Faults) {
-  EXPECT_EXIT(current_time_deserialize(nullptr, 0, &request_id_, nullptr, &code_, &text_.text),
-              support::faults, "");
+  EXPECT_EXIT(
+      current_time_deserialize(nullptr, 0, &out_.request_id, nullptr, &out_.code, &out_.text.block),
+      support::faults, "");
 }
 
 }  // namespace

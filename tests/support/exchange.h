@@ -1,12 +1,11 @@
-// What the tests of every exchange start from: sentinels in the outputs, and calls whose outputs
-// are gathered and released.
+// What the tests of every exchange start from: sentinels in the outputs, and outputs that release
+// what was written.
 #ifndef TESTS_SUPPORT_EXCHANGE_H
 #define TESTS_SUPPORT_EXCHANGE_H
 
 #include <google/protobuf/io/coded_stream.h>
 #include <gtest/gtest.h>
 
-#include <algorithm>
 #include <cstdint>
 #include <cstdlib>
 #include <string>
@@ -19,71 +18,54 @@ namespace support {
 // Values that outputs hold before a call; whoever finds one after it knows that it was not written.
 constexpr int kIntSentinel = -77707;
 constexpr int64_t kLongSentinel = -7770777077707;
-inline char text_sentinel[] = "sentinel";
-inline unsigned char buffer_sentinel[] = "sentinel";
-inline int64_t array_sentinel[] = {kLongSentinel};
+
+// An output that receives a block: what was written is released in the end.
+template <typename T>
+struct BlockOutput {
+  T* block = sentinel();
+
+  BlockOutput() = default;
+  BlockOutput(const BlockOutput&) = delete;
+  BlockOutput& operator=(const BlockOutput&) = delete;
+  ~BlockOutput() {
+    if (!untouched()) {
+      std::free(block);
+    }
+  }
+
+  bool untouched() const { return block == sentinel(); }
+
+ private:
+  static T* sentinel() {
+    static T unit{};
+    return &unit;
+  }
+};
+
+using TextOutput = BlockOutput<char>;
+using IdListOutput = BlockOutput<int64_t>;
 
 // The outputs of one serializer call.
 struct Encoded {
   int status = kIntSentinel;
-  unsigned char* data = buffer_sentinel;
+  BlockOutput<unsigned char> data;
   int size = kIntSentinel;
-
-  Encoded() = default;
-  Encoded(const Encoded&) = delete;
-  Encoded& operator=(const Encoded&) = delete;
-  ~Encoded() {
-    if (data != buffer_sentinel) {
-      std::free(data);
-    }
-  }
 
   // Valid after a success only.
   std::string bytes() const {
-    return {reinterpret_cast<const char*>(data), static_cast<size_t>(size)};
+    return {reinterpret_cast<const char*>(data.block), static_cast<size_t>(size)};
   }
-  bool untouched() const { return data == buffer_sentinel && size == kIntSentinel; }
-};
-
-// A text output and a list output: what was written is released, what was not is the sentinel.
-struct TextOutput {
-  char* text = text_sentinel;
-
-  TextOutput() = default;
-  TextOutput(const TextOutput&) = delete;
-  TextOutput& operator=(const TextOutput&) = delete;
-  ~TextOutput() {
-    if (!untouched()) {
-      std::free(text);
-    }
-  }
-  bool untouched() const { return text == text_sentinel; }
-};
-
-struct IdListOutput {
-  int64_t* ids = array_sentinel;
-
-  IdListOutput() = default;
-  IdListOutput(const IdListOutput&) = delete;
-  IdListOutput& operator=(const IdListOutput&) = delete;
-  ~IdListOutput() {
-    if (!untouched()) {
-      std::free(ids);
-    }
-  }
-  bool untouched() const { return ids == array_sentinel; }
+  bool untouched() const { return data.untouched() && size == kIntSentinel; }
 };
 
 // A copy of received bytes in a block of exactly their size, so that reading beyond it shows.
 class Received {
  public:
-  explicit Received(const std::string& bytes)
-      : data_(new unsigned char[bytes.size()]), size_(static_cast<int>(bytes.size())) {
-    std::copy(bytes.begin(), bytes.end(), data_);
-  }
-  ~Received() { delete[] data_; }
+  explicit Received(const std::string& bytes);
+  ~Received();
   Received(const Received&) = delete;
   Received& operator=(const Received&) = delete;
+
   const unsigned char* data() const { return data_; }
   int size() const { return size_; }
 
