@@ -17,7 +17,12 @@ endif()
 
 set(_version_header "${QEL_PROTOBUF_PREFIX}/include/google/protobuf/stubs/common.h")
 if(NOT EXISTS "${_version_header}")
-  message(FATAL_ERROR "No Protocol Buffers 2.6 in ${QEL_PROTOBUF_PREFIX}: run './dev setup', or let QEL_PROTOBUF_ROOT name an installation.")
+  if(QEL_PROTOBUF_ROOT)
+    set(_advice "let QEL_PROTOBUF_ROOT name an installation's folder, or leave it out and run './dev setup'")
+  else()
+    set(_advice "run './dev setup', or let QEL_PROTOBUF_ROOT name an installation")
+  endif()
+  message(FATAL_ERROR "No Protocol Buffers in ${QEL_PROTOBUF_PREFIX}: ${_advice}.")
 endif()
 file(STRINGS "${_version_header}" _line REGEX "#define GOOGLE_PROTOBUF_VERSION [0-9]+")
 string(REGEX MATCH "[0-9]+$" _number "${_line}")
@@ -54,3 +59,6 @@ set_target_properties(protobuf26 PROPERTIES
   IMPORTED_LOCATION "${QEL_PROTOBUF_LIBRARY}"
   INTERFACE_INCLUDE_DIRECTORIES "${QEL_PROTOBUF_PREFIX}/include"
   INTERFACE_LINK_LIBRARIES Threads::Threads)
+
+# The runtime's own checks name its headers as they are included.
+add_compile_options("-fmacro-prefix-map=${QEL_PROTOBUF_PREFIX}/include/=")

@@ -38,8 +38,7 @@ front_end=$!
 while [ ! -e "$scratch/port" ]; do
   if ! kill -0 "$front_end" 2>/dev/null; then
     front_end=
-    echo 'demo: the front end did not start' >&2
-    exit 1
+    exit 1 # it has said why
   fi
   sleep 0.05
 done

@@ -17,15 +17,17 @@
  * receive the encoded message: its first byte and its length. The buffer has exactly that length,
  * no terminating NUL and no length prefix; release it with free(). A failed check of an argument
  * leaves both outputs as they were. If the buffer cannot be allocated, *size holds the length and
- * *serialized_data is NULL. Values passed by value are always put on the wire, 0 and "" included.
- * userId and deviceId of a message stay unset unless the function takes them.
+ * *serialized_data is NULL. If the length is below 1, which no message of these functions is, *size
+ * holds it and *serialized_data is as it was. Values passed by value are always put on the wire, 0
+ * and "" included. userId and deviceId of a message stay unset unless the function takes them.
  *
  * Deserializers. They return nothing. An output is written only after the bytes were parsed and
  * consumed whole; otherwise every output keeps what the caller left in it, and the log has the
  * reason. To tell the two apart, set an output before the call to a value that the service never
  * sends. Fields that are absent from the message read as 0 unless the function says otherwise;
- * empty input (size 0) is a valid message without fields. Strings and arrays that are written
- * belong to the caller; release each with free().
+ * empty input (size 0) is a valid message without fields. More than 64 MiB (67108864 bytes) of
+ * input fail. Strings and arrays that are written belong to the caller; release each with free(). A
+ * string ends at the first NUL of the received text.
  *
  * Results. A reply's outcome comes back as resultCode and resultMsg. Unless the function says
  * otherwise either pointer may be NULL, *resultCode is written only if the reply has a result, and

@@ -336,6 +336,35 @@ TEST_F(ChatReplyDeserialize, WhenTheFirstFourOutputsAreNull_WritesTheOthers) {
   EXPECT_EQ(out_.times.block[1], 400);
 }
 
+TEST_F(ChatReplyDeserialize, WhenRequestIdIsNull_WritesChatroomId) {
+  const Received received(hex(kChatReply));
+  chat_reply_deserialize(received.data(), received.size(), nullptr, &out_.chatroom_id, &out_.code,
+                         &out_.text.block, &out_.count, &out_.ids.block, &out_.times.block);
+  EXPECT_EQ(out_.chatroom_id, 6);
+}
+
+TEST_F(ChatReplyDeserialize, WhenChatroomIdIsNull_WritesRequestId) {
+  const Received received(hex(kChatReply));
+  chat_reply_deserialize(received.data(), received.size(), &out_.request_id, nullptr, &out_.code,
+                         &out_.text.block, &out_.count, &out_.ids.block, &out_.times.block);
+  EXPECT_EQ(out_.request_id, 7);
+}
+
+TEST_F(ChatReplyDeserialize, WhenCodeIsNull_WritesText) {
+  const Received received(hex(kChatReply));
+  chat_reply_deserialize(received.data(), received.size(), &out_.request_id, &out_.chatroom_id,
+                         nullptr, &out_.text.block, &out_.count, &out_.ids.block,
+                         &out_.times.block);
+  EXPECT_STREQ(out_.text.block, "no");
+}
+
+TEST_F(ChatReplyDeserialize, WhenTextIsNull_WritesCode) {
+  const Received received(hex(kChatReply));
+  chat_reply_deserialize(received.data(), received.size(), &out_.request_id, &out_.chatroom_id,
+                         &out_.code, nullptr, &out_.count, &out_.ids.block, &out_.times.block);
+  EXPECT_EQ(out_.code, 3);
+}
+
 TEST_F(ChatReplyDeserialize, WhenArraysAreNullAndThereAreNoEntries_WritesCountZero) {
   const Received received(hex("58 07"));
   chat_reply_deserialize(received.data(), received.size(), &out_.request_id, &out_.chatroom_id,

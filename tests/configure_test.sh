@@ -45,7 +45,7 @@ case $1 in
     ;;
   no_runtime)
     refused -DQEL_PROTOBUF_ROOT="$scratch/nowhere"
-    expect "No Protocol Buffers 2.6 in $scratch/nowhere: run './dev setup', or let QEL_PROTOBUF_ROOT name an installation."
+    expect "No Protocol Buffers in $scratch/nowhere: let QEL_PROTOBUF_ROOT name an installation's folder, or leave it out and run './dev setup'."
     ;;
   compiler_that_does_not_run)
     refused -DQEL_PROTOBUF_ROOT="$protobuf" -DQEL_PROTOC="$scratch/nowhere"

@@ -8,7 +8,7 @@ trap 'rm -rf "$scratch"' EXIT
 
 fail() {
   printf '%s\n' "$*" >&2
-  cat "$scratch"/* >&2
+  head -n 50 "$scratch"/* >&2
   exit 1
 }
 
@@ -17,19 +17,10 @@ run() { "$demo" "$examples" "$@" >"$scratch/out" 2>"$scratch/err"; }
 case $1 in
   whole_session)
     run || fail 'the demo failed'
-    grep -E '^(plug-in ->|front end ->)' "$scratch/out" | sed 's/,.*//' >"$scratch/conversation"
-    diff - "$scratch/conversation" <<'TXT' || fail 'another conversation'
-plug-in -> front end  ChannelAuthRequest
-front end -> plug-in  ChannelAuthReply
-plug-in -> front end  CurrentTimeRequest
-front end -> plug-in  ClientEcho
-plug-in -> front end  ClientEchoReply
-front end -> plug-in  CurrentTimeReply
-plug-in -> front end  ChatRequest
-front end -> plug-in  ChatReply
-plug-in -> front end  ChatRequest
-front end -> plug-in  ChatReply
-TXT
+    # All but the port and the clock, whose numbers have as many digits on every day.
+    sed -E 's/(127\.0\.0\.1:|currentTimeMillis: |sentTime: |recorded at |clock says ).*/\1.../' \
+      "$scratch/out" | diff "$(dirname "${BASH_SOURCE[0]}")/demo_transcript.txt" - >&2 ||
+      fail 'another conversation'
     ;;
   access_token_is_not_shown)
     run || fail 'the demo failed'

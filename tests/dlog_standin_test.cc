@@ -152,6 +152,18 @@ TEST(DlogStandin, WhenTextIsTooLong_PrintsOneLineOf4096Bytes) {
   EXPECT_EQ(line.back(), '\n');
 }
 
+TEST(DlogStandin, WhenAColouredTextIsTooLong_EndsTheColour) {
+  const Terminal terminal;
+  if (!terminal.exists()) {
+    GTEST_SKIP() << "no pseudo-terminals on this machine";
+  }
+  // Shorter than the log service's memory, longer than its line.
+  const std::string text(4080, 'x');
+  const std::string line =
+      terminal.captured([&] { __dlog_print(0, 6, "T", "\033[31m%s\033[0m", text.c_str()); });
+  EXPECT_EQ(line.substr(line.size() - 6), "x\033[0m\n");
+}
+
 TEST(DlogStandin, WhenTagIsTooLong_PrintsOneLine) {
   const std::string tag(10000, 'x');
   const std::string line = on_pipe([&] { __dlog_print(0, 3, tag.c_str(), "text"); });

@@ -1,5 +1,5 @@
 #!/usr/bin/env bash
-# hardening_test.sh CASE LIBRARY: how the built library is linked.
+# hardening_test.sh CASE FILE...: how the built library, or its object files, are made.
 set -euo pipefail
 library=$2
 
@@ -15,8 +15,10 @@ case $1 in
   stack_is_not_executable)
     has 'GNU_STACK .* RW +0x' "$(readelf -lW "$library")"
     ;;
-  stack_is_protected)
-    has '__stack_chk_fail' "$(readelf --dyn-syms -W "$library")"
+  stacks_are_protected) # in every object file
+    for object in "${@:2}"; do
+      has '__stack_chk_fail' "$(readelf --syms -W "$object")" || { echo "not in $object" && exit 1; }
+    done
     ;;
   text_has_no_relocations)
     ! has 'TEXTREL' "$(readelf -dW "$library")"

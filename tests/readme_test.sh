@@ -1,22 +1,29 @@
 #!/usr/bin/env bash
-# readme_test.sh README HEADER-FOLDER LIBRARY CC [FLAG...]: the first program in the README compiles
-# as printed, without a warning, and prints what the README says.
+# readme_test.sh SOURCE BUILD CC [FLAG...]: the first program in the README compiles as printed, with
+# the command as printed, without a warning, and prints what the README says.
 set -euo pipefail
-readme=$1
-headers=$2
-library=$3
-compiler=$4
-shift 4
+source=$1
+build=$2
+compiler=$3
+flags=("${@:4}")
 scratch=$(mktemp -d)
 trap 'rm -rf "$scratch"' EXIT
 
-# block LANGUAGE: the first block of that language.
-block() { awk -v fence="\`\`\`$1" '$0 == fence {on = 1; next} on && /^```/ {exit} on' "$readme"; }
+# block LANGUAGE: the blocks of that language.
+block() { awk -v fence="\`\`\`$1" '/^```/ {on = $0 == fence; next} on' "$source/README.md"; }
 
+# The README's build folder is this one's.
+mkdir -p "$scratch/build"
+ln -s "$source/proto-lib" "$scratch/proto-lib"
+ln -s "$build" "$scratch/build/release"
 block c >"$scratch/first.c"
 block text >"$scratch/expected"
-[ -s "$scratch/first.c" ] && [ -s "$scratch/expected" ]
-"$compiler" "$@" -std=c99 -pedantic -Wall -Wextra -Werror -I "$headers" "$scratch/first.c" "$library" \
-  -Wl,-rpath,"$(dirname "$library")" -o "$scratch/first"
-DLOG_STANDIN_PRIORITY=S "$scratch/first" >"$scratch/printed"
-diff "$scratch/expected" "$scratch/printed"
+block sh | sed -n '/^cc first.c/,/[^\\]$/p' >"$scratch/command"
+[ -s "$scratch/first.c" ] && [ -s "$scratch/expected" ] && [ -s "$scratch/command" ]
+
+cc() { "$compiler" "${flags[@]}" -std=c99 -pedantic -Wall -Wextra -Werror "$@"; }
+cd "$scratch"
+# shellcheck disable=SC1091
+. "$scratch/command"
+DLOG_STANDIN_PRIORITY=S ./first >printed
+diff expected printed

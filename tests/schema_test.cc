@@ -320,6 +320,18 @@ TEST(IsValid, OfConnectionResetCause_AcceptsItsMembersAlone) {
   EXPECT_EQ(accepted(&ConnectionResetCause_IsValid), (std::set<int>{0, 1}));
 }
 
+TEST(Generated, FieldNumberConstants_AreTheNumbers) {
+  EXPECT_EQ(+ChatRequest::kChatMessageParamsFieldNumber, 13);
+  EXPECT_EQ(+ChannelAuthRequest::kProxyOptionsFieldNumber, 11);
+  EXPECT_EQ(+InboxEntry::kSecureChatMsgFieldNumber, 20);
+}
+
+TEST(Generated, FileFunctions_CanBeCalledByUsers) {
+  protobuf_AddDesc_msgspec_5ffrontend_2eproto();  // a second time does no harm
+  protobuf_AssignDesc_msgspec_5ffrontend_2eproto();
+  EXPECT_EQ(ChatRequest::descriptor(), schema().FindMessageTypeByName("ChatRequest"));
+}
+
 TEST(Descriptors, OfEnumerations_AreTheRegisteredOnes) {
   EXPECT_EQ(ProxyOption_descriptor(), schema().FindEnumTypeByName("ProxyOption"));
   EXPECT_EQ(ChatType_descriptor(), schema().FindEnumTypeByName("ChatType"));

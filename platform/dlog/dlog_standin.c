@@ -24,6 +24,8 @@
 /* A letter for each priority, from 0. */
 static const char priority_letters[] = "??VDIWEFS";
 
+static const char end_of_colour[] = "\033[0m";
+
 int __dlog_print(int log_id, int priority, const char* tag, const char* format, ...)
     __attribute__((format(printf, 4, 5)));
 
@@ -52,7 +54,7 @@ static const char* skip_colour(const char* text) {
 
 /* Appends text to the line from position at on, ready for output; returns the new position. */
 static size_t append_text(char* line, size_t at, const char* text, int with_colours) {
-  const size_t limit = LINE_LENGTH - 2; /* room for a two-character "\n" */
+  const size_t limit = LINE_LENGTH - sizeof end_of_colour - 2; /* and a two-character "\n" */
   while (*text != '\0' && at < limit) {
     const char* after = skip_colour(text);
     if (after != text && !with_colours) {
@@ -64,6 +66,10 @@ static size_t append_text(char* line, size_t at, const char* text, int with_colo
     } else {
       line[at++] = *text++;
     }
+  }
+  if (*text != '\0' && with_colours) { /* what is cut off had the colour's end */
+    memcpy(line + at, end_of_colour, sizeof end_of_colour - 1);
+    at += sizeof end_of_colour - 1;
   }
   return at;
 }

@@ -17,7 +17,8 @@ struct Record {
   bool on = false;
   size_t callocs = 0;
   std::array<support::HeapWatch::Block, kMost> calloc_blocks = {};
-  size_t news = 0;
+  size_t news = 0;  // ever
+  size_t live = 0;
   std::array<std::pair<void*, size_t>, kMost> new_blocks = {};
 };
 
@@ -75,16 +76,19 @@ void* operator new(size_t size) {
   if (block == nullptr) {
     throw std::bad_alloc();
   }
-  if (record.on && !paused && record.news < kMost) {
-    record.new_blocks[record.news++] = {block, size};
+  if (record.on && !paused) {
+    ++record.news;
+    if (record.live < kMost) {
+      record.new_blocks[record.live++] = {block, size};
+    }
   }
   return block;
 }
 
 void operator delete(void* block) noexcept {
-  for (size_t i = 0; record.on && i < record.news; ++i) {
+  for (size_t i = 0; record.on && i < record.live; ++i) {
     if (record.new_blocks[i].first == block) {
-      record.new_blocks[i] = record.new_blocks[--record.news];
+      record.new_blocks[i] = record.new_blocks[--record.live];
       break;
     }
   }
@@ -115,6 +119,7 @@ FailingNew::~FailingNew() {
 HeapWatch::HeapWatch() {
   record.callocs = 0;
   record.news = 0;
+  record.live = 0;
   record.on = true;
 }
 
@@ -124,7 +129,8 @@ void HeapWatch::stop() {
   }
   record.on = false;  // before the vectors below allocate
   callocs_.assign(record.calloc_blocks.begin(), record.calloc_blocks.begin() + record.callocs);
-  for (size_t i = 0; i < record.news; ++i) {
+  news_ = record.news;
+  for (size_t i = 0; i < record.live; ++i) {
     kept_.push_back(record.new_blocks[i].second);
   }
   std::sort(kept_.begin(), kept_.end());

@@ -42,11 +42,14 @@ class HeapWatch {
 
   // Every calloc, in order.
   const std::vector<Block>& callocs() const { return callocs_; }
+  // How many blocks operator new made.
+  size_t news() const { return news_; }
   // Sizes of the blocks that operator new made and operator delete did not release.
   const std::vector<size_t>& kept() const { return kept_; }
 
  private:
   std::vector<Block> callocs_;
+  size_t news_ = 0;
   std::vector<size_t> kept_;
 };
 

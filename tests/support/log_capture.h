@@ -37,12 +37,9 @@ std::vector<LogCall> logged_calls();
 void clear_log();
 
 // The log holds exactly these lines: each in the frame of its priority, naming the module, the
-// function, a line of that function that is not above the line before, and the calling thread.
-// Clears the log.
+// function, the line of the statement that logs it or of the shared step that does, and the calling
+// thread; the lines' numbers do not go back. Clears the log.
 void expect_log(const std::string& function, const std::vector<Line>& lines);
-
-// Line number of the module's source, from 1.
-std::string module_line(int number);
 
 }  // namespace support
 

@@ -1,0 +1,135 @@
+// The length of the encoded message: a length below 1 is refused, and the length is computed once.
+// Every request carries at least its id, so the test replaces the length that the messages report;
+// in a program of its own, because that concerns every call.
+
+#include <dlfcn.h>
+
+#include <cstring>
+#include <functional>
+#include <optional>
+#include <stdexcept>
+
+#include "msgspec_frontend.pb.h"
+#include "qel-message-serialize.h"
+#include "support/exchange.h"
+#include "support/heap.h"
+
+namespace {
+
+std::optional<int> replaced_length;
+int lengths_computed = 0;
+
+// What the messages answer, unless a test replaces it.
+template <typename Message>
+int length_of(const Message* message, const char* symbol) {
+  ++lengths_computed;
+  if (replaced_length) {
+    return *replaced_length;
+  }
+  int (*real)(const Message*) = nullptr;
+  void* found = dlsym(RTLD_NEXT, symbol);
+  if (found == nullptr) {
+    throw std::runtime_error(symbol);
+  }
+  std::memcpy(&real, &found, sizeof real);
+  return real(message);
+}
+
+}  // namespace
+
+// In the program itself, so that the library's virtual calls come here.
+int ChannelAuthRequest::ByteSize() const {
+  return length_of(this, "_ZNK18ChannelAuthRequest8ByteSizeEv");
+}
+int ClientEchoReply::ByteSize() const {
+  return length_of(this, "_ZNK15ClientEchoReply8ByteSizeEv");
+}
+int ChatRequest::ByteSize() const {
+  return length_of(this, "_ZNK11ChatRequest8ByteSizeEv");
+}
+int CurrentTimeRequest::ByteSize() const {
+  return length_of(this, "_ZNK18CurrentTimeRequest8ByteSizeEv");
+}
+
+namespace {
+
+struct Serializer {
+  std::string name;
+  std::string entry;  // text
+  std::function<int(unsigned char**, int*)> call;
+};
+
+void PrintTo(const Serializer& function, std::ostream* out) {
+  *out << function.name;
+}
+
+const Serializer kSerializers[] = {
+    {"channel_auth_request_serialize", "%s start",
+     [](unsigned char** data, int* size) {
+       return channel_auth_request_serialize(1, 2, 3, "a", "b", data, size);
+     }},
+    {"client_echo_reply_serialize", "%s start",
+     [](unsigned char** data, int* size) { return client_echo_reply_serialize(1, data, size); }},
+    {"chat_request_serialize", "%s start",
+     [](unsigned char** data, int* size) {
+       return chat_request_serialize(1, 2, 3, 0, "a", 4, 0, data, size);
+     }},
+    {"current_time_request_serialize", "%s: enter",
+     [](unsigned char** data, int* size) { return current_time_request_serialize(1, data, size); }},
+};
+
+class MessageLength : public support::ExchangeTest,
+                      public ::testing::WithParamInterface<Serializer> {
+ protected:
+  const Serializer& function_ = GetParam();
+  support::Encoded out_;
+
+  void TearDown() override { replaced_length.reset(); }
+  void call() { out_.status = function_.call(&out_.data.block, &out_.size); }
+};
+
+TEST_P(MessageLength, WhenZero_IsRefused) {
+  replaced_length = 0;
+  call();
+  EXPECT_EQ(out_.status, -1);
+  EXPECT_EQ(out_.size, 0);
+  EXPECT_TRUE(out_.data.untouched());
+}
+
+TEST_P(MessageLength, WhenNegative_IsRefused) {
+  replaced_length = -5;
+  call();
+  EXPECT_EQ(out_.status, -1);
+  EXPECT_EQ(out_.size, -5);
+  EXPECT_TRUE(out_.data.untouched());
+}
+
+TEST_P(MessageLength, WhenRefused_IsLogged) {
+  for (const int length : {0, -5}) {
+    replaced_length = length;
+    call();
+    support::expect_log(function_.name,
+                        {support::debug(function_.entry, {function_.name}),
+                         support::error("Invalid serialized data size : %d", {length})});
+  }
+}
+
+TEST_P(MessageLength, WhenRefused_KeepsNothing) {
+  replaced_length = 0;
+  support::HeapWatch watch;
+  call();
+  watch.stop();
+  EXPECT_EQ(watch.kept(), std::vector<size_t>{});
+}
+
+TEST_P(MessageLength, WhenSucceeding_IsComputedOnce) {
+  lengths_computed = 0;
+  call();
+  ASSERT_EQ(out_.status, 0);
+  EXPECT_EQ(lengths_computed, 1);
+}
+
+INSTANTIATE_TEST_SUITE_P(CallFrame, MessageLength, ::testing::ValuesIn(kSerializers),
+                         [](const auto& row) { return row.param.name; });
+
+}  // namespace
