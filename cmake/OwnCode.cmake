@@ -22,6 +22,9 @@ option(QEL_SANITIZE "Build with AddressSanitizer and UndefinedBehaviorSanitizer"
 if(QEL_SANITIZE)
   add_compile_options(-fsanitize=address,undefined -fno-sanitize-recover=all -fno-omit-frame-pointer)
   add_link_options(-fsanitize=address,undefined)
+  if(CMAKE_CXX_COMPILER_ID MATCHES "Clang")
+    add_compile_options(-fno-sanitize=vptr) # whose runtime clang does not link into C programs
+  endif()
 endif()
 
 # Aborts name files as they lie in the tree, wherever the build folder is: generated ones as if

@@ -47,7 +47,7 @@ set(QEL_PROTOC_COMMAND "${_protoc}")
 
 # Multiarch folders too: that is where a device SDK's sysroot keeps it.
 find_library(QEL_PROTOBUF_LIBRARY NAMES libprotobuf.so
-  HINTS "${QEL_PROTOBUF_PREFIX}" PATH_SUFFIXES lib "lib/${CMAKE_LIBRARY_ARCHITECTURE}"
+  HINTS "${QEL_PROTOBUF_PREFIX}" PATH_SUFFIXES lib lib64 "lib/${CMAKE_LIBRARY_ARCHITECTURE}"
   NO_DEFAULT_PATH NO_CACHE NO_CMAKE_FIND_ROOT_PATH)
 if(NOT QEL_PROTOBUF_LIBRARY)
   message(FATAL_ERROR "No libprotobuf.so in ${QEL_PROTOBUF_PREFIX}/lib: the runtime is linked dynamically, because other modules share its descriptor pool.")

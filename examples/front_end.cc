@@ -2,9 +2,10 @@
 // every message that it gets, answers with the schema's generated classes, and prints both
 // directions of the conversation.
 //
-//   front_end [--port PORT] [--port-file FILE]
+//   front_end [--port PORT] [--port-file FILE] [--timeout SECONDS]
 //
-// listens on 127.0.0.1, on a free port unless one is given, and writes the port's number to FILE.
+// listens on 127.0.0.1, on a free port unless one is given, writes the port's number to FILE, and
+// gives the plug-in so long to come and for each message.
 // Exits with 0 after a whole session, with 1 after a wrong exchange or when nobody comes, and with
 // 2 if it was called wrongly.
 
@@ -35,7 +36,7 @@ using google::protobuf::DescriptorPool;
 using google::protobuf::Message;
 using google::protobuf::MessageFactory;
 
-constexpr int kTimeoutSeconds = 10;
+constexpr int kSessionSeconds = 60;  // at most, whatever the plug-in does
 constexpr char kAccessToken[] = "example-access-token";
 constexpr int64_t kEchoId = 700001;
 
@@ -75,8 +76,8 @@ std::string text_form(const Message& message) {
   return text;
 }
 
-void print_message(const char* direction, const Message& message) {
-  std::printf("%s  %s, %d bytes\n%s", direction, message.GetTypeName().c_str(), message.ByteSize(),
+void print_message(const char* direction, const Message& message, int size) {
+  std::printf("%s  %s, %d bytes\n%s", direction, message.GetTypeName().c_str(), size,
               text_form(message).c_str());
 }
 
@@ -114,13 +115,13 @@ class Session {
             std::string("not a valid message: ") + frame.name);
     require(message->GetReflection()->GetUnknownFields(*message).empty(),
             std::string("unknown fields in: ") + frame.name);
-    print_message("plug-in -> front end", *message);
+    print_message("plug-in -> front end", *message, frame.size);
     return message;
   }
 
   void send(const Message& message) {
-    print_message("front end -> plug-in", message);
     const std::string bytes = message.SerializeAsString();
+    print_message("front end -> plug-in", message, static_cast<int>(bytes.size()));
     require(frame_send(connection_, message.GetTypeName().c_str(),
                        reinterpret_cast<const unsigned char*>(bytes.data()),
                        static_cast<int>(bytes.size())) == 0,
@@ -219,15 +220,16 @@ class Session {
   int64_t last_request_id_ = 0;
 };
 
-// Ends the program if the text is no port number.
-int parse_port(const char* text) {
+// A number of least to most; ends the program if the text is none.
+int parse_number(const char* what, const char* text, long least, long most) {
   char* end = nullptr;
-  const long port = std::strtol(text, &end, 10);
-  if (end == text || *end != '\0' || port < 0 || port > 65535) {
-    std::fprintf(stderr, "front_end: '%s' is no port number (0 to 65535)\n", text);
+  const long number = std::strtol(text, &end, 10);
+  if (end == text || *end != '\0' || number < least || number > most) {
+    std::fprintf(stderr, "front_end: %s takes a number of %ld to %ld, not '%s'\n", what, least,
+                 most, text);
     std::exit(2);
   }
-  return static_cast<int>(port);
+  return static_cast<int>(number);
 }
 
 std::string system_error(const std::string& what) {
@@ -271,11 +273,11 @@ void write_port_file(const std::string& path, int port) {
           system_error(path));
 }
 
-int accept_one(int listener) {
+int accept_one(int listener, int timeout_seconds) {
   pollfd waiting{listener, POLLIN, 0};
-  require(poll(&waiting, 1, kTimeoutSeconds * 1000) == 1, "nobody came");
+  require(poll(&waiting, 1, timeout_seconds * 1000) == 1, "nobody came");
   const int connection = accept(listener, nullptr, nullptr);
-  require(connection >= 0 && frame_set_timeout(connection, kTimeoutSeconds) == 0,
+  require(connection >= 0 && frame_set_timeout(connection, timeout_seconds) == 0,
           system_error("no connection"));
   return connection;
 }
@@ -284,19 +286,24 @@ int accept_one(int listener) {
 
 int main(int argc, char** argv) {
   int port = 0;
+  int timeout_seconds = 10;
   std::string port_file;
   for (int i = 1; i < argc; i += 2) {
     const std::string option = argv[i];
     if (i + 1 < argc && option == "--port") {
-      port = parse_port(argv[i + 1]);
+      port = parse_number("--port", argv[i + 1], 0, 65535);
     } else if (i + 1 < argc && option == "--port-file") {
       port_file = argv[i + 1];
+    } else if (i + 1 < argc && option == "--timeout") {
+      timeout_seconds = parse_number("--timeout", argv[i + 1], 1, kSessionSeconds);
     } else {
-      std::fprintf(stderr, "usage: front_end [--port PORT] [--port-file FILE]\n");
+      std::fprintf(stderr,
+                   "usage: front_end [--port PORT] [--port-file FILE] [--timeout SECONDS]\n");
       return 2;
     }
   }
   std::setvbuf(stdout, nullptr, _IOLBF, 0);  // in step with the plug-in
+  alarm(kSessionSeconds);
 
   try {
     const int listener = listen_on(port);
@@ -304,7 +311,7 @@ int main(int argc, char** argv) {
     if (!port_file.empty()) {
       write_port_file(port_file, port_of(listener));
     }
-    const int connection = accept_one(listener);
+    const int connection = accept_one(listener, timeout_seconds);
     close(listener);
     Session(connection).run();
     close(connection);

@@ -2,10 +2,11 @@
  * A message plug-in's session with the service, in plain C: it authenticates its channel, reads the
  * service's clock, answers the service's echo probes whenever they come, and sends chat messages.
  *
- *   plugin_session PORT [--access-token TEXT]
+ *   plugin_session PORT [--access-token TEXT] [--timeout SECONDS]
  *
- * talks to the front end that listens on that port of 127.0.0.1. Exits with 0 if every exchange
- * went as it should, with 1 otherwise, and with 2 if it was called wrongly.
+ * talks to the front end that listens on that port of 127.0.0.1, and gives it so long for each
+ * reply. Exits with 0 if every exchange went as it should, with 1 otherwise, and with 2 if it was
+ * called wrongly.
  */
 #define _POSIX_C_SOURCE 200809L
 #include <arpa/inet.h>
@@ -20,7 +21,11 @@
 #include "framing.h"
 #include "qel-message-serialize.h"
 
-enum { TIMEOUT_SECONDS = 10, TOO_LONG = 40001 };
+/* The whole session takes no longer, whatever the front end does. */
+enum { SESSION_SECONDS = 60 };
+
+/* One byte more than the library sends. */
+enum { TOO_LONG = 40001 };
 
 /* What an output is set to before a call, to see whether the call wrote it: no id or code of the
    service's. */
@@ -87,9 +92,17 @@ static int await_reply(int connection, const char* name, frame_t* reply) {
   }
 }
 
-/* Prints a reply's outcome, and releases its text. */
+/* Prints a reply's outcome, and releases its text. The outputs tell how the parse went: an id that
+   is not written means that it failed, and a text that is not that the reply has no whole result.
+ */
 static int check_result(const char* what, int64_t request_id, int code, char* text) {
-  printf("plug-in: %s: result %d, \"%s\"\n", what, code, text != NULL ? text : "");
+  if (request_id == NOT_WRITTEN) {
+    return failed("the reply could not be parsed");
+  }
+  if (text == NULL) {
+    return failed("the reply does not say how it went");
+  }
+  printf("plug-in: %s: result %d, \"%s\"\n", what, code, text);
   free(text);
   if (request_id != last_request_id) {
     return failed("the reply belongs to another request");
@@ -220,7 +233,7 @@ static int run_session(int connection, const char* access_token) {
   return 0;
 }
 
-static int connect_to(int port) {
+static int connect_to(int port, int timeout_seconds) {
   struct sockaddr_in address;
   int connection = socket(AF_INET, SOCK_STREAM, 0);
   memset(&address, 0, sizeof address);
@@ -228,7 +241,7 @@ static int connect_to(int port) {
   address.sin_addr.s_addr = htonl(INADDR_LOOPBACK);
   address.sin_port = htons((uint16_t)port);
   if (connection < 0 || connect(connection, (struct sockaddr*)&address, sizeof address) != 0 ||
-      frame_set_timeout(connection, TIMEOUT_SECONDS) != 0) {
+      frame_set_timeout(connection, timeout_seconds) != 0) {
     perror("plug-in: connection to the front end");
     if (connection >= 0) {
       close(connection);
@@ -238,21 +251,47 @@ static int connect_to(int port) {
   return connection;
 }
 
+/* Ends the program. */
+static void usage(void) {
+  fprintf(stderr, "usage: plugin_session PORT [--access-token TEXT] [--timeout SECONDS]\n");
+  exit(2);
+}
+
+/* A number of 1 to most; ends the program if the text is none. */
+static int parse_number(const char* text, long most) {
+  char* end = NULL;
+  const long number = strtol(text, &end, 10);
+  if (end == text || *end != '\0' || number < 1 || number > most) {
+    usage();
+  }
+  return (int)number;
+}
+
 int main(int argc, char** argv) {
   const char* access_token = "example-access-token";
-  const int port = argc > 1 ? atoi(argv[1]) : 0;
+  int timeout_seconds = 10;
+  int port;
   int connection;
   int status;
+  int i;
 
-  if (argc == 4 && strcmp(argv[2], "--access-token") == 0) {
-    access_token = argv[3];
-  } else if (argc != 2) {
-    fprintf(stderr, "usage: plugin_session PORT [--access-token TEXT]\n");
-    return 2;
+  if (argc < 2 || argc % 2 != 0) {
+    usage();
+  }
+  port = parse_number(argv[1], 65535);
+  for (i = 2; i < argc; i += 2) {
+    if (strcmp(argv[i], "--access-token") == 0) {
+      access_token = argv[i + 1];
+    } else if (strcmp(argv[i], "--timeout") == 0) {
+      timeout_seconds = parse_number(argv[i + 1], SESSION_SECONDS);
+    } else {
+      usage();
+    }
   }
   setvbuf(stdout, NULL, _IOLBF, 0); /* in step with the log and the front end */
+  alarm(SESSION_SECONDS);
 
-  connection = connect_to(port);
+  connection = connect_to(port, timeout_seconds);
   if (connection < 0) {
     return 1;
   }

@@ -25,7 +25,7 @@ while [ $# -gt 0 ]; do
   esac
 done
 
-scratch=$(mktemp -d)
+scratch=$(mktemp -d) || exit 1
 front_end=
 cleanup() {
   [ -z "$front_end" ] || kill "$front_end" 2>/dev/null

@@ -1,6 +1,6 @@
-// What the exported functions share: the end of every serializer, the beginning of every
-// deserializer, and the copies that hand text to the caller. Limits, NULL tests and range tests
-// differ from function to function and stand in their bodies.
+// What the exported functions share: the end of a serializer, the beginning of a deserializer, and
+// copies for the caller. Which function checks a limit or a range, and which outputs it leaves
+// alone, differs from one to the next and stands in their bodies.
 #ifndef QEL_CALL_FRAME_H
 #define QEL_CALL_FRAME_H
 
@@ -25,16 +25,16 @@ int encode(const MessageLite& message, unsigned char** serialized_data, int* siz
            CallSite site = here()) {
   *size = message.ByteSize();
   if (*size < 1) {
-    QEL_LOG(kLogError, site, "Invalid serialized data size : %d", *size);
+    QEL_LOG_AT(kLogError, site, "Invalid serialized data size : %d", *size);
     return -1;
   }
   *serialized_data = static_cast<unsigned char*>(calloc(static_cast<size_t>(*size), 1));
   if (*serialized_data == nullptr) {
-    QEL_LOG(kLogError, site, "Could not allocate memory for serialized data");
+    QEL_LOG_AT(kLogError, site, "Could not allocate memory for serialized data");
     return -1;
   }
   message.SerializeWithCachedSizesToArray(*serialized_data);
-  QEL_LOG(kLogDebug, site, "%s: exit", site.function);
+  QEL_LOG_AT(kLogDebug, site, "%s: exit", site.function);
   return 0;
 }
 
@@ -47,11 +47,11 @@ const CodedInputStream* parse(const unsigned char* data, int size, MessageLite* 
   auto* stream = new CodedInputStream(data, size);
   const bool parsed = message->ParseFromCodedStream(stream);
   if (!parsed) {
-    QEL_LOG(kLogError, site, "merge error : Could not parse the received data!");
+    QEL_LOG_AT(kLogError, site, "merge error : Could not parse the received data!");
   }
   // Tested even so: a parse can fail at a clean end, and succeed short of one.
   if (!stream->ConsumedEntireMessage()) {
-    QEL_LOG(kLogError, site, "ConsumedEntireMessage error :Could not parse the received data");
+    QEL_LOG_AT(kLogError, site, "ConsumedEntireMessage error :Could not parse the received data");
     return nullptr;
   }
   return parsed ? stream : nullptr;

@@ -18,13 +18,14 @@ struct CallSite {
   int line;
 };
 
-// The caller's own place. As a default argument: the place of the call that leaves it out.
+// The caller's own place. As a default argument: the place of the call that leaves it out. In a
+// lambda it names the lambda, so log from the exported function's own body.
 constexpr CallSite here(const char* function = __builtin_FUNCTION(), int line = __builtin_LINE()) {
   return {function, line};
 }
 
 // Asked of the kernel for each line: a cached id would be wrong in a forked process.
-inline int thread_id() {
+int thread_id() {
   return static_cast<int>(syscall(SYS_gettid));
 }
 
@@ -40,9 +41,12 @@ enum LogPriority { kLogDebug = 3, kLogInfo = 4, kLogWarn = 5, kLogError = 6 };
 #define QEL_COLOUR_kLogWarn "\033[33m"
 #define QEL_COLOUR_kLogError "\033[31m"
 
-// A macro, so that the whole format is one literal and the compiler checks it against the
-// arguments.
-#define QEL_LOG(PRIORITY, SITE, TEXT, ...)                                  \
+// Logs a line of the exported function in which it stands. A macro, so that the whole format is one
+// literal and the compiler checks it against the arguments.
+#define QEL_LOG(PRIORITY, TEXT, ...) QEL_LOG_AT(PRIORITY, here(), TEXT __VA_OPT__(, ) __VA_ARGS__)
+
+// The same for a shared step, which knows its call's place.
+#define QEL_LOG_AT(PRIORITY, SITE, TEXT, ...)                               \
   __dlog_print(kMainLogBuffer, PRIORITY, "MESSAGE_PLUGIN",                  \
                "%s: %s(%d) > " QEL_COLOUR_##PRIORITY "[%d]" TEXT "\033[0m", \
                "qel-message-serialize.cc", (SITE).function, (SITE).line,    \

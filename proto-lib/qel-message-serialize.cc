@@ -21,7 +21,7 @@ int channel_auth_request_serialize(int64_t requestId, int64_t userId, int64_t de
                                    const char* appId, const char* accessToken,
                                    unsigned char** serialized_data, int* size) {
   ChannelAuthRequest request;
-  QEL_LOG(kLogDebug, here(), "%s start", __func__);
+  QEL_LOG(kLogDebug, "%s start", __func__);
 
   request.set_requestid(requestId);
   request.set_userid(userId);
@@ -34,7 +34,7 @@ int channel_auth_request_serialize(int64_t requestId, int64_t userId, int64_t de
 
 void channel_auth_reply_deserialize(const unsigned char* data, int size, int64_t* requestId,
                                     int* resultCode, char** resultMsg) {
-  QEL_LOG(kLogWarn, here(), "%s start", __func__);
+  QEL_LOG(kLogWarn, "%s start", __func__);
 
   ChannelAuthReply reply;
   const CodedInputStream* stream = parse(data, size, &reply);
@@ -54,7 +54,7 @@ void channel_auth_reply_deserialize(const unsigned char* data, int size, int64_t
 
 int client_echo_reply_serialize(int64_t requestId, unsigned char** serialized_data, int* size) {
   ClientEchoReply reply;
-  QEL_LOG(kLogDebug, here(), "%s start", __func__);
+  QEL_LOG(kLogDebug, "%s start", __func__);
 
   reply.set_requestid(requestId);
 
@@ -62,7 +62,7 @@ int client_echo_reply_serialize(int64_t requestId, unsigned char** serialized_da
 }
 
 void client_echo_deserialize(const unsigned char* data, int size, int64_t* requestId) {
-  QEL_LOG(kLogWarn, here(), "%s start", __func__);
+  QEL_LOG(kLogWarn, "%s start", __func__);
 
   ClientEcho echo;
   const CodedInputStream* stream = parse(data, size, &echo);
@@ -73,7 +73,7 @@ void client_echo_deserialize(const unsigned char* data, int size, int64_t* reque
   *requestId = echo.requestid();
 
   delete stream;
-  QEL_LOG(kLogWarn, here(), "%s: exit", __func__);
+  QEL_LOG(kLogWarn, "%s: exit", __func__);
 }
 
 // ---- Sending chat messages
@@ -85,7 +85,7 @@ int chat_request_serialize(int64_t requestId, int64_t chatroomId, int64_t msgId,
   constexpr int kMaxChatMsgLength = 40000;
 
   ChatRequest request;
-  QEL_LOG(kLogDebug, here(), "%s start", __func__);
+  QEL_LOG(kLogDebug, "%s start", __func__);
 
   request.set_requestid(requestId);
   request.set_chatroomid(chatroomId);
@@ -95,19 +95,19 @@ int chat_request_serialize(int64_t requestId, int64_t chatroomId, int64_t msgId,
 
   // The text has kept an older bound.
   if (static_cast<unsigned>(msgType) > kMaxMsgType) {
-    QEL_LOG(kLogError, here(), "msgType is out of range(0~6)");
+    QEL_LOG(kLogError, "msgType is out of range(0~6)");
     return -1;
   }
   param->set_msgtype(static_cast<MsgType>(msgType));
 
   if (chatMsg == nullptr) {
-    QEL_LOG(kLogError, here(), "no message");
+    QEL_LOG(kLogError, "no message");
     return -1;
   }
   const size_t length = strlen(chatMsg);
   if (length > kMaxChatMsgLength) {
-    QEL_LOG(kLogError, here(), "chatMsg length(%d) cannot be greater than %d",
-            static_cast<int>(length), kMaxChatMsgLength);
+    QEL_LOG(kLogError, "chatMsg length(%d) cannot be greater than %d", static_cast<int>(length),
+            kMaxChatMsgLength);
     return -1;
   }
   param->set_chatmsg(chatMsg, length);
@@ -118,7 +118,7 @@ int chat_request_serialize(int64_t requestId, int64_t chatroomId, int64_t msgId,
 void chat_reply_deserialize(const unsigned char* data, int size, int64_t* requestId,
                             int64_t* chatroomId, int* resultCode, char** resultMsg, int* count,
                             int64_t** msgIds, int64_t** sentTimes) {
-  QEL_LOG(kLogWarn, here(), "%s: start", __func__);
+  QEL_LOG(kLogWarn, "%s: start", __func__);
 
   ChatReply reply;
   if (parse(data, size, &reply) == nullptr) {
@@ -136,7 +136,7 @@ void chat_reply_deserialize(const unsigned char* data, int size, int64_t* reques
   }
 
   const int entries = reply.processedmessageentries_size();
-  QEL_LOG(kLogDebug, here(), "processed msg entry size : %d", entries);
+  QEL_LOG(kLogDebug, "processed msg entry size : %d", entries);
   *count = entries;
   if (entries > 0) {
     if (msgIds != nullptr) {
@@ -147,7 +147,7 @@ void chat_reply_deserialize(const unsigned char* data, int size, int64_t* reques
     }
     // Required by now, and not tested. NOLINTNEXTLINE(clang-analyzer-core.NullDereference)
     if (*msgIds == nullptr || *sentTimes == nullptr) {
-      QEL_LOG(kLogError, here(), "memory allocation error(msgId, sentTime)");
+      QEL_LOG(kLogError, "memory allocation error(msgId, sentTime)");
       *count = 0;  // an array that was allocated stays with the caller
       return;
     }
@@ -162,14 +162,14 @@ void chat_reply_deserialize(const unsigned char* data, int size, int64_t* reques
     }
   }
 
-  QEL_LOG(kLogWarn, here(), "%s: exit", __func__);
+  QEL_LOG(kLogWarn, "%s: exit", __func__);
 }
 
 // ---- The service's clock
 
 int current_time_request_serialize(int64_t requestId, unsigned char** serialized_data, int* size) {
   CurrentTimeRequest request;
-  QEL_LOG(kLogDebug, here(), "%s: enter", __func__);
+  QEL_LOG(kLogDebug, "%s: enter", __func__);
 
   request.set_requestid(requestId);
 
@@ -178,7 +178,7 @@ int current_time_request_serialize(int64_t requestId, unsigned char** serialized
 
 void current_time_deserialize(const unsigned char* data, int size, int64_t* requestId,
                               int64_t* currentTimeMillis, int* resultCode, char** resultMsg) {
-  QEL_LOG(kLogWarn, here(), "%s: start", __func__);
+  QEL_LOG(kLogWarn, "%s: start", __func__);
 
   CurrentTimeReply reply;
   if (parse(data, size, &reply) == nullptr) {
@@ -191,5 +191,5 @@ void current_time_deserialize(const unsigned char* data, int size, int64_t* requ
     copy_result(reply.result(), resultCode, resultMsg);
   }
 
-  QEL_LOG(kLogWarn, here(), "%s: exit", __func__);
+  QEL_LOG(kLogWarn, "%s: exit", __func__);
 }

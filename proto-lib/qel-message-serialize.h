@@ -25,9 +25,10 @@
  * consumed whole; otherwise every output keeps what the caller left in it, and the log has the
  * reason. To tell the two apart, set an output before the call to a value that the service never
  * sends. Fields that are absent from the message read as 0 unless the function says otherwise;
- * empty input (size 0) is a valid message without fields. More than 64 MiB (67108864 bytes) of
- * input fail. Strings and arrays that are written belong to the caller; release each with free(). A
- * string ends at the first NUL of the received text.
+ * empty input (size 0) is a valid message without fields, and so is one that was cut between two
+ * fields: only the transport can tell that a message is whole. Input of more than 64 MiB (67108864
+ * bytes) or of more than 100 nested levels fails. Strings and arrays that are written belong to the
+ * caller; release each with free(). A string ends at the first NUL of the received text.
  *
  * Results. A reply's outcome comes back as resultCode and resultMsg. Unless the function says
  * otherwise either pointer may be NULL, *resultCode is written only if the reply has a result, and

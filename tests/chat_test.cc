@@ -22,6 +22,13 @@ using support::TextOutput;
 using support::to_hex;
 using support::Wire;
 
+// How the compiler writes a global type in the name of a function.
+#ifdef __clang__
+#define QEL_TYPE_SCOPE "::"
+#else
+#define QEL_TYPE_SCOPE ""
+#endif
+
 constexpr int64_t kSmallest = std::numeric_limits<int64_t>::min();
 constexpr int kSmallestInt = std::numeric_limits<int>::min();
 constexpr int kLargestInt = std::numeric_limits<int>::max();
@@ -119,7 +126,8 @@ TEST_F(ChatRequestSerialize, WhenTypeIsInRangeButNoMember_Aborts) {
       SCOPED_TRACE(type);
       EXPECT_EXIT(call_with_type(type), support::aborts,
                   ": proto-lib/msgspec_frontend\\.pb\\.h:[0-9]+: "
-                  "void ChatMessageParam::set_msgtype\\(MsgType\\): "
+                  "void ChatMessageParam::set_msgtype\\(" QEL_TYPE_SCOPE
+                  "MsgType\\): "
                   "Assertion `::MsgType_IsValid\\(value\\)' failed\\.");
     }
   }
@@ -320,6 +328,12 @@ TEST_F(ChatReplyDeserialize, WhenResultIsEmpty_WritesCodeZeroAndLeavesText) {
 TEST_F(ChatReplyDeserialize, WhenTextIsEmptyButPresent_WritesEmptyText) {
   out_.read(hex("6a 02 12 00"));
   EXPECT_STREQ(out_.text.block, "");
+}
+
+TEST_F(ChatReplyDeserialize, WhenTextIsLong_CopiesAllOfIt) {
+  const std::string text(5000, 'x');
+  out_.read(Wire().message(13, Wire().text(2, text)).bytes());
+  EXPECT_EQ(out_.text.block, text);
 }
 
 TEST_F(ChatReplyDeserialize, WhenTextHoldsANul_CopiesUpToIt) {

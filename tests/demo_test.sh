@@ -1,6 +1,7 @@
 #!/usr/bin/env bash
 # demo_test.sh CASE EXAMPLES: the demo as a user runs it, from the folder of its programs.
 set -euo pipefail
+unset DLOG_STANDIN_PRIORITY
 demo=$(dirname "${BASH_SOURCE[0]}")/../examples/run_demo.sh
 examples=$2
 scratch=$(mktemp -d)

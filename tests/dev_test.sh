@@ -2,7 +2,7 @@
 # dev_test.sh CASE SOURCE: what ./dev says when the machine lets it down. It runs from a copy in a
 # scratch folder, with commands of the machine replaced by others.
 set -euo pipefail
-scratch=$(mktemp -d)
+scratch=$(mktemp -d /tmp/dev-test-XXXXXX) # whatever TMPDIR: the path must have no blank
 trap 'rm -rf "$scratch"' EXIT
 mkdir "$scratch/checkout" "$scratch/bin"
 cp "$2/dev" "$scratch/checkout/dev"
@@ -87,6 +87,30 @@ case $1 in
     run "$scratch/checkout"
     expect 'dev: build Protocol Buffers 2.6.1 *: failed; the log says why; call ./dev again *'
     [ ! -e "$scratch/checkout/.deps/protobuf-2.6.1/complete" ] || refuse 'the half-done build counts as done'
+    ;;
+  finished_runtime_is_used_again)
+    all_installed
+    prefix=$scratch/checkout/.deps/protobuf-2.6.1
+    mkdir -p "$prefix"
+    recipe=$(sed -n 's/^readonly pb_recipe=\([0-9]*\).*/\1/p' "$2/dev")
+    echo "recipe $recipe, dbbd7bdd2381633995404de65a945ff1a7610b0da14593051b4738c90c6dd164, $prefix" >"$prefix/complete"
+    replace apt-get 'exit 100'
+    PATH="$scratch/bin:$PATH" QEL_PROTOBUF_ROOT='' "$scratch/checkout/dev" setup >"$scratch/out" 2>&1 ||
+      refuse 'did something all the same'
+    [ ! -s "$scratch/out" ] || refuse 'said something'
+    ;;
+  named_runtime_is_used_instead)
+    all_installed
+    replace apt-get 'exit 100'
+    PATH="$scratch/bin:$PATH" QEL_PROTOBUF_ROOT=/opt "$scratch/checkout/dev" setup >"$scratch/out" 2>&1 ||
+      refuse 'did something all the same'
+    ;;
+  unknown_command)
+    status=0
+    "$scratch/checkout/dev" frobnicate >"$scratch/out" 2>&1 || status=$?
+    [ "$status" -eq 2 ] || refuse "exit status $status"
+    grep -q '^usage: ./dev COMMAND' "$scratch/out" || refuse 'no usage'
+    [ ! -e "$scratch/checkout/.deps" ] || refuse 'left something behind'
     ;;
   *)
     refuse "no such case: $1"

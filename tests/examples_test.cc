@@ -24,6 +24,9 @@ namespace {
 using support::hex;
 using support::Wire;
 
+// For each message, in seconds: long for a busy machine, short for the tests of silence.
+const char kTimeout[] = "3";
+
 // A program whose standard error is kept and whose standard output is dropped.
 class Program {
  public:
@@ -91,6 +94,11 @@ std::string receive_message(int connection) {
   return status == 1 ? frame.name : "";
 }
 
+// A Result with a text.
+Wire result(int code) {
+  return Wire().number(1, code).text(2, "text");
+}
+
 // ---- The plug-in against a front end that misbehaves
 
 class PluginSession : public ::testing::Test {
@@ -103,7 +111,8 @@ class PluginSession : public ::testing::Test {
     ASSERT_EQ(bind(listener_, reinterpret_cast<sockaddr*>(&address), length), 0);
     ASSERT_EQ(listen(listener_, 1), 0);
     ASSERT_EQ(getsockname(listener_, reinterpret_cast<sockaddr*>(&address), &length), 0);
-    program_.reset(new Program({QEL_PLUGIN_SESSION, std::to_string(ntohs(address.sin_port))}));
+    program_.reset(new Program(
+        {QEL_PLUGIN_SESSION, std::to_string(ntohs(address.sin_port)), "--timeout", kTimeout}));
     connection_ = accept4(listener_, nullptr, nullptr, SOCK_CLOEXEC);
     ASSERT_GE(connection_, 0);
     ASSERT_EQ(receive_message(connection_), "ChannelAuthRequest");
@@ -116,7 +125,7 @@ class PluginSession : public ::testing::Test {
   // Answers the authentication, as it should be.
   void welcome() {
     send_message(connection_, "ChannelAuthReply",
-                 Wire().number(1, 1).message(2, Wire().number(1, 0)).bytes());
+                 Wire().number(1, 1).message(2, result(0)).bytes());
     ASSERT_EQ(receive_message(connection_), "CurrentTimeRequest");
   }
   void expect_failure(const std::string& reason) {
@@ -131,18 +140,23 @@ class PluginSession : public ::testing::Test {
 
 TEST_F(PluginSession, WhenTheReplyCannotBeParsed_Fails) {
   send_message(connection_, "ChannelAuthReply", hex("08"));
-  expect_failure("the reply belongs to another request");
+  expect_failure("the reply could not be parsed");
+}
+
+TEST_F(PluginSession, WhenTheReplyHasNoResult_Fails) {
+  send_message(connection_, "ChannelAuthReply", Wire().number(1, 1).bytes());
+  expect_failure("the reply does not say how it went");
 }
 
 TEST_F(PluginSession, WhenTheReplyIsForAnotherRequest_Fails) {
   send_message(connection_, "ChannelAuthReply",
-               Wire().number(1, 999).message(2, Wire().number(1, 0)).bytes());
+               Wire().number(1, 999).message(2, result(0)).bytes());
   expect_failure("the reply belongs to another request");
 }
 
 TEST_F(PluginSession, WhenTheServiceRefuses_Fails) {
   send_message(connection_, "ChannelAuthReply",
-               Wire().number(1, 1).message(2, Wire().number(1, 2001)).bytes());
+               Wire().number(1, 1).message(2, result(2001)).bytes());
   expect_failure("the service refused the request");
 }
 
@@ -153,6 +167,10 @@ TEST_F(PluginSession, WhenAnotherMessageComes_Fails) {
 
 TEST_F(PluginSession, WhenTheConnectionEnds_Fails) {
   shutdown(connection_, SHUT_RDWR);
+  expect_failure("the connection ended or fell silent where a reply was due");
+}
+
+TEST_F(PluginSession, WhenTheFrontEndFallsSilent_Fails) {
   expect_failure("the connection ended or fell silent where a reply was due");
 }
 
@@ -183,13 +201,16 @@ TEST_F(PluginSession, WhenAProbeCannotBeParsed_Fails) {
 
 TEST_F(PluginSession, WhenTheChatMessageIsNotConfirmed_Fails) {
   welcome();
-  const Wire ok = Wire().number(1, 0);
+  const Wire ok = result(0);
   send_message(connection_, "CurrentTimeReply", Wire().number(11, 2).message(12, ok).bytes());
   ASSERT_EQ(receive_message(connection_), "ChatRequest");
   send_message(connection_, "ChatReply",
                Wire().number(11, 3).number(12, 42).message(13, ok).bytes());
   expect_failure("the service did not confirm the message");
 }
+
+const char kPluginUsage[] =
+    "usage: plugin_session PORT [--access-token TEXT] [--timeout SECONDS]\n";
 
 TEST(PluginSessionAlone, WhenNobodyListens_Fails) {
   Program program({QEL_PLUGIN_SESSION, "1"});
@@ -200,7 +221,15 @@ TEST(PluginSessionAlone, WhenNobodyListens_Fails) {
 TEST(PluginSessionAlone, WhenCalledWithoutAPort_PrintsItsUsage) {
   Program program({QEL_PLUGIN_SESSION});
   EXPECT_EQ(program.exit_status(), 2);
-  EXPECT_EQ(program.messages(), "usage: plugin_session PORT [--access-token TEXT]\n");
+  EXPECT_EQ(program.messages(), kPluginUsage);
+}
+
+TEST(PluginSessionAlone, WhenThePortIsNone_PrintsItsUsage) {
+  for (const char* port : {"abc", "", "0", "-5", "70000"}) {
+    Program program({QEL_PLUGIN_SESSION, port});
+    EXPECT_EQ(program.exit_status(), 2);
+    EXPECT_EQ(program.messages(), kPluginUsage);
+  }
 }
 
 // ---- The front end against a plug-in that misbehaves
@@ -208,11 +237,10 @@ TEST(PluginSessionAlone, WhenCalledWithoutAPort_PrintsItsUsage) {
 class FrontEnd : public ::testing::Test {
  protected:
   void SetUp() override {
-    char folder[] = "/tmp/front-end-XXXXXX";
-    ASSERT_NE(mkdtemp(folder), nullptr);
-    folder_ = folder;
-    const std::string port_file = folder_ + "/port";
-    program_.reset(new Program({QEL_FRONT_END, "--port-file", port_file}));
+    std::string folder = testing::TempDir() + "front-end-XXXXXX";
+    ASSERT_NE(mkdtemp(folder.data()), nullptr);
+    const std::string port_file = folder + "/port";
+    program_.reset(new Program({QEL_FRONT_END, "--port-file", port_file, "--timeout", kTimeout}));
     for (int tries = 0; tries < 200 && access(port_file.c_str(), R_OK) != 0; ++tries) {
       usleep(50000);
     }
@@ -222,7 +250,7 @@ class FrontEnd : public ::testing::Test {
     ASSERT_EQ(std::fscanf(file, "%d", &port), 1);
     std::fclose(file);
     unlink(port_file.c_str());
-    rmdir(folder);
+    rmdir(folder.c_str());
 
     connection_ = socket(AF_INET, SOCK_STREAM | SOCK_CLOEXEC, 0);
     const sockaddr_in address = loopback(port);
@@ -244,10 +272,27 @@ class FrontEnd : public ::testing::Test {
     EXPECT_EQ(program_->messages(), "front_end: " + reason + "\n");
   }
 
-  std::string folder_;
   int connection_ = -1;
   std::unique_ptr<Program> program_;
 };
+
+TEST_F(FrontEnd, WhenThePluginFallsSilent_Fails) {
+  authenticate();
+  EXPECT_EQ(program_->exit_status(), 1);
+  EXPECT_EQ(program_->messages(), "front_end: the connection broke or fell silent\n");
+}
+
+TEST(FrontEndAlone, WhenNobodyComes_Fails) {
+  Program program({QEL_FRONT_END, "--timeout", "1"});
+  EXPECT_EQ(program.exit_status(), 1);
+  EXPECT_EQ(program.messages(), "front_end: nobody came\n");
+}
+
+TEST(FrontEndAlone, WhenThePortIsNone_SaysSo) {
+  Program program({QEL_FRONT_END, "--port", "70000"});
+  EXPECT_EQ(program.exit_status(), 2);
+  EXPECT_EQ(program.messages(), "front_end: --port takes a number of 0 to 65535, not '70000'\n");
+}
 
 TEST_F(FrontEnd, WhenTheMessageDoesNotExist_Fails) {
   send_message(connection_, "NoSuchMessage", "");

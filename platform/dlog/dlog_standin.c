@@ -75,7 +75,7 @@ static size_t append_text(char* line, size_t at, const char* text, int with_colo
 }
 
 int __dlog_print(int log_id, int priority, const char* tag, const char* format, ...) {
-  char text[LINE_LENGTH];
+  char text[LINE_LENGTH] = "";
   char line[LINE_LENGTH + 1];
   struct timespec now;
   struct tm local;

@@ -99,6 +99,18 @@ void operator delete(void* block, size_t /*size*/) noexcept {
   operator delete(block);
 }
 
+void* operator new[](size_t size) {
+  return operator new(size);
+}
+
+void operator delete[](void* block) noexcept {
+  operator delete(block);
+}
+
+void operator delete[](void* block, size_t /*size*/) noexcept {
+  operator delete(block);
+}
+
 namespace support {
 
 FailingCalloc::FailingCalloc(int n) {

@@ -1,5 +1,6 @@
 #include "support/peer.h"
 
+#include <gtest/gtest.h>
 #include <unistd.h>
 
 #include <cstdlib>
@@ -18,22 +19,21 @@ std::string read_file(const std::string& path) {
 // Runs protoc with the given input and returns its output.
 std::string run_peer(const std::string& mode, const std::string& message,
                      const std::string& input) {
-  char folder[] = "/tmp/peer-XXXXXX";
-  if (mkdtemp(folder) == nullptr) {
-    throw std::runtime_error("no temporary folder");
+  std::string base = testing::TempDir() + "peer-XXXXXX";
+  if (mkdtemp(base.data()) == nullptr) {
+    throw std::runtime_error("no temporary folder " + base);
   }
-  const std::string base = folder;
   std::ofstream(base + "/in", std::ios::binary) << input;
   const std::string command = "'" QEL_PEER_PROTOC "' --proto_path='" QEL_SCHEMA_FOLDER "' --" +
-                              mode + "=" + message + " msgspec_frontend.proto <" + base + "/in >" +
-                              base + "/out 2>" + base + "/messages";
+                              mode + "=" + message + " msgspec_frontend.proto <'" + base +
+                              "/in' >'" + base + "/out' 2>'" + base + "/messages'";
   const int status = std::system(command.c_str());
   std::string output = read_file(base + "/out");
   const std::string messages = read_file(base + "/messages");
   for (const char* name : {"/in", "/out", "/messages"}) {
     unlink((base + name).c_str());
   }
-  rmdir(folder);
+  rmdir(base.c_str());
   if (status != 0) {
     throw std::runtime_error(command + ": " + messages);
   }
