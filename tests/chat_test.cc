@@ -16,7 +16,6 @@ using support::FailingCalloc;
 using support::hex;
 using support::IdListOutput;
 using support::kIntSentinel;
-using support::kLongSentinel;
 using support::Received;
 using support::TextOutput;
 using support::to_hex;
