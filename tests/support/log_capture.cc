@@ -89,7 +89,7 @@ std::string statement_at(int line) {
     if (ends_another && !statement.empty()) {
       break;
     }
-    statement = text + statement;
+    statement.insert(0, text);
   }
   return statement;
 }
