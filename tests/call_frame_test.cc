@@ -5,12 +5,12 @@
 #include <sys/wait.h>
 #include <unistd.h>
 
-#include <functional>
 #include <set>
 #include <thread>
 
 #include "support/heap.h"
 #include "support/outputs.h"
+#include "support/serializers.h"
 
 namespace {
 
@@ -18,8 +18,10 @@ using support::expect_log;
 using support::FailingCalloc;
 using support::HeapWatch;
 using support::hex;
+using support::kSerializers;
 using support::Line;
 using support::logged_calls;
+using support::Serializer;
 
 int log_thread(size_t call) {
   return std::get<int>(logged_calls().at(call).arguments.at(3));
@@ -28,37 +30,6 @@ int log_thread(size_t call) {
 constexpr int kCallsOfAThread = 5000;
 
 // ---- Serializers
-
-struct Serializer {
-  std::string name;
-  std::string entry;  // text
-  int length;         // of what call makes for a request id below 128
-  size_t news;        // blocks that the message takes from operator new
-  std::function<int(int64_t request_id, unsigned char**, int*)> call;
-};
-
-const Serializer kSerializers[] = {
-    {"channel_auth_request_serialize", "%s start", 12, 2,
-     [](int64_t id, unsigned char** data, int* size) {
-       return channel_auth_request_serialize(id, 2, 3, "a", "b", data, size);
-     }},
-    {"client_echo_reply_serialize", "%s start", 2, 0,
-     [](int64_t id, unsigned char** data, int* size) {
-       return client_echo_reply_serialize(id, data, size);
-     }},
-    {"chat_request_serialize", "%s start", 15, 3,
-     [](int64_t id, unsigned char** data, int* size) {
-       return chat_request_serialize(id, 2, 3, 0, "a", 4, 0, data, size);
-     }},
-    {"current_time_request_serialize", "%s: enter", 2, 0,
-     [](int64_t id, unsigned char** data, int* size) {
-       return current_time_request_serialize(id, data, size);
-     }},
-};
-
-void PrintTo(const Serializer& function, std::ostream* out) {
-  *out << function.name;
-}
 
 class EverySerializer : public support::ExchangeTest,
                         public ::testing::WithParamInterface<Serializer> {

@@ -5,14 +5,13 @@
 #include <dlfcn.h>
 
 #include <cstring>
-#include <functional>
 #include <optional>
 #include <stdexcept>
 
 #include "msgspec_frontend.pb.h"
-#include "qel-message-serialize.h"
 #include "support/exchange.h"
 #include "support/heap.h"
+#include "support/serializers.h"
 
 namespace {
 
@@ -53,30 +52,8 @@ int CurrentTimeRequest::ByteSize() const {
 
 namespace {
 
-struct Serializer {
-  std::string name;
-  std::string entry;  // text
-  std::function<int(unsigned char**, int*)> call;
-};
-
-void PrintTo(const Serializer& function, std::ostream* out) {
-  *out << function.name;
-}
-
-const Serializer kSerializers[] = {
-    {"channel_auth_request_serialize", "%s start",
-     [](unsigned char** data, int* size) {
-       return channel_auth_request_serialize(1, 2, 3, "a", "b", data, size);
-     }},
-    {"client_echo_reply_serialize", "%s start",
-     [](unsigned char** data, int* size) { return client_echo_reply_serialize(1, data, size); }},
-    {"chat_request_serialize", "%s start",
-     [](unsigned char** data, int* size) {
-       return chat_request_serialize(1, 2, 3, 0, "a", 4, 0, data, size);
-     }},
-    {"current_time_request_serialize", "%s: enter",
-     [](unsigned char** data, int* size) { return current_time_request_serialize(1, data, size); }},
-};
+using support::kSerializers;
+using support::Serializer;
 
 class MessageLength : public support::ExchangeTest,
                       public ::testing::WithParamInterface<Serializer> {
@@ -85,7 +62,7 @@ class MessageLength : public support::ExchangeTest,
   support::Encoded out_;
 
   void TearDown() override { replaced_length.reset(); }
-  void call() { out_.status = function_.call(&out_.data.block, &out_.size); }
+  void call() { out_.status = function_.call(1, &out_.data.block, &out_.size); }
 };
 
 TEST_P(MessageLength, WhenZero_IsRefused) {
