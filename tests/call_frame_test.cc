@@ -5,6 +5,8 @@
 #include <sys/wait.h>
 #include <unistd.h>
 
+#include <atomic>
+#include <functional>
 #include <set>
 #include <thread>
 
@@ -27,7 +29,20 @@ int log_thread(size_t call) {
   return std::get<int>(logged_calls().at(call).arguments.at(3));
 }
 
-constexpr int kCallsOfAThread = 5000;
+// Two threads at once, numbered 0 and 1, call many times; returns how many calls were not right.
+int wrong_calls_of_two_threads(const std::function<bool(size_t thread)>& call_is_right) {
+  std::atomic<int> wrong = 0;
+  const auto call_often = [&](size_t thread) {
+    for (int n = 0; n < 5000; ++n) {
+      wrong += call_is_right(thread) ? 0 : 1;
+    }
+  };
+  std::thread first(call_often, 0);
+  std::thread second(call_often, 1);
+  first.join();
+  second.join();
+  return wrong;
+}
 
 // ---- Serializers
 
@@ -119,20 +134,7 @@ TEST_P(EverySerializer, WhenTwoThreadsCallIt_EncodesEachOnesArguments) {
   };
   const int64_t ids[] = {1, INT64_MAX};
   const std::string expected[] = {encode(ids[0]), encode(ids[1])};
-  int wrong[] = {0, 0};
-  std::vector<std::thread> threads;
-  for (size_t i = 0; i < 2; ++i) {
-    threads.emplace_back([&, i] {
-      for (int n = 0; n < kCallsOfAThread; ++n) {
-        wrong[i] += encode(ids[i]) != expected[i] ? 1 : 0;
-      }
-    });
-  }
-  for (std::thread& thread : threads) {
-    thread.join();
-  }
-  EXPECT_EQ(wrong[0], 0);
-  EXPECT_EQ(wrong[1], 0);
+  EXPECT_EQ(wrong_calls_of_two_threads([&](size_t i) { return encode(ids[i]) == expected[i]; }), 0);
 }
 
 INSTANTIATE_TEST_SUITE_P(CallFrame, EverySerializer, ::testing::ValuesIn(kSerializers),
@@ -357,20 +359,9 @@ TEST_P(EveryDeserializer, WhenTheStreamCannotBeAllocated_ThrowsAfterItsEntryLine
 TEST_P(EveryDeserializer, WhenTwoThreadsCallIt_ReadsEachOnesMessage) {
   // One reads a whole message, the other one that is cut; neither sees the other's.
   const std::string messages[] = {function_.whole, function_.whole.substr(0, 1)};
-  int wrong[] = {0, 0};
-  std::vector<std::thread> threads;
-  for (size_t i = 0; i < 2; ++i) {
-    threads.emplace_back([&, i] {
-      for (int n = 0; n < kCallsOfAThread; ++n) {
-        wrong[i] += leaves_outputs(messages[i]) != (i == 1) ? 1 : 0;
-      }
-    });
-  }
-  for (std::thread& thread : threads) {
-    thread.join();
-  }
-  EXPECT_EQ(wrong[0], 0);
-  EXPECT_EQ(wrong[1], 0);
+  EXPECT_EQ(
+      wrong_calls_of_two_threads([&](size_t i) { return leaves_outputs(messages[i]) == (i == 1); }),
+      0);
 }
 
 INSTANTIATE_TEST_SUITE_P(CallFrame, EveryDeserializer, ::testing::ValuesIn(kDeserializers),
