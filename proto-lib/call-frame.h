@@ -19,6 +19,19 @@ namespace {
 using google::protobuf::MessageLite;
 using google::protobuf::io::CodedInputStream;
 
+// A block of count elements, or nullptr if there is no memory: for the caller, who frees it. Which
+// lists are zeroed is part of the interface. Elements may be pointers to records.
+template <typename T>
+T* allocate(int count) {
+  // NOLINTNEXTLINE(bugprone-sizeof-expression)
+  return static_cast<T*>(malloc(static_cast<size_t>(count) * sizeof(T)));
+}
+template <typename T>
+T* allocate_zeroed(int count) {
+  // NOLINTNEXTLINE(bugprone-sizeof-expression)
+  return static_cast<T*>(calloc(static_cast<size_t>(count), sizeof(T)));
+}
+
 // Hands the message's encoding to the caller, who frees it. What the outputs hold after a failure
 // is part of the interface: the length is stored before it is checked, and so is the buffer.
 int encode(const MessageLite& message, unsigned char** serialized_data, int* size,
@@ -28,7 +41,7 @@ int encode(const MessageLite& message, unsigned char** serialized_data, int* siz
     QEL_LOG_AT(kLogError, site, "Invalid serialized data size : %d", *size);
     return -1;
   }
-  *serialized_data = static_cast<unsigned char*>(calloc(static_cast<size_t>(*size), 1));
+  *serialized_data = allocate_zeroed<unsigned char>(*size);
   if (*serialized_data == nullptr) {
     QEL_LOG_AT(kLogError, site, "Could not allocate memory for serialized data");
     return -1;
@@ -62,14 +75,19 @@ char* copy_text(const std::string& text) {
   return strdup(text.c_str());
 }
 
+// A result's text, if there is one and the caller asks for it.
+void copy_result_msg(const Result& result, char** resultMsg) {
+  if (resultMsg != nullptr && result.has_msg()) {
+    *resultMsg = copy_text(result.msg());
+  }
+}
+
 // A reply's outcome, as far as the caller asks for it.
 void copy_result(const Result& result, int* resultCode, char** resultMsg) {
   if (resultCode != nullptr) {
     *resultCode = result.code();
   }
-  if (resultMsg != nullptr && result.has_msg()) {
-    *resultMsg = copy_text(result.msg());
-  }
+  copy_result_msg(result, resultMsg);
 }
 
 }  // namespace

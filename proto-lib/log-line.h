@@ -2,6 +2,7 @@
 #ifndef QEL_LOG_LINE_H
 #define QEL_LOG_LINE_H
 
+#include <stdint.h>
 #include <sys/syscall.h>
 #include <unistd.h>
 
@@ -33,6 +34,11 @@ constexpr int kMainLogBuffer = 0;
 
 // A level's dlog priority; its colour is bound to it.
 enum LogPriority { kLogDebug = 3, kLogInfo = 4, kLogWarn = 5, kLogError = 6 };
+
+// An id as %lld takes it: int64_t is another type on some machines.
+constexpr long long lld(int64_t id) {
+  return id;
+}
 
 }  // namespace
 

@@ -19,7 +19,8 @@
  * leaves both outputs as they were. If the buffer cannot be allocated, *size holds the length and
  * *serialized_data is NULL. If the length is below 1, which no message of these functions is, *size
  * holds it and *serialized_data is as it was. Values passed by value are always put on the wire, 0
- * and "" included. userId and deviceId of a message stay unset unless the function takes them.
+ * and "" included; values passed by pointer are optional, and NULL leaves the field out. userId and
+ * deviceId of a message stay unset unless the function takes them.
  *
  * Deserializers. They return nothing. An output is written only after the bytes were parsed and
  * consumed whole; otherwise every output keeps what the caller left in it, and the log has the
@@ -27,8 +28,13 @@
  * sends. Fields that are absent from the message read as 0 unless the function says otherwise;
  * empty input (size 0) is a valid message without fields, and so is one that was cut between two
  * fields: only the transport can tell that a message is whole. Input of more than 64 MiB (67108864
- * bytes) or of more than 100 nested levels fails. Strings and arrays that are written belong to the
- * caller; release each with free(). A string ends at the first NUL of the received text.
+ * bytes) or of more than 100 nested levels fails. Strings, arrays and records that are written
+ * belong to the caller; release each with free(). A string ends at the first NUL of the received
+ * text. A string that cannot be allocated is NULL; an array or a record that cannot be is written
+ * through all the same, and the call faults, unless the function says otherwise.
+ *
+ * Lists. A list comes as an array and its count. The count is written even if it is 0; the array is
+ * written only if it has elements, so set it to NULL before the call.
  *
  * Results. A reply's outcome comes back as resultCode and resultMsg. Unless the function says
  * otherwise either pointer may be NULL, *resultCode is written only if the reply has a result, and
@@ -41,7 +47,13 @@
  * where the function says that it is released.
  *
  * Enumerations. A value outside the message's enumeration ends the process with an assertion
- * failure (SIGABRT), unless the function says that it checks the range.
+ * failure (SIGABRT), unless the function says that it checks the range. A number that the service
+ * sends and that is outside the enumeration reads as if the field were absent.
+ *
+ *   ChatType             SINGLE 0, GROUP 1, BROADCAST 2, SECURE 3, MONOLOGUE 4
+ *   MsgType              TEXT 0, MEDIA 1, CUSTOM 2, RECALL 3, NOTI 4, READ_ACK 5, DELIVERY_ACK 6,
+ *                        UNSEAL 10, VOIP_CALL_SETUP 30
+ *   IsTypingContentType  CONTENT_TEXT 0, CONTENT_IMAGE 1, CONTENT_VIDEO 2, CONTENT_AUDIO 3
  *
  * Exceptions. C++ exceptions out of the protocol runtime, for example std::bad_alloc while a text
  * is copied, are not caught.
@@ -49,16 +61,69 @@
  * Threads. Any thread may call any function at any time.
  *
  * Log. Each call logs its entry, its exit and its failures through __dlog_print, with the tag
- * MESSAGE_PLUGIN and the calling thread's id. The access token is never logged.
+ * MESSAGE_PLUGIN and the calling thread's id. Lines at error level are not always failures. The
+ * access token is never logged.
  */
 #ifndef QEL_MESSAGE_SERIALIZE_H
 #define QEL_MESSAGE_SERIALIZE_H
 
+#include <stdbool.h>
 #include <stdint.h>
 
 #ifdef __cplusplus
 extern "C" {
 #endif
+
+/* ---- Records ---- */
+
+/* Two users whose combination the service refuses. An id that it left out is 0. */
+typedef struct {
+  int64_t userA;
+  int64_t userB;
+} qel_message_didviolationuser_t;
+
+/* How far a member of a chatroom has acknowledged, as read or as delivered. */
+typedef struct {
+  int64_t userId;    /* the member */
+  int64_t msgId;     /* the last message that the member acknowledged */
+  int64_t timestamp; /* when */
+} qel_message_watermarkentry_t;
+
+/* A member of a chatroom. */
+typedef struct {
+  int64_t userId;
+  int64_t available; /* 1 or 0 */
+  char* name;        /* never NULL as handed out; "" without a name */
+} qel_message_chatroommember_t;
+
+/* A message in the inbox. */
+typedef struct {
+  int64_t msgId;
+  int32_t msgType; /* a MsgType */
+  int64_t sender;
+  int64_t receiver;
+  int64_t sentTime;
+  char* chatMsg; /* never NULL as handed out; "" without a text */
+  int64_t chatroomId;
+  int32_t chatType; /* a ChatType */
+  int32_t msgTtl;   /* the message's lifetime */
+} qel_message_inboxentry_t;
+
+/* A chat to end. */
+typedef struct {
+  int64_t chatroomId;
+  bool denyInvitation; /* refuse further invitations into it */
+} qel_message_endchatentry_t;
+
+/* ---- Stored messages: placeholders ---- */
+
+/* Do nothing at all: no message, no output, no log line. Any pointer may be NULL. */
+void forward_stored_message_reply_serialize(int64_t requestId, const char** nextPaginationKey,
+                                            const int* maxCount, unsigned char** serialized_data,
+                                            int* size);
+void forward_stored_message_deserialize(const unsigned char* data, int size, int64_t* requestId,
+                                        qel_message_inboxentry_t*** inboxEntries, int* count,
+                                        char** nextPaginationKey);
 
 /* ---- Channel authentication ---- */
 
@@ -92,6 +157,47 @@ int client_echo_reply_serialize(int64_t requestId, unsigned char** serialized_da
 
 /* ClientEcho. The input stream is released on success and kept on failure. */
 void client_echo_deserialize(const unsigned char* data, int size, int64_t* requestId);
+
+/* ---- Creating a chatroom ---- */
+
+/*
+ * CreateChatroomRequest.
+ *
+ * chatType        a ChatType; any other value ends the process
+ * receivers       whom to bring into it: receiversCount ids, in order. With NULL the call fails,
+ *                 whatever the count.
+ * receiversCount  0 or less sends no receivers
+ * chatroomTitle   may be NULL: no title is sent
+ */
+int create_chatroom_request_serialize(int64_t requestId, int chatType, const int64_t* receivers,
+                                      int receiversCount, const char* chatroomTitle,
+                                      unsigned char** serialized_data, int* size);
+
+/*
+ * CreateChatroomReply: the new chatroom, and the receivers whom the service refused.
+ *
+ * chatroomId  the new chatroom
+ * msgTtl      the lifetime of its messages. Not written if the reply has none.
+ * resultCode  may be NULL only if the result carries no details of refused receivers: the code is
+ *             then read back through this pointer.
+ *
+ * The details are four lists. They are written, counts included, only if the reply carries details
+ * and its code is 1000, 1001 or 3009:
+ *
+ * invalidReceivers   ids that are no receivers. Under 1000 and 3009 their number alone is written,
+ *                    and no array.
+ * disabledReceivers  users who are disabled
+ * didViolationUsers  pairs of users that are a DID violation
+ * invitationDenied   users who deny invitations
+ */
+void create_chatroom_reply_deserialize(const unsigned char* data, int size, int64_t* requestId,
+                                       int64_t* chatroomId, int* msgTtl, int* resultCode,
+                                       char** resultMsg, int64_t** invalidReceivers,
+                                       int* invalidReceiversCount, int64_t** disabledReceivers,
+                                       int* disabledReceiversCount,
+                                       qel_message_didviolationuser_t** didViolationUsers,
+                                       int* didViolationUsersCount, int64_t** invitationDenied,
+                                       int* invitationDeniedCount);
 
 /* ---- Sending chat messages ---- */
 
@@ -127,6 +233,197 @@ void chat_reply_deserialize(const unsigned char* data, int size, int64_t* reques
                             int64_t* chatroomId, int* resultCode, char** resultMsg, int* count,
                             int64_t** msgIds, int64_t** sentTimes);
 
+/* ---- Entering a chatroom ---- */
+
+/*
+ * AllowChatRequest: enters a chatroom and asks for its state. No argument is refused.
+ *
+ * isAutoAllow                    may be NULL
+ * maxCount                       how many entries at most: 1 to 500; any other number is sent as
+ *                                500
+ * needDeliveryAck                whether to send delivery marks, those that are newer than
+ * lastDeliveryAckTimestamp       this time, which is sent only with needDeliveryAck
+ * needReadAck                    the same for read marks
+ * lastReadAckTimestamp
+ * needOrderedChatroomMemberList  whether to send the members
+ * needChatroomMeta               whether to send title and lifetime
+ */
+int allow_chat_request_serialize(int64_t requestId, int64_t chatroomId, const bool* isAutoAllow,
+                                 int maxCount, bool needDeliveryAck,
+                                 int64_t lastDeliveryAckTimestamp, bool needReadAck,
+                                 int64_t lastReadAckTimestamp, bool needOrderedChatroomMemberList,
+                                 bool needChatroomMeta, unsigned char** serialized_data, int* size);
+
+/*
+ * AllowChatReply: the chatroom's state.
+ *
+ * resultCode                must not be NULL if the reply has a result
+ * deliveryAckEntries        deliveryAckCount pointers to one record each
+ * lastDeliveryAckTimestamp  not written if the reply has none
+ * readAckEntries            readAckCount pointers to one record each
+ * lastReadAckTimestamp      not written if the reply has none
+ * members                   memberCount pointers to one record each, in the service's order
+ * title, msgTtl             not written if the reply has none
+ *
+ * Each of the three arrays, each record that it points to and each member's name is a block of its
+ * own: release names, records and array, in this order.
+ */
+void allow_chat_reply_deserialize(const unsigned char* data, int size, int64_t* requestId,
+                                  int64_t* chatroomId, int* resultCode, char** resultMsg,
+                                  qel_message_watermarkentry_t*** deliveryAckEntries,
+                                  int* deliveryAckCount, int64_t* lastDeliveryAckTimestamp,
+                                  qel_message_watermarkentry_t*** readAckEntries, int* readAckCount,
+                                  int64_t* lastReadAckTimestamp,
+                                  qel_message_chatroommember_t*** members, int* memberCount,
+                                  char** title, int* msgTtl);
+
+/* ---- Fetching unread messages ---- */
+
+/*
+ * GetAllUnreadMessageRequest: asks for the messages that were stored meanwhile; the service pushes
+ * them as ForwardUnreadMessage.
+ *
+ * maxCount  messages in a page at most, may be NULL: 1 to 500; any other number is sent as 500
+ */
+int get_all_unread_message_request_serialize(int64_t requestId, const int* maxCount,
+                                             unsigned char** serialized_data, int* size);
+
+/* GetAllUnreadMessageReply. */
+void get_all_unread_message_reply_deserialize(const unsigned char* data, int size,
+                                              int64_t* requestId, int* resultCode,
+                                              char** resultMsg);
+
+/* ---- Push of one message, which the client acknowledges ---- */
+
+/*
+ * ForwardOnlineMessageReply.
+ *
+ * requestId   that of the ForwardOnlineMessage which is acknowledged
+ * markAsRead  may be NULL
+ */
+int forward_online_message_reply_serialize(int64_t requestId, int64_t chatroomId,
+                                           const bool* markAsRead, unsigned char** serialized_data,
+                                           int* size);
+
+/*
+ * ForwardOnlineMessage.
+ *
+ * chatroomId, chatType  the message's chatroom
+ * inboxEntry            *inboxEntry points to a record of the caller's, which is filled: msgId,
+ *                       msgType, sentTime and chatMsg always, sender, receiver and msgTtl only if
+ *                       the message has them, chatroomId and chatType never. What is not filled
+ *                       keeps what the caller put there. Release chatMsg.
+ * skipReply             true if the service wants no acknowledgement; false if it does not say
+ * errorCode, errorMsg   written only if *inboxEntry is NULL: 18, and a text to release; the outputs
+ *                       above have been written all the same.
+ *
+ * Logs values at error level too, in calls that succeed.
+ */
+void forward_online_message_get_deserialize(const unsigned char* data, int size, int64_t* requestId,
+                                            int64_t* chatroomId, int* chatType,
+                                            qel_message_inboxentry_t** inboxEntry, bool* skipReply,
+                                            int* errorCode, char** errorMsg);
+
+/* ---- Push of a page of stored messages, which the client acknowledges ---- */
+
+/*
+ * ForwardUnreadMessageReply: acknowledges the page and asks for the next one.
+ *
+ * requestId          that of the ForwardUnreadMessage which is acknowledged
+ * nextPaginationKey  points to the key that came with the page, or to NULL, or is NULL: no key is
+ *                    sent then
+ * maxCount           messages in a page at most, may be NULL: 1 to 500; any other number is sent as
+ *                    500. Logged in both cases.
+ */
+int forward_unread_message_reply_serialize(int64_t requestId, const char** nextPaginationKey,
+                                           const int* maxCount, unsigned char** serialized_data,
+                                           int* size);
+
+/*
+ * ForwardUnreadMessage.
+ *
+ * inboxEntries       count pointers to one record each; chatroomId, chatType and msgTtl of a record
+ *                    are 0 where the message has none
+ * nextPaginationKey  may be NULL. Not written if the service sent none.
+ *
+ * Each record's chatMsg, each record and the array is a block of its own. If the array cannot be
+ * allocated *inboxEntries is NULL, *requestId and *count have been written, *nextPaginationKey has
+ * not, and no exit line is logged.
+ */
+void forward_unread_message_deserialize(const unsigned char* data, int size, int64_t* requestId,
+                                        qel_message_inboxentry_t*** inboxEntries, int* count,
+                                        char** nextPaginationKey);
+
+/* ---- Read receipt ---- */
+
+/*
+ * ReadMessageRequest: tells that a message was read.
+ *
+ * inboxEntry  the message, may be NULL: none is named then. Its msgId, msgType, sender and sentTime
+ *             are sent, nothing else. A msgType below 0 or above 30 makes the call fail; 7, 8, 9
+ *             and 11 to 29 end the process.
+ */
+int read_message_request_serialize(int64_t requestId, int64_t chatroomId,
+                                   const qel_message_inboxentry_t* inboxEntry,
+                                   unsigned char** serialized_data, int* size);
+
+/* ReadMessageReply. */
+void read_message_reply_deserialize(const unsigned char* data, int size, int64_t* requestId,
+                                    int64_t* chatroomId, int* resultCode, char** resultMsg);
+
+/* ---- Ending chats ---- */
+
+/*
+ * EndChatRequest: leaves chatrooms.
+ *
+ * entries  count records, in order. May be NULL if there are none.
+ * count    0 or less sends no entries
+ */
+int end_chat_request_serialize(int64_t requestId, const qel_message_endchatentry_t* entries,
+                               int count, unsigned char** serialized_data, int* size);
+
+/* EndChatReply. */
+void end_chat_reply_deserialize(const unsigned char* data, int size, int64_t* requestId,
+                                int* resultCode, char** resultMsg);
+
+/* ---- Inviting members ---- */
+
+/*
+ * InviteRequest: invites further users into a chatroom.
+ *
+ * invitingMembers       the invited: *invitingMembersCount ids, in order. May be NULL if there are
+ *                       none.
+ * invitingMembersCount  may be NULL: nobody is sent then. So it is with 0 or less.
+ */
+int invite_chat_request_serialize(int64_t requestId, int64_t chatroomId,
+                                  const int64_t* invitingMembers, const int* invitingMembersCount,
+                                  unsigned char** serialized_data, int* size);
+
+/*
+ * InviteReply: when the invitations were sent, and the users whom the service refused.
+ *
+ * sentTime    may be NULL. Not written if the reply has none.
+ * resultCode  may be NULL only if the result carries no details of refused users: the code is then
+ *             read back through this pointer.
+ *
+ * The details are six lists. They are written, counts included, only if the reply carries details
+ * and its code is 1000, 1001, 3003 or 3009:
+ *
+ * invalidReceivers      ids that are no receivers
+ * interruptedReceivers  users who are interrupted
+ * disabledReceivers     users who are disabled
+ * existingChatmembers   users who are members already
+ * didViolationUsers     pairs of users that are a DID violation
+ * invitationDenied      users who deny invitations
+ */
+void invite_reply_deserialize(
+    const unsigned char* data, int size, int64_t* requestId, int64_t* chatroomId, int64_t* sentTime,
+    int* resultCode, char** resultMsg, int64_t** invalidReceivers, int* invalidReceiversCount,
+    int64_t** interruptedReceivers, int* interruptedReceiversCount, int64_t** disabledReceivers,
+    int* disabledReceiversCount, int64_t** existingChatmembers, int* existingChatmembersCount,
+    qel_message_didviolationuser_t** didViolationUsers, int* didViolationUsersCount,
+    int64_t** invitationDenied, int* invitationDeniedCount);
+
 /* ---- The service's clock ---- */
 
 /* CurrentTimeRequest. */
@@ -139,6 +436,84 @@ int current_time_request_serialize(int64_t requestId, unsigned char** serialized
  */
 void current_time_deserialize(const unsigned char* data, int size, int64_t* requestId,
                               int64_t* currentTimeMillis, int* resultCode, char** resultMsg);
+
+/* ---- Unsealing a message ---- */
+
+/*
+ * UnsealMessageRequest: asks for a sealed message to be opened.
+ *
+ * sender, msgId  which message, and whose
+ * msgDetail      may be NULL
+ */
+int unseal_message_request_serialize(int64_t requestId, int64_t chatroomId, int64_t sender,
+                                     int64_t msgId, const char* msgDetail,
+                                     unsigned char** serialized_data, int* size);
+
+/* UnsealMessageReply. */
+void unseal_message_reply_deserialize(const unsigned char* data, int size, int64_t* requestId,
+                                      int64_t* chatroomId, int* resultCode, char** resultMsg);
+
+/* ---- Call log ---- */
+
+/*
+ * SaveCallLogRequest: stores the record of a call in a chatroom.
+ *
+ * callId               the call
+ * callLogType          what the two ends agreed to call its kind
+ * conversationSeconds  its duration in seconds
+ */
+int save_call_log_request_serialize(int64_t requestId, int64_t chatroomId, const char* callId,
+                                    const char* callLogType, int64_t sender, int64_t receiver,
+                                    int conversationSeconds, unsigned char** serialized_data,
+                                    int* size);
+
+/* SaveCallLogReply. */
+void save_call_log_reply_deserialize(const unsigned char* data, int size, int64_t* requestId,
+                                     int* resultCode, char** resultMsg);
+
+/* ---- Typing status ---- */
+
+/*
+ * IsTyping: tells that the user is typing. There is no reply.
+ *
+ * state        may be NULL; what the two ends agreed to call the state
+ * contentType  may be NULL, else points to an IsTypingContentType; any other value ends the process
+ * refresh      may be NULL
+ *
+ * Returns nothing: set *serialized_data to NULL before the call. If the buffer cannot be allocated,
+ * *serialized_data is NULL, *size holds the length, and the log line is at debug level.
+ */
+void is_typing_request_serialize(int64_t requestId, int64_t chatroomId, const char* state,
+                                 const int* contentType, const int* refresh,
+                                 unsigned char** serialized_data, int* size);
+
+/*
+ * TypingUpdated: the service's push that another member is typing.
+ *
+ * sender, state, contentType, refresh  not written if the message has none
+ */
+void typing_updated_deserialize(const unsigned char* data, int size, int64_t* requestId,
+                                int64_t* chatroomId, int64_t* sender, char** state,
+                                int* contentType, int* refresh);
+
+/* ---- Changing a chatroom's title or lifetime ---- */
+
+/*
+ * ChangeChatroomMetaRequest: changes one of the two.
+ *
+ * title   may be NULL or empty: no title then
+ * msgTtl  the lifetime of the chatroom's messages. May be NULL or point to a negative number: no
+ *         lifetime then.
+ *
+ * With both the title alone is sent, and a warning is logged. With neither the call fails.
+ */
+int change_chatroom_meta_request_serialize(int64_t requestId, int64_t chatroomId, const char* title,
+                                           const int* msgTtl, unsigned char** serialized_data,
+                                           int* size);
+
+/* ChangeChatroomMetaReply. */
+void change_chatroom_meta_reply_deserialize(const unsigned char* data, int size, int64_t* requestId,
+                                            int64_t* chatroomId, int* resultCode, char** resultMsg);
 
 #ifdef __cplusplus
 }
