@@ -43,11 +43,47 @@ int ChannelAuthRequest::ByteSize() const {
 int ClientEchoReply::ByteSize() const {
   return length_of(this, "_ZNK15ClientEchoReply8ByteSizeEv");
 }
+int CreateChatroomRequest::ByteSize() const {
+  return length_of(this, "_ZNK21CreateChatroomRequest8ByteSizeEv");
+}
 int ChatRequest::ByteSize() const {
   return length_of(this, "_ZNK11ChatRequest8ByteSizeEv");
 }
+int AllowChatRequest::ByteSize() const {
+  return length_of(this, "_ZNK16AllowChatRequest8ByteSizeEv");
+}
+int GetAllUnreadMessageRequest::ByteSize() const {
+  return length_of(this, "_ZNK26GetAllUnreadMessageRequest8ByteSizeEv");
+}
+int ForwardOnlineMessageReply::ByteSize() const {
+  return length_of(this, "_ZNK25ForwardOnlineMessageReply8ByteSizeEv");
+}
+int ForwardUnreadMessageReply::ByteSize() const {
+  return length_of(this, "_ZNK25ForwardUnreadMessageReply8ByteSizeEv");
+}
+int ReadMessageRequest::ByteSize() const {
+  return length_of(this, "_ZNK18ReadMessageRequest8ByteSizeEv");
+}
+int EndChatRequest::ByteSize() const {
+  return length_of(this, "_ZNK14EndChatRequest8ByteSizeEv");
+}
+int InviteRequest::ByteSize() const {
+  return length_of(this, "_ZNK13InviteRequest8ByteSizeEv");
+}
 int CurrentTimeRequest::ByteSize() const {
   return length_of(this, "_ZNK18CurrentTimeRequest8ByteSizeEv");
+}
+int UnsealMessageRequest::ByteSize() const {
+  return length_of(this, "_ZNK20UnsealMessageRequest8ByteSizeEv");
+}
+int SaveCallLogRequest::ByteSize() const {
+  return length_of(this, "_ZNK18SaveCallLogRequest8ByteSizeEv");
+}
+int IsTyping::ByteSize() const {
+  return length_of(this, "_ZNK8IsTyping8ByteSizeEv");
+}
+int ChangeChatroomMetaRequest::ByteSize() const {
+  return length_of(this, "_ZNK25ChangeChatroomMetaRequest8ByteSizeEv");
 }
 
 namespace {
@@ -85,9 +121,10 @@ TEST_P(MessageLength, WhenRefused_IsLogged) {
   for (const int length : {0, -5}) {
     replaced_length = length;
     call();
-    support::expect_log(function_.name,
-                        {support::debug(function_.entry, {function_.name}),
-                         support::error("Invalid serialized data size : %d", {length})});
+    std::vector<support::Line> lines = {support::debug(function_.entry, {function_.name})};
+    lines.insert(lines.end(), function_.detail.begin(), function_.detail.end());
+    lines.push_back(support::error("Invalid serialized data size : %d", {length}));
+    support::expect_log(function_.name, lines);
   }
 }
 
@@ -103,6 +140,27 @@ TEST_P(MessageLength, WhenSucceeding_IsComputedOnce) {
   lengths_computed = 0;
   call();
   ASSERT_EQ(out_.status, 0);
+  EXPECT_EQ(lengths_computed, 1);
+}
+
+// The one serializer without a check: a length that is none goes to calloc, which refuses it.
+TEST(MessageLengthOfIsTyping, WhenNegative_IsAFailedAllocation) {
+  replaced_length = -5;
+  support::clear_log();
+  support::Encoded out;
+  is_typing_request_serialize(1, 2, nullptr, nullptr, nullptr, &out.data.block, &out.size);
+  replaced_length.reset();
+  EXPECT_EQ(out.size, -5);
+  EXPECT_EQ(out.data.block, nullptr);
+  const std::string name = "is_typing_request_serialize";
+  support::expect_log(name, {support::debug("%s: enter", {name}),
+                             support::debug("Memory allocation is failed to serialized_data")});
+}
+
+TEST(MessageLengthOfIsTyping, WhenSucceeding_IsComputedOnce) {
+  lengths_computed = 0;
+  support::Encoded out;
+  is_typing_request_serialize(1, 2, nullptr, nullptr, nullptr, &out.data.block, &out.size);
   EXPECT_EQ(lengths_computed, 1);
 }
 

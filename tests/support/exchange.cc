@@ -2,11 +2,13 @@
 
 #include <algorithm>
 
+#include "support/heap.h"
+
 namespace support {
 
-Received::Received(const std::string& bytes)
-    : data_(static_cast<unsigned char*>(std::malloc(bytes.size()))),
-      size_(static_cast<int>(bytes.size())) {
+Received::Received(const std::string& bytes) : size_(static_cast<int>(bytes.size())) {
+  const HeapPause pause;
+  data_ = static_cast<unsigned char*>(std::malloc(bytes.size()));
   std::copy(bytes.begin(), bytes.end(), data_);
 }
 

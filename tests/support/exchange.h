@@ -9,6 +9,7 @@
 #include <cstdint>
 #include <cstdlib>
 #include <string>
+#include <vector>
 
 #include "support/log_capture.h"
 #include "support/wire.h"
@@ -45,6 +46,32 @@ struct BlockOutput {
 using TextOutput = BlockOutput<char>;
 using IdListOutput = BlockOutput<int64_t>;
 
+// An array and its count.
+template <typename T>
+struct ListOutput {
+  BlockOutput<T> array;
+  int count = kIntSentinel;
+
+  bool untouched() const { return array.untouched() && count == kIntSentinel; }
+  // Those of the array, if one was written.
+  std::vector<T> elements() const {
+    return array.untouched() ? std::vector<T>{} : std::vector<T>(array.block, array.block + count);
+  }
+};
+
+// A bool with a neighbour on either side.
+class FlagOutput {
+ public:
+  bool* pointer() { return reinterpret_cast<bool*>(&bytes_[1]); }
+  bool untouched() const { return bytes_[1] == kSentinel; }
+  bool neighbours_untouched() const { return bytes_[0] == kSentinel && bytes_[2] == kSentinel; }
+  int value() const { return bytes_[1]; }  // 1 or 0, once it is written
+
+ private:
+  static constexpr unsigned char kSentinel = 0xa5;
+  unsigned char bytes_[3] = {kSentinel, kSentinel, kSentinel};
+};
+
 // The outputs of one serializer call.
 struct Encoded {
   int status = kIntSentinel;
@@ -70,7 +97,7 @@ class Received {
   int size() const { return size_; }
 
  private:
-  unsigned char* data_;
+  unsigned char* data_ = nullptr;
   int size_;
 };
 

@@ -16,6 +16,16 @@ class FailingCalloc {
   FailingCalloc& operator=(const FailingCalloc&) = delete;
 };
 
+// While it lives, the n-th malloc of this thread from its construction on fails, n from 1. Does not
+// count what operator new allocates; whether it counts strdup is the C library's choice.
+class FailingMalloc {
+ public:
+  explicit FailingMalloc(int n);
+  ~FailingMalloc();
+  FailingMalloc(const FailingMalloc&) = delete;
+  FailingMalloc& operator=(const FailingMalloc&) = delete;
+};
+
 // While it lives, the n-th operator new of this thread from its construction on throws, n from 1.
 class FailingNew {
  public:
@@ -25,13 +35,16 @@ class FailingNew {
   FailingNew& operator=(const FailingNew&) = delete;
 };
 
-// Watches the calling thread from its construction until stop().
+// Watches the calling thread from its construction until stop(). Meanwhile malloc hands out blocks
+// filled with kFreshByte, so that what is not written shows.
 class HeapWatch {
  public:
   struct Block {
     size_t elements;
     size_t element_size;
   };
+
+  static constexpr unsigned char kFreshByte = 0xc7;
 
   HeapWatch();
   ~HeapWatch() { stop(); }
@@ -42,6 +55,8 @@ class HeapWatch {
 
   // Every calloc, in order.
   const std::vector<Block>& callocs() const { return callocs_; }
+  // Sizes of every malloc, in order, counted as FailingMalloc does.
+  const std::vector<size_t>& mallocs() const { return mallocs_; }
   // How many blocks operator new made.
   size_t news() const { return news_; }
   // Sizes of the blocks that operator new made and operator delete did not release.
@@ -49,6 +64,7 @@ class HeapWatch {
 
  private:
   std::vector<Block> callocs_;
+  std::vector<size_t> mallocs_;
   size_t news_ = 0;
   std::vector<size_t> kept_;
 };

@@ -26,11 +26,14 @@ struct Line {
   int priority;
   std::string text;
   std::vector<LogArgument> arguments;
+  bool next_round = false;  // of a loop, so that the line's number may go back
 };
 
 Line debug(std::string text, std::vector<LogArgument> arguments = {});
+Line info(std::string text, std::vector<LogArgument> arguments = {});
 Line warn(std::string text, std::vector<LogArgument> arguments = {});
 Line error(std::string text, std::vector<LogArgument> arguments = {});
+Line next_round(Line line);
 
 // All calls since the last clear_log(), of all threads, in order.
 std::vector<LogCall> logged_calls();
@@ -38,7 +41,7 @@ void clear_log();
 
 // The log holds exactly these lines: each in the frame of its priority, naming the module, the
 // function, the line of the statement that logs it or of the shared step that does, and the calling
-// thread; the lines' numbers do not go back. Clears the log.
+// thread; the lines' numbers do not go back, but for a loop's next round. Clears the log.
 void expect_log(const std::string& function, const std::vector<Line>& lines);
 
 }  // namespace support
