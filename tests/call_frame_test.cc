@@ -259,7 +259,8 @@ const Deserializer kDeserializers[] = {
      {support::error("has_skipreply:false "), support::error("msgType : %d ", {0})},
      leaves<support::ForwardOnlineMessageOutputs>},
     // userId 9, deviceId 8, requestId 7, inboxEntries { msgId 1, msgType TEXT, sender 2,
-    // receiver 3, sentTime 4, chatMsg "hi", msgTtl 5, chatroomId 6, chatType GROUP }, nextPaginationKey "k"
+    // receiver 3, sentTime 4, chatMsg "hi", msgTtl 5, chatroomId 6, chatType GROUP },
+    // nextPaginationKey "k"
     {"forward_unread_message_deserialize",
      {},
      "%s: start",

@@ -21,13 +21,6 @@ using support::TextOutput;
 using support::to_hex;
 using support::Wire;
 
-// How the compiler writes a global type in the name of a function.
-#ifdef __clang__
-#define QEL_TYPE_SCOPE "::"
-#else
-#define QEL_TYPE_SCOPE ""
-#endif
-
 constexpr int64_t kSmallest = std::numeric_limits<int64_t>::min();
 constexpr int kSmallestInt = std::numeric_limits<int>::min();
 constexpr int kLargestInt = std::numeric_limits<int>::max();
@@ -124,10 +117,7 @@ TEST_F(ChatRequestSerialize, WhenTypeIsInRangeButNoMember_Aborts) {
     if (type != 10) {
       SCOPED_TRACE(type);
       EXPECT_EXIT(call_with_type(type), support::aborts,
-                  ": proto-lib/msgspec_frontend\\.pb\\.h:[0-9]+: "
-                  "void ChatMessageParam::set_msgtype\\(" QEL_TYPE_SCOPE
-                  "MsgType\\): "
-                  "Assertion `::MsgType_IsValid\\(value\\)' failed\\.");
+                  support::refused_by_setter("ChatMessageParam", "msgtype", "MsgType"));
     }
   }
 }
