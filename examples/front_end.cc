@@ -1,6 +1,4 @@
-// The service's front end of the example: a process of its own, which takes one connection, checks
-// every message that it gets, answers with the schema's generated classes, and prints both
-// directions of the conversation.
+// The service's front end of the example: a process of its own, which takes one connection.
 //
 //   front_end [--port PORT] [--port-file FILE] [--timeout SECONDS]
 //
@@ -10,215 +8,24 @@
 // 2 if it was called wrongly.
 
 #include <arpa/inet.h>
-#include <google/protobuf/descriptor.h>
-#include <google/protobuf/message.h>
-#include <google/protobuf/text_format.h>
+#include <google/protobuf/stubs/common.h>
 #include <netinet/in.h>
 #include <poll.h>
 #include <sys/socket.h>
-#include <sys/time.h>
 #include <unistd.h>
 
 #include <cerrno>
 #include <cstdio>
 #include <cstdlib>
 #include <cstring>
-#include <memory>
-#include <stdexcept>
 #include <string>
 
 #include "framing.h"
-#include "msgspec_frontend.pb.h"
+#include "service.h"
 
 namespace {
 
-using google::protobuf::DescriptorPool;
-using google::protobuf::Message;
-using google::protobuf::MessageFactory;
-
 constexpr int kSessionSeconds = 60;  // at most, whatever the plug-in does
-constexpr char kAccessToken[] = "example-access-token";
-constexpr int64_t kEchoId = 700001;
-
-enum ResultCode { kOk = 0, kBadToken = 2001 };
-
-// Anything that a front end of this service must not be sent.
-struct WrongExchange : std::runtime_error {
-  using std::runtime_error::runtime_error;
-};
-
-void require(bool holds, const std::string& what) {
-  if (!holds) {
-    throw WrongExchange(what);
-  }
-}
-
-int64_t now_millis() {
-  timeval now;
-  gettimeofday(&now, nullptr);
-  return int64_t{now.tv_sec} * 1000 + now.tv_usec / 1000;
-}
-
-// The message's fields, one a line; the access token is a credential and is not shown.
-std::string text_form(const Message& message) {
-  std::unique_ptr<Message> shown(message.New());
-  shown->CopyFrom(message);
-  if (auto* auth = dynamic_cast<ChannelAuthRequest*>(shown.get())) {
-    if (auth->has_accesstoken()) {
-      auth->set_accesstoken("(not shown)");
-    }
-  }
-  google::protobuf::TextFormat::Printer printer;
-  printer.SetUseUtf8StringEscaping(true);
-  printer.SetInitialIndentLevel(2);
-  std::string text;
-  printer.PrintToString(*shown, &text);
-  return text;
-}
-
-void print_message(const char* direction, const Message& message, int size) {
-  std::printf("%s  %s, %d bytes\n%s", direction, message.GetTypeName().c_str(), size,
-              text_form(message).c_str());
-}
-
-// One connection and what was said on it.
-class Session {
- public:
-  explicit Session(int connection) : connection_(connection) {}
-
-  // Until the plug-in closes the connection.
-  void run() {
-    while (const std::unique_ptr<Message> request = receive()) {
-      answer(*request);
-    }
-    require(authenticated_, "the plug-in never authenticated");
-    require(told_time_ > 0, "the plug-in never asked for the time");
-    require(chat_messages_ > 0, "the plug-in sent no chat message");
-    std::printf("front end: session complete, %d chat messages\n", chat_messages_);
-  }
-
- private:
-  // The next message, or nullptr at the end of the conversation.
-  std::unique_ptr<Message> receive() {
-    frame_t frame;
-    const int status = frame_receive(connection_, &frame);
-    const std::unique_ptr<unsigned char, decltype(&std::free)> bytes(frame.message, &std::free);
-    require(status >= 0, "the connection broke or fell silent");
-    if (status == 0) {
-      return nullptr;
-    }
-    const auto* type = DescriptorPool::generated_pool()->FindMessageTypeByName(frame.name);
-    require(type != nullptr, std::string("no such message: ") + frame.name);
-    std::unique_ptr<Message> message(
-        MessageFactory::generated_factory()->GetPrototype(type)->New());
-    require(message->ParseFromArray(bytes.get(), frame.size),
-            std::string("not a valid message: ") + frame.name);
-    require(message->GetReflection()->GetUnknownFields(*message).empty(),
-            std::string("unknown fields in: ") + frame.name);
-    print_message("plug-in -> front end", *message, frame.size);
-    return message;
-  }
-
-  void send(const Message& message) {
-    const std::string bytes = message.SerializeAsString();
-    print_message("front end -> plug-in", message, static_cast<int>(bytes.size()));
-    require(frame_send(connection_, message.GetTypeName().c_str(),
-                       reinterpret_cast<const unsigned char*>(bytes.data()),
-                       static_cast<int>(bytes.size())) == 0,
-            "a message could not be sent");
-  }
-
-  void answer(const Message& request) {
-    if (const auto* auth = dynamic_cast<const ChannelAuthRequest*>(&request)) {
-      authenticate(*auth);
-      return;
-    }
-    require(authenticated_, "a message before the authentication: " + request.GetTypeName());
-    if (const auto* time = dynamic_cast<const CurrentTimeRequest*>(&request)) {
-      tell_time(*time);
-    } else if (const auto* chat = dynamic_cast<const ChatRequest*>(&request)) {
-      record(*chat);
-    } else {
-      throw WrongExchange("this front end does not take a " + request.GetTypeName());
-    }
-  }
-
-  void authenticate(const ChannelAuthRequest& request) {
-    require(!authenticated_, "a second authentication");
-    take_request_id(request.has_requestid(), request.requestid());
-    require(request.has_userid() && request.has_deviceid() && request.has_appid(),
-            "an authentication without user, device or application");
-    require(!request.has_imei() && request.proxyoptions_size() == 0,
-            "an authentication with IMEI or proxy options");
-    authenticated_ = request.accesstoken() == kAccessToken;
-
-    ChannelAuthReply reply;
-    reply.set_requestid(request.requestid());
-    reply.mutable_result()->set_code(authenticated_ ? kOk : kBadToken);
-    reply.mutable_result()->set_msg(authenticated_ ? "welcome" : "access token refused");
-    send(reply);
-    require(authenticated_, "wrong access token");
-  }
-
-  // Before it tells the time, the service probes whether the client is alive.
-  void tell_time(const CurrentTimeRequest& request) {
-    take_request_id(request.has_requestid(), request.requestid());
-    require(!request.has_userid() && !request.has_deviceid(), "ids in a request for the time");
-    probe();
-
-    CurrentTimeReply reply;
-    reply.set_requestid(request.requestid());
-    reply.mutable_result()->set_code(kOk);
-    reply.mutable_result()->set_msg("ok");
-    reply.set_currenttimemillis(now_millis());
-    send(reply);
-    ++told_time_;
-  }
-
-  void probe() {
-    ClientEcho echo;
-    echo.set_requestid(kEchoId);
-    send(echo);
-    const std::unique_ptr<Message> message = receive();
-    const auto* reply = dynamic_cast<const ClientEchoReply*>(message.get());
-    require(reply != nullptr, "no answer to the echo probe");
-    require(reply->requestid() == kEchoId, "an answer to another echo probe");
-  }
-
-  void record(const ChatRequest& request) {
-    take_request_id(request.has_requestid(), request.requestid());
-    require(request.has_chatroomid(), "a chat request without a chatroom");
-    require(!request.has_userid() && !request.has_deviceid(), "ids in a chat request");
-    require(request.chatmessageparams_size() == 1, "a chat request that is not of one message");
-    const ChatMessageParam& param = request.chatmessageparams(0);
-    require(param.has_msgid() && param.has_msgtype() && param.has_chatmsg() && param.has_msgttl(),
-            "a chat message that lacks a field");
-    require(!param.has_securechatmsg(), "a sealed chat message");
-
-    ChatReply reply;
-    reply.set_requestid(request.requestid());
-    reply.set_chatroomid(request.chatroomid());
-    reply.mutable_result()->set_code(kOk);
-    reply.mutable_result()->set_msg("ok");
-    ProcessedMessageEntry* entry = reply.add_processedmessageentries();
-    entry->set_msgid(param.msgid());
-    entry->set_senttime(now_millis());
-    send(reply);
-    ++chat_messages_;
-  }
-
-  void take_request_id(bool present, int64_t id) {
-    require(present, "a request without a request id");
-    require(id > last_request_id_, "a request id that is not above the one before");
-    last_request_id_ = id;
-  }
-
-  int connection_;
-  bool authenticated_ = false;
-  int told_time_ = 0;
-  int chat_messages_ = 0;
-  int64_t last_request_id_ = 0;
-};
 
 // A number of least to most; ends the program if the text is none.
 int parse_number(const char* what, const char* text, long least, long most) {
@@ -313,7 +120,7 @@ int main(int argc, char** argv) {
     }
     const int connection = accept_one(listener, timeout_seconds);
     close(listener);
-    Session(connection).run();
+    Service(connection).run();
     close(connection);
   } catch (const WrongExchange& problem) {
     std::fprintf(stderr, "front_end: %s\n", problem.what());

@@ -1,6 +1,8 @@
 /*
- * A message plug-in's session with the service, in plain C: it authenticates its channel, reads the
- * service's clock, answers the service's echo probes whenever they come, and sends chat messages.
+ * A message plug-in's day with the service, in plain C: it authenticates its channel, reads the
+ * service's clock, creates a chatroom, enters it, sends and receives messages, fetches those that
+ * were stored meanwhile, reports what the user read, typed and spoke, changes and leaves chatrooms,
+ * and takes the service's pushes whenever they come.
  *
  *   plugin_session PORT [--access-token TEXT] [--timeout SECONDS]
  *
@@ -18,8 +20,7 @@
 #include <time.h>
 #include <unistd.h>
 
-#include "framing.h"
-#include "qel-message-serialize.h"
+#include "session.h"
 
 /* The whole session takes no longer, whatever the front end does. */
 enum { SESSION_SECONDS = 60 };
@@ -27,109 +28,33 @@ enum { SESSION_SECONDS = 60 };
 /* One byte more than the library sends. */
 enum { TOO_LONG = 40001 };
 
-/* What an output is set to before a call, to see whether the call wrote it: no id or code of the
-   service's. */
-enum { NOT_WRITTEN = -4711 };
+/* Values of the schema's enumerations. */
+enum { CHAT_TYPE_GROUP = 1, MSG_TYPE_TEXT = 0, CONTENT_TYPE_TEXT = 0 };
 
-/* The service's code for success. */
-enum { RESULT_OK = 0 };
+/* ---- The connection */
 
-static int64_t last_request_id = 0;
-
-static int failed(const char* what) {
-  fprintf(stderr, "plug-in: %s\n", what);
-  return -1;
-}
-
-/* Sends what a serializer handed out, and releases it. status is what the serializer returned. */
-static int send_message(int connection, const char* name, int status, unsigned char* message,
-                        int size) {
-  int sent;
-  if (status != 0) {
-    return failed("a message could not be built");
-  }
-  sent = frame_send(connection, name, message, size);
-  free(message);
-  return sent == 0 ? 0 : failed("a message could not be sent");
-}
-
-/* The service probes whether the client is alive; the answer carries the probe's requestId. */
-static int answer_echo(int connection, const frame_t* echo) {
-  int64_t request_id = NOT_WRITTEN;
-  unsigned char* message = NULL;
-  int size = 0;
-  int status;
-
-  client_echo_deserialize(echo->message, echo->size, &request_id);
-  if (request_id == NOT_WRITTEN) {
-    return failed("the echo probe could not be parsed");
-  }
-  printf("plug-in: echo probe %lld\n", (long long)request_id);
-  status = client_echo_reply_serialize(request_id, &message, &size);
-  return send_message(connection, "ClientEchoReply", status, message, size);
-}
-
-/* Waits for a reply, and answers the pushes that come before it. On success the caller releases
-   reply->message. */
-static int await_reply(int connection, const char* name, frame_t* reply) {
-  for (;;) {
-    int status;
-    if (frame_receive(connection, reply) != 1) {
-      return failed("the connection ended or fell silent where a reply was due");
-    }
-    if (strcmp(reply->name, name) == 0) {
-      return 0;
-    }
-    if (strcmp(reply->name, "ClientEcho") != 0) {
-      free(reply->message);
-      return failed("a message came that was not expected");
-    }
-    status = answer_echo(connection, reply);
-    free(reply->message);
-    if (status != 0) {
-      return -1;
-    }
-  }
-}
-
-/* Prints a reply's outcome, and releases its text. The outputs tell how the parse went: an id that
-   is not written means that it failed, and a text that is not that the reply has no whole result.
- */
-static int check_result(const char* what, int64_t request_id, int code, char* text) {
-  if (request_id == NOT_WRITTEN) {
-    return failed("the reply could not be parsed");
-  }
-  if (text == NULL) {
-    return failed("the reply does not say how it went");
-  }
-  printf("plug-in: %s: result %d, \"%s\"\n", what, code, text);
-  free(text);
-  if (request_id != last_request_id) {
-    return failed("the reply belongs to another request");
-  }
-  return code == RESULT_OK ? 0 : failed("the service refused the request");
-}
-
-static int authenticate(int connection, const char* access_token) {
+static int authenticate(session_t* session, const char* access_token) {
   unsigned char* message = NULL;
   int size = 0;
   frame_t reply;
   int64_t request_id = NOT_WRITTEN;
   int code = NOT_WRITTEN;
   char* text = NULL;
-  int status = channel_auth_request_serialize(++last_request_id, 5001, 77, "org.example.chat",
-                                              access_token, &message, &size);
+  int status = channel_auth_request_serialize(++session->last_request_id, 5001, 77,
+                                              "org.example.chat", access_token, &message, &size);
 
-  if (send_message(connection, "ChannelAuthRequest", status, message, size) != 0 ||
-      await_reply(connection, "ChannelAuthReply", &reply) != 0) {
+  if (send_message(session, "ChannelAuthRequest", status, message, size) != 0 ||
+      await_message(session, "ChannelAuthReply", &reply) != 0) {
     return -1;
   }
   channel_auth_reply_deserialize(reply.message, reply.size, &request_id, &code, &text);
   free(reply.message);
-  return check_result("channel authentication", request_id, code, text);
+  status = check_result(session, "channel authentication", request_id, code, text, RESULT_OK);
+  free(text);
+  return status;
 }
 
-static int read_clock(int connection) {
+static int read_clock(session_t* session) {
   unsigned char* message = NULL;
   int size = 0;
   frame_t reply;
@@ -138,15 +63,17 @@ static int read_clock(int connection) {
   int code = NOT_WRITTEN;
   char* text = NULL;
   char printed[32] = "unknown";
-  int status = current_time_request_serialize(++last_request_id, &message, &size);
+  int status = current_time_request_serialize(++session->last_request_id, &message, &size);
 
-  if (send_message(connection, "CurrentTimeRequest", status, message, size) != 0 ||
-      await_reply(connection, "CurrentTimeReply", &reply) != 0) {
+  if (send_message(session, "CurrentTimeRequest", status, message, size) != 0 ||
+      await_message(session, "CurrentTimeReply", &reply) != 0) {
     return -1;
   }
   current_time_deserialize(reply.message, reply.size, &request_id, &now_millis, &code, &text);
   free(reply.message);
-  if (check_result("current time", request_id, code, text) != 0) {
+  status = check_result(session, "current time", request_id, code, text, RESULT_OK);
+  free(text);
+  if (status != 0) {
     return -1;
   }
   if (now_millis >= 0) {
@@ -158,9 +85,225 @@ static int read_clock(int connection) {
   return 0;
 }
 
-static int send_chat_message(int connection, int64_t chatroom, int64_t message_id,
+/* ---- Chatrooms */
+
+static void print_users(const char* what, const int64_t* users, int count) {
+  int i;
+  for (i = 0; i < count; ++i) {
+    printf("plug-in:   %s: user %lld\n", what, (long long)users[i]);
+  }
+}
+
+static void print_violations(const qel_message_didviolationuser_t* pairs, int count) {
+  int i;
+  for (i = 0; i < count; ++i) {
+    printf("plug-in:   DID violation: users %lld and %lld\n", (long long)pairs[i].userA,
+           (long long)pairs[i].userB);
+  }
+}
+
+/* Some of the receivers may be refused: the reply lists them, one list for each reason. */
+static int create_chatroom(session_t* session, const char* title, int64_t* chatroom) {
+  static const int64_t receivers[] = {6001, 6002, 6003, 6004, 6005, 999};
+  unsigned char* message = NULL;
+  int size = 0;
+  frame_t reply;
+  int64_t request_id = NOT_WRITTEN;
+  int lifetime = NOT_WRITTEN;
+  int code = NOT_WRITTEN;
+  char* text = NULL;
+  int64_t *invalid = NULL, *disabled = NULL, *denied = NULL;
+  int invalid_count = 0, disabled_count = 0, violation_count = 0, denied_count = 0;
+  qel_message_didviolationuser_t* violations = NULL;
+  int status = create_chatroom_request_serialize(
+      ++session->last_request_id, CHAT_TYPE_GROUP, receivers,
+      (int)(sizeof receivers / sizeof receivers[0]), title, &message, &size);
+
+  if (send_message(session, "CreateChatroomRequest", status, message, size) != 0 ||
+      await_message(session, "CreateChatroomReply", &reply) != 0) {
+    return -1;
+  }
+  create_chatroom_reply_deserialize(reply.message, reply.size, &request_id, chatroom, &lifetime,
+                                    &code, &text, &invalid, &invalid_count, &disabled,
+                                    &disabled_count, &violations, &violation_count, &denied,
+                                    &denied_count);
+  free(reply.message);
+  status = check_result(session, "chatroom", request_id, code, text, RESULT_SOME_REFUSED);
+  print_users("no such user", invalid, invalid_count);
+  print_users("disabled", disabled, disabled_count);
+  print_violations(violations, violation_count);
+  print_users("invitations denied", denied, denied_count);
+  free(text);
+  free(invalid);
+  free(disabled);
+  free(violations);
+  free(denied);
+  if (status == 0) {
+    printf("plug-in: chatroom %lld created, its messages live %d\n", (long long)*chatroom,
+           lifetime);
+  }
+  return status;
+}
+
+/* Prints and releases one list of marks. */
+static void take_marks(const char* what, qel_message_watermarkentry_t** marks, int count) {
+  int i;
+  for (i = 0; i < count; ++i) {
+    printf("plug-in:   user %lld has %s message %lld\n", (long long)marks[i]->userId, what,
+           (long long)marks[i]->msgId);
+    free(marks[i]);
+  }
+  free(marks);
+}
+
+static int enter_chatroom(session_t* session, int64_t chatroom) {
+  const bool auto_allow = true;
+  const int entries = 100;
+  unsigned char* message = NULL;
+  int size = 0;
+  frame_t reply;
+  int64_t request_id = NOT_WRITTEN;
+  int64_t replied_chatroom = NOT_WRITTEN;
+  int code = NOT_WRITTEN;
+  char* text = NULL;
+  qel_message_watermarkentry_t **deliveries = NULL, **reads = NULL;
+  qel_message_chatroommember_t** members = NULL;
+  int delivery_count = 0, read_count = 0, member_count = 0;
+  int64_t last_delivery = 0, last_read = 0;
+  char* title = NULL;
+  int lifetime = NOT_WRITTEN;
+  int i;
+  int status = allow_chat_request_serialize(++session->last_request_id, chatroom, &auto_allow,
+                                            entries, true, 0, true, 0, true, true, &message, &size);
+
+  if (send_message(session, "AllowChatRequest", status, message, size) != 0 ||
+      await_message(session, "AllowChatReply", &reply) != 0) {
+    return -1;
+  }
+  allow_chat_reply_deserialize(reply.message, reply.size, &request_id, &replied_chatroom, &code,
+                               &text, &deliveries, &delivery_count, &last_delivery, &reads,
+                               &read_count, &last_read, &members, &member_count, &title, &lifetime);
+  free(reply.message);
+  status = check_result(session, "entry", request_id, code, text, RESULT_OK);
+  if (status == 0) {
+    printf("plug-in: chatroom %lld is \"%s\", its messages live %d\n", (long long)replied_chatroom,
+           title != NULL ? title : "", lifetime);
+  }
+  for (i = 0; i < member_count; ++i) {
+    printf("plug-in:   member %lld, %s, %s\n", (long long)members[i]->userId, members[i]->name,
+           members[i]->available != 0 ? "available" : "not available");
+    free(members[i]->name);
+    free(members[i]);
+  }
+  free(members);
+  take_marks("received", deliveries, delivery_count);
+  take_marks("read", reads, read_count);
+  free(text);
+  free(title);
+  return status;
+}
+
+/* Changes the title, or else the lifetime: the one that is not NULL. */
+static int change_chatroom(session_t* session, int64_t chatroom, const char* title,
+                           const int* lifetime) {
+  unsigned char* message = NULL;
+  int size = 0;
+  frame_t reply;
+  int64_t request_id = NOT_WRITTEN;
+  int64_t replied_chatroom = NOT_WRITTEN;
+  int code = NOT_WRITTEN;
+  char* text = NULL;
+  int status = change_chatroom_meta_request_serialize(++session->last_request_id, chatroom, title,
+                                                      lifetime, &message, &size);
+
+  if (send_message(session, "ChangeChatroomMetaRequest", status, message, size) != 0 ||
+      await_message(session, "ChangeChatroomMetaReply", &reply) != 0) {
+    return -1;
+  }
+  change_chatroom_meta_reply_deserialize(reply.message, reply.size, &request_id, &replied_chatroom,
+                                         &code, &text);
+  free(reply.message);
+  status = check_result(session, title != NULL ? "title" : "lifetime", request_id, code, text,
+                        RESULT_OK);
+  free(text);
+  return status;
+}
+
+/* As with a new chatroom, some may be refused, for two more reasons. */
+static int invite(session_t* session, int64_t chatroom) {
+  static const int64_t members[] = {6001, 6003, 6004, 6005, 6006, 6007, 999};
+  const int member_count = (int)(sizeof members / sizeof members[0]);
+  unsigned char* message = NULL;
+  int size = 0;
+  frame_t reply;
+  int64_t request_id = NOT_WRITTEN;
+  int64_t replied_chatroom = NOT_WRITTEN;
+  int64_t sent_time = NOT_WRITTEN;
+  int code = NOT_WRITTEN;
+  char* text = NULL;
+  int64_t *invalid = NULL, *interrupted = NULL, *disabled = NULL, *existing = NULL, *denied = NULL;
+  int invalid_count = 0, interrupted_count = 0, disabled_count = 0, existing_count = 0;
+  int violation_count = 0, denied_count = 0;
+  qel_message_didviolationuser_t* violations = NULL;
+  int status = invite_chat_request_serialize(++session->last_request_id, chatroom, members,
+                                             &member_count, &message, &size);
+
+  if (send_message(session, "InviteRequest", status, message, size) != 0 ||
+      await_message(session, "InviteReply", &reply) != 0) {
+    return -1;
+  }
+  invite_reply_deserialize(reply.message, reply.size, &request_id, &replied_chatroom, &sent_time,
+                           &code, &text, &invalid, &invalid_count, &interrupted, &interrupted_count,
+                           &disabled, &disabled_count, &existing, &existing_count, &violations,
+                           &violation_count, &denied, &denied_count);
+  free(reply.message);
+  status = check_result(session, "invitation", request_id, code, text, RESULT_SOME_NOT_INVITED);
+  print_users("no such user", invalid, invalid_count);
+  print_users("interrupted", interrupted, interrupted_count);
+  print_users("disabled", disabled, disabled_count);
+  print_users("already a member", existing, existing_count);
+  print_violations(violations, violation_count);
+  print_users("invitations denied", denied, denied_count);
+  free(text);
+  free(invalid);
+  free(interrupted);
+  free(disabled);
+  free(existing);
+  free(violations);
+  free(denied);
+  return status;
+}
+
+static int end_chats(session_t* session, int64_t chatroom) {
+  qel_message_endchatentry_t entries[2];
+  unsigned char* message = NULL;
+  int size = 0;
+  frame_t reply;
+  int64_t request_id = NOT_WRITTEN;
+  int code = NOT_WRITTEN;
+  char* text = NULL;
+  int status;
+
+  entries[0].chatroomId = chatroom;
+  entries[0].denyInvitation = false;
+  entries[1].chatroomId = 41; /* from another day */
+  entries[1].denyInvitation = true;
+  status = end_chat_request_serialize(++session->last_request_id, entries, 2, &message, &size);
+  if (send_message(session, "EndChatRequest", status, message, size) != 0 ||
+      await_message(session, "EndChatReply", &reply) != 0) {
+    return -1;
+  }
+  end_chat_reply_deserialize(reply.message, reply.size, &request_id, &code, &text);
+  free(reply.message);
+  status = check_result(session, "end of chats", request_id, code, text, RESULT_OK);
+  free(text);
+  return status;
+}
+
+/* ---- Messages */
+
+static int send_chat_message(session_t* session, int64_t chatroom, int64_t message_id,
                              const char* text_to_send) {
-  const int type_text = 0;
   const int lifetime = 0;
   unsigned char* message = NULL;
   int size = 0;
@@ -174,21 +317,22 @@ static int send_chat_message(int connection, int64_t chatroom, int64_t message_i
   int64_t* times = NULL;
   int confirmed = 0;
   int i;
-  int status = chat_request_serialize(++last_request_id, chatroom, message_id, type_text,
-                                      text_to_send, lifetime, 0, &message, &size);
+  int status = chat_request_serialize(++session->last_request_id, chatroom, message_id,
+                                      MSG_TYPE_TEXT, text_to_send, lifetime, 0, &message, &size);
 
-  if (send_message(connection, "ChatRequest", status, message, size) != 0 ||
-      await_reply(connection, "ChatReply", &reply) != 0) {
+  if (send_message(session, "ChatRequest", status, message, size) != 0 ||
+      await_message(session, "ChatReply", &reply) != 0) {
     return -1;
   }
   chat_reply_deserialize(reply.message, reply.size, &request_id, &replied_chatroom, &code, &text,
                          &count, &ids, &times);
   free(reply.message);
-  status = check_result("chat message", request_id, code, text);
+  status = check_result(session, "chat message", request_id, code, text, RESULT_OK);
   for (i = 0; i < count; ++i) {
     printf("plug-in: message %lld recorded at %lld\n", (long long)ids[i], (long long)times[i]);
     confirmed = confirmed || ids[i] == message_id;
   }
+  free(text);
   free(ids);
   free(times);
   if (status != 0) {
@@ -200,7 +344,7 @@ static int send_chat_message(int connection, int64_t chatroom, int64_t message_i
 }
 
 /* The library refuses a text of more than 40000 bytes; nothing is sent then. */
-static int try_too_long_message(void) {
+static int try_too_long_message(const session_t* session, int64_t chatroom) {
   unsigned char* message = NULL;
   int size = 0;
   int status;
@@ -210,7 +354,8 @@ static int try_too_long_message(void) {
   }
   memset(text, 'x', TOO_LONG);
   text[TOO_LONG] = '\0';
-  status = chat_request_serialize(last_request_id + 1, 42, 9003, 0, text, 0, 0, &message, &size);
+  status = chat_request_serialize(session->last_request_id + 1, chatroom, 9003, MSG_TYPE_TEXT, text,
+                                  0, 0, &message, &size);
   free(text);
   if (status == 0) {
     free(message);
@@ -220,19 +365,204 @@ static int try_too_long_message(void) {
   return 0;
 }
 
-static int run_session(int connection, const char* access_token) {
-  if (authenticate(connection, access_token) != 0 || read_clock(connection) != 0 ||
-      send_chat_message(connection, 42, 9001, "Hello from the plug-in") != 0 ||
-      send_chat_message(connection, 42, 9002,
+/* Reports the last message that was pushed as read. */
+static int report_read(session_t* session) {
+  unsigned char* message = NULL;
+  int size = 0;
+  frame_t reply;
+  int64_t request_id = NOT_WRITTEN;
+  int64_t replied_chatroom = NOT_WRITTEN;
+  int code = NOT_WRITTEN;
+  char* text = NULL;
+  int status =
+      read_message_request_serialize(++session->last_request_id, session->last_message.chatroomId,
+                                     &session->last_message, &message, &size);
+
+  if (send_message(session, "ReadMessageRequest", status, message, size) != 0 ||
+      await_message(session, "ReadMessageReply", &reply) != 0) {
+    return -1;
+  }
+  read_message_reply_deserialize(reply.message, reply.size, &request_id, &replied_chatroom, &code,
+                                 &text);
+  free(reply.message);
+  status = check_result(session, "read receipt", request_id, code, text, RESULT_OK);
+  free(text);
+  return status;
+}
+
+/* Takes one page of stored messages and acknowledges it; with a key that asks for the next page. */
+static int take_page(session_t* session, int page_size, bool* has_next) {
+  frame_t page;
+  int64_t request_id = NOT_WRITTEN;
+  qel_message_inboxentry_t** entries = NULL;
+  int count = 0;
+  char* next_key = NULL;
+  const char* sent_key;
+  unsigned char* message = NULL;
+  int size = 0;
+  int i;
+  int status;
+
+  if (await_message(session, "ForwardUnreadMessage", &page) != 0) {
+    return -1;
+  }
+  forward_unread_message_deserialize(page.message, page.size, &request_id, &entries, &count,
+                                     &next_key);
+  free(page.message);
+  if (request_id == NOT_WRITTEN) {
+    return failed("the page could not be parsed");
+  }
+  if (entries == NULL) {
+    count = 0; /* nothing stored, or no memory */
+  }
+  for (i = 0; i < count; ++i) {
+    printf("plug-in: stored message %lld from user %lld in chatroom %lld: \"%s\"\n",
+           (long long)entries[i]->msgId, (long long)entries[i]->sender,
+           (long long)entries[i]->chatroomId, entries[i]->chatMsg);
+    free(entries[i]->chatMsg);
+    free(entries[i]);
+  }
+  free(entries);
+  *has_next = next_key != NULL;
+  sent_key = next_key;
+  status =
+      forward_unread_message_reply_serialize(request_id, &sent_key, &page_size, &message, &size);
+  free(next_key);
+  return send_message(session, "ForwardUnreadMessageReply", status, message, size);
+}
+
+/* Asks for the stored messages; they come as pushes, page by page. */
+static int fetch_unread(session_t* session) {
+  const int page_size = 2;
+  unsigned char* message = NULL;
+  int size = 0;
+  frame_t reply;
+  int64_t request_id = NOT_WRITTEN;
+  int code = NOT_WRITTEN;
+  char* text = NULL;
+  bool has_next = true;
+  int status = get_all_unread_message_request_serialize(++session->last_request_id, &page_size,
+                                                        &message, &size);
+
+  if (send_message(session, "GetAllUnreadMessageRequest", status, message, size) != 0 ||
+      await_message(session, "GetAllUnreadMessageReply", &reply) != 0) {
+    return -1;
+  }
+  get_all_unread_message_reply_deserialize(reply.message, reply.size, &request_id, &code, &text);
+  free(reply.message);
+  status = check_result(session, "unread messages", request_id, code, text, RESULT_OK);
+  free(text);
+  while (status == 0 && has_next) {
+    status = take_page(session, page_size, &has_next);
+  }
+  return status;
+}
+
+static int unseal(session_t* session, int64_t chatroom, int64_t sender, int64_t message_id) {
+  unsigned char* message = NULL;
+  int size = 0;
+  frame_t reply;
+  int64_t request_id = NOT_WRITTEN;
+  int64_t replied_chatroom = NOT_WRITTEN;
+  int code = NOT_WRITTEN;
+  char* text = NULL;
+  int status = unseal_message_request_serialize(++session->last_request_id, chatroom, sender,
+                                                message_id, "opened by hand", &message, &size);
+
+  if (send_message(session, "UnsealMessageRequest", status, message, size) != 0 ||
+      await_message(session, "UnsealMessageReply", &reply) != 0) {
+    return -1;
+  }
+  unseal_message_reply_deserialize(reply.message, reply.size, &request_id, &replied_chatroom, &code,
+                                   &text);
+  free(reply.message);
+  status = check_result(session, "unsealing", request_id, code, text, RESULT_OK);
+  free(text);
+  return status;
+}
+
+/* ---- Typing and calls */
+
+/* Tells that the user types, and waits until somebody else does. */
+static int type_together(session_t* session, int64_t chatroom) {
+  const int content_type = CONTENT_TYPE_TEXT;
+  const int refresh = 10;
+  unsigned char* message = NULL;
+  int size = 0;
+  frame_t push;
+  int64_t request_id = NOT_WRITTEN;
+  int64_t typing_chatroom = 0;
+  int64_t sender = 0;
+  char* state = NULL;
+  int typed_content = NOT_WRITTEN;
+  int typed_refresh = NOT_WRITTEN;
+
+  /* The one serializer without a status: the buffer tells. */
+  is_typing_request_serialize(++session->last_request_id, chatroom, "typing", &content_type,
+                              &refresh, &message, &size);
+  if (send_message(session, "IsTyping", message != NULL ? 0 : -1, message, size) != 0 ||
+      await_message(session, "TypingUpdated", &push) != 0) {
+    return -1;
+  }
+  typing_updated_deserialize(push.message, push.size, &request_id, &typing_chatroom, &sender,
+                             &state, &typed_content, &typed_refresh);
+  free(push.message);
+  if (request_id == NOT_WRITTEN) {
+    return failed("the typing status could not be parsed");
+  }
+  printf("plug-in: user %lld in chatroom %lld: %s\n", (long long)sender, (long long)typing_chatroom,
+         state != NULL ? state : "unknown");
+  free(state);
+  return 0;
+}
+
+static int log_call(session_t* session, int64_t chatroom) {
+  const int seconds = 75;
+  unsigned char* message = NULL;
+  int size = 0;
+  frame_t reply;
+  int64_t request_id = NOT_WRITTEN;
+  int code = NOT_WRITTEN;
+  char* text = NULL;
+  int status = save_call_log_request_serialize(++session->last_request_id, chatroom, "call-1",
+                                               "voice", 5001, 6001, seconds, &message, &size);
+
+  if (send_message(session, "SaveCallLogRequest", status, message, size) != 0 ||
+      await_message(session, "SaveCallLogReply", &reply) != 0) {
+    return -1;
+  }
+  save_call_log_reply_deserialize(reply.message, reply.size, &request_id, &code, &text);
+  free(reply.message);
+  status = check_result(session, "call log", request_id, code, text, RESULT_OK);
+  free(text);
+  return status;
+}
+
+/* ---- The day */
+
+static int run_session(session_t* session, const char* access_token) {
+  const int lifetime = 7200;
+  int64_t chatroom = 0;
+
+  if (authenticate(session, access_token) != 0 || read_clock(session) != 0 ||
+      create_chatroom(session, "Lunch", &chatroom) != 0 || enter_chatroom(session, chatroom) != 0 ||
+      send_chat_message(session, chatroom, 9001, "Hello from the plug-in") != 0 ||
+      send_chat_message(session, chatroom, 9002,
                         "Gr\xc3\xbc\xc3\x9f"
                         "e \xe2\x98\x95") != 0 ||
-      try_too_long_message() != 0) {
+      try_too_long_message(session, chatroom) != 0 || report_read(session) != 0 ||
+      fetch_unread(session) != 0 || unseal(session, chatroom, 6002, 8003) != 0 ||
+      type_together(session, chatroom) != 0 || log_call(session, chatroom) != 0 ||
+      change_chatroom(session, chatroom, "Lunch on Friday", NULL) != 0 ||
+      change_chatroom(session, chatroom, NULL, &lifetime) != 0 || invite(session, chatroom) != 0 ||
+      end_chats(session, chatroom) != 0) {
     return -1;
   }
   printf("plug-in: session complete\n");
   return 0;
 }
 
+/* Returns the socket, or -1 after a line on standard error. */
 static int connect_to(int port, int timeout_seconds) {
   struct sockaddr_in address;
   int connection = socket(AF_INET, SOCK_STREAM, 0);
@@ -270,8 +600,8 @@ static int parse_number(const char* text, long most) {
 int main(int argc, char** argv) {
   const char* access_token = "example-access-token";
   int timeout_seconds = 10;
+  session_t session;
   int port;
-  int connection;
   int status;
   int i;
 
@@ -291,11 +621,13 @@ int main(int argc, char** argv) {
   setvbuf(stdout, NULL, _IOLBF, 0); /* in step with the log and the front end */
   alarm(SESSION_SECONDS);
 
-  connection = connect_to(port, timeout_seconds);
-  if (connection < 0) {
+  memset(&session, 0, sizeof session);
+  session.socket = connect_to(port, timeout_seconds);
+  if (session.socket < 0) {
     return 1;
   }
-  status = run_session(connection, access_token);
-  close(connection);
+  status = run_session(&session, access_token);
+  free(session.last_message.chatMsg);
+  close(session.socket);
   return status == 0 ? 0 : 1;
 }

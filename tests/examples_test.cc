@@ -128,6 +128,40 @@ class PluginSession : public ::testing::Test {
                  Wire().number(1, 1).message(2, result(0)).bytes());
     ASSERT_EQ(receive_message(connection_), "CurrentTimeRequest");
   }
+  // A reply about chatroom 42 that says that all is well.
+  static std::string reply(int64_t request) {
+    return Wire().number(11, request).number(12, 42).message(13, result(0)).bytes();
+  }
+  // The session up to the answer to its request for a chatroom.
+  void create_chatroom(int code) {
+    welcome();
+    send_message(connection_, "CurrentTimeReply",
+                 Wire().number(11, 2).message(12, result(0)).bytes());
+    ASSERT_EQ(receive_message(connection_), "CreateChatroomRequest");
+    send_message(connection_, "CreateChatroomReply",
+                 Wire().number(11, 3).number(12, 42).message(13, result(code)).bytes());
+  }
+  // ... up to its first chat message.
+  void enter_chatroom() {
+    create_chatroom(1001);
+    ASSERT_EQ(receive_message(connection_), "AllowChatRequest");
+    send_message(connection_, "AllowChatReply", reply(4));
+    ASSERT_EQ(receive_message(connection_), "ChatRequest");
+  }
+  // ... up to where it waits for stored messages.
+  void fetch_unread() {
+    enter_chatroom();
+    for (int64_t message = 1; message <= 2; ++message) {
+      const Wire entry = Wire().number(1, 9000 + message).number(2, 1);
+      send_message(connection_, "ChatReply",
+                   reply(4 + message) + Wire().message(14, entry).bytes());
+      ASSERT_EQ(receive_message(connection_), message == 1 ? "ChatRequest" : "ReadMessageRequest");
+    }
+    send_message(connection_, "ReadMessageReply", reply(7));
+    ASSERT_EQ(receive_message(connection_), "GetAllUnreadMessageRequest");
+    send_message(connection_, "GetAllUnreadMessageReply",
+                 Wire().number(11, 8).message(12, result(0)).bytes());
+  }
   void expect_failure(const std::string& reason) {
     EXPECT_EQ(program_->exit_status(), 1);
     EXPECT_EQ(program_->messages(), "plug-in: " + reason + "\n");
@@ -167,11 +201,11 @@ TEST_F(PluginSession, WhenAnotherMessageComes_Fails) {
 
 TEST_F(PluginSession, WhenTheConnectionEnds_Fails) {
   shutdown(connection_, SHUT_RDWR);
-  expect_failure("the connection ended or fell silent where a reply was due");
+  expect_failure("the connection ended or fell silent where a message was due");
 }
 
 TEST_F(PluginSession, WhenTheFrontEndFallsSilent_Fails) {
-  expect_failure("the connection ended or fell silent where a reply was due");
+  expect_failure("the connection ended or fell silent where a message was due");
 }
 
 TEST_F(PluginSession, WhenAFrameIsCutShort_Fails) {
@@ -181,7 +215,7 @@ TEST_F(PluginSession, WhenAFrameIsCutShort_Fails) {
                  5, 0),
             5);
   shutdown(connection_, SHUT_RDWR);
-  expect_failure("the connection ended or fell silent where a reply was due");
+  expect_failure("the connection ended or fell silent where a message was due");
 }
 
 TEST_F(PluginSession, WhenAFrameClaimsTooLongAMessage_Fails) {
@@ -190,7 +224,7 @@ TEST_F(PluginSession, WhenAFrameClaimsTooLongAMessage_Fails) {
                  "X\x7f\xff\xff\xff",
                  6, 0),
             6);
-  expect_failure("the connection ended or fell silent where a reply was due");
+  expect_failure("the connection ended or fell silent where a message was due");
 }
 
 TEST_F(PluginSession, WhenAProbeCannotBeParsed_Fails) {
@@ -199,14 +233,45 @@ TEST_F(PluginSession, WhenAProbeCannotBeParsed_Fails) {
   expect_failure("the echo probe could not be parsed");
 }
 
-TEST_F(PluginSession, WhenTheChatMessageIsNotConfirmed_Fails) {
+TEST_F(PluginSession, WhenAPushedMessageCannotBeParsed_Fails) {
   welcome();
-  const Wire ok = result(0);
-  send_message(connection_, "CurrentTimeReply", Wire().number(11, 2).message(12, ok).bytes());
-  ASSERT_EQ(receive_message(connection_), "ChatRequest");
-  send_message(connection_, "ChatReply",
-               Wire().number(11, 3).number(12, 42).message(13, ok).bytes());
+  send_message(connection_, "ForwardOnlineMessage", hex("08"));
+  expect_failure("the pushed message could not be parsed");
+}
+
+TEST_F(PluginSession, WhenTheChatroomIsRefused_Fails) {
+  create_chatroom(2002);
+  expect_failure("the service refused the request");
+}
+
+TEST_F(PluginSession, WhenTheChatMessageIsNotConfirmed_Fails) {
+  enter_chatroom();
+  send_message(connection_, "ChatReply", reply(5));
   expect_failure("the service did not confirm the message");
+}
+
+TEST_F(PluginSession, WhenAPageCannotBeParsed_Fails) {
+  fetch_unread();
+  send_message(connection_, "ForwardUnreadMessage", hex("08"));
+  expect_failure("the page could not be parsed");
+}
+
+TEST_F(PluginSession, WhenAPageIsEmpty_GoesOn) {
+  fetch_unread();
+  send_message(connection_, "ForwardUnreadMessage", "");
+  ASSERT_EQ(receive_message(connection_), "ForwardUnreadMessageReply");
+  EXPECT_EQ(receive_message(connection_), "UnsealMessageRequest");
+}
+
+TEST_F(PluginSession, WhenTheTypingStatusCannotBeParsed_Fails) {
+  fetch_unread();
+  send_message(connection_, "ForwardUnreadMessage", "");
+  ASSERT_EQ(receive_message(connection_), "ForwardUnreadMessageReply");
+  ASSERT_EQ(receive_message(connection_), "UnsealMessageRequest");
+  send_message(connection_, "UnsealMessageReply", reply(9));
+  ASSERT_EQ(receive_message(connection_), "IsTyping");
+  send_message(connection_, "TypingUpdated", hex("08"));
+  expect_failure("the typing status could not be parsed");
 }
 
 const char kPluginUsage[] =
@@ -346,9 +411,42 @@ TEST_F(FrontEnd, WhenAChatMessageLacksItsLifetime_Fails) {
   expect_failure("a chat message that lacks a field");
 }
 
+TEST_F(FrontEnd, WhenARequestCarriesTheSendersIds_Fails) {
+  authenticate();
+  send_message(connection_, "CurrentTimeRequest", Wire().number(1, 5001).number(11, 2).bytes());
+  expect_failure("ids of the sender in: CurrentTimeRequest");
+}
+
+TEST_F(FrontEnd, WhenARequestIsOfAnotherChatroom_Fails) {
+  authenticate();
+  send_message(connection_, "IsTyping", Wire().number(11, 2).number(12, 43).bytes());
+  expect_failure("a typing status of another chatroom");
+}
+
+TEST_F(FrontEnd, WhenBothTitleAndLifetimeChange_Fails) {
+  authenticate();
+  send_message(connection_, "ChangeChatroomMetaRequest",
+               Wire().number(11, 2).number(12, 42).text(13, "x").number(16, 1).bytes());
+  expect_failure("a change that is not of one property");
+}
+
+TEST_F(FrontEnd, WhenAReadReceiptSaysMoreThanItShould_Fails) {
+  authenticate();
+  const Wire entry = Wire().number(1, 1).number(2, 0).number(3, 6001).number(5, 1).text(6, "x");
+  send_message(connection_, "ReadMessageRequest",
+               Wire().number(11, 2).number(12, 42).message(13, entry).bytes());
+  expect_failure("a read receipt with more than the message's name");
+}
+
+TEST_F(FrontEnd, WhenAMessageIsNotOneOfAPlugins_Fails) {
+  authenticate();
+  send_message(connection_, "ChatReply", "");
+  expect_failure("this front end does not take a ChatReply");
+}
+
 TEST_F(FrontEnd, WhenTheSessionEndsTooEarly_Fails) {
   authenticate();
-  expect_failure("the plug-in never asked for the time");
+  expect_failure("the plug-in never sent a message CurrentTimeRequest");
 }
 
 TEST_F(FrontEnd, WhenTheConnectionBreaksWithinAFrame_Fails) {
