@@ -13,6 +13,7 @@
 #include <vector>
 
 #include "msgspec_frontend.pb.h"
+#include "support/process_death.h"
 #include "support/wire.h"
 
 // ---- What the generated code asks the runtime when the library is loaded
@@ -318,6 +319,39 @@ TEST(IsValid, OfIsTypingContentType_AcceptsItsMembersAlone) {
 
 TEST(IsValid, OfConnectionResetCause_AcceptsItsMembersAlone) {
   EXPECT_EQ(accepted(&ConnectionResetCause_IsValid), (std::set<int>{0, 1}));
+}
+
+// Setters as other modules call them. The C interface comes to all but one of these.
+
+// A number that the compiler does not see: it would refuse one that is no member.
+template <typename Enumeration>
+Enumeration outside(volatile int number) {
+  return static_cast<Enumeration>(number);
+}
+
+TEST(EnumerationSetters, OfCreateChatroomRequestChatType_AbortWithANumberThatIsNoMember) {
+  EXPECT_EXIT(CreateChatroomRequest().set_chattype(outside<ChatType>(5)), support::aborts,
+              support::refused_by_setter("CreateChatroomRequest", "chattype", "ChatType"));
+}
+
+TEST(EnumerationSetters, OfInboxEntryChatType_AbortWithANumberThatIsNoMember) {
+  EXPECT_EXIT(InboxEntry().set_chattype(outside<ChatType>(5)), support::aborts,
+              support::refused_by_setter("InboxEntry", "chattype", "ChatType"));
+}
+
+TEST(EnumerationSetters, OfChatMessageParamMsgType_AbortWithANumberThatIsNoMember) {
+  EXPECT_EXIT(ChatMessageParam().set_msgtype(outside<MsgType>(7)), support::aborts,
+              support::refused_by_setter("ChatMessageParam", "msgtype", "MsgType"));
+}
+
+TEST(EnumerationSetters, OfInboxEntryMsgType_AbortWithANumberThatIsNoMember) {
+  EXPECT_EXIT(InboxEntry().set_msgtype(outside<MsgType>(7)), support::aborts,
+              support::refused_by_setter("InboxEntry", "msgtype", "MsgType"));
+}
+
+TEST(EnumerationSetters, OfIsTypingContentType_AbortWithANumberThatIsNoMember) {
+  EXPECT_EXIT(IsTyping().set_contenttype(outside<IsTypingContentType>(4)), support::aborts,
+              support::refused_by_setter("IsTyping", "contenttype", "IsTypingContentType"));
 }
 
 TEST(Generated, FieldNumberConstants_AreTheNumbers) {
