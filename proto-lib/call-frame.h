@@ -82,12 +82,16 @@ void copy_result_msg(const Result& result, char** resultMsg) {
   }
 }
 
-// A reply's outcome, as far as the caller asks for it.
-void copy_result(const Result& result, int* resultCode, char** resultMsg) {
-  if (resultCode != nullptr) {
-    *resultCode = result.code();
+// A reply's outcome, if there is one, as far as the caller asks for it.
+template <typename Reply>
+void copy_result(const Reply& reply, int* resultCode, char** resultMsg) {
+  if (!reply.has_result()) {
+    return;
   }
-  copy_result_msg(result, resultMsg);
+  if (resultCode != nullptr) {
+    *resultCode = reply.result().code();
+  }
+  copy_result_msg(reply.result(), resultMsg);
 }
 
 }  // namespace

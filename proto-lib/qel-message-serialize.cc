@@ -1,6 +1,7 @@
 // The exchanges of the message plug-in, one function each way, in the order of the interface's
 // table. Every function is read top-down in the order in which things happen: that order, the log
-// texts and what is not tested are all part of the interface.
+// texts and what is not tested are all part of the interface. So are the differences between
+// functions that look alike: none is a slip to be mended.
 
 #include "qel-message-serialize.h"
 
@@ -150,14 +151,13 @@ void create_chatroom_reply_deserialize(const unsigned char* data, int size, int6
   if (reply.has_msgttl()) {
     *msgTtl = reply.msgttl();
   }
-  if (reply.has_result()) {
-    copy_result(reply.result(), resultCode, resultMsg);
-  }
+  copy_result(reply, resultCode, resultMsg);
 
   // The code is read back through the caller's pointer, which is required by now and not tested.
   if (reply.result().has_wrongreceiverdetail() &&
       // NOLINTNEXTLINE(clang-analyzer-core.NullDereference)
       (*resultCode == 1000 || *resultCode == 1001 || *resultCode == 3009)) {
+    // Copied first: if memory runs out here, every list is as it was.
     detail.CopyFrom(reply.result().wrongreceiverdetail());
 
     *invalidReceiversCount = detail.invalidreceivers_size();
@@ -264,9 +264,7 @@ void chat_reply_deserialize(const unsigned char* data, int size, int64_t* reques
   if (chatroomId != nullptr) {
     *chatroomId = reply.chatroomid();
   }
-  if (reply.has_result()) {
-    copy_result(reply.result(), resultCode, resultMsg);
-  }
+  copy_result(reply, resultCode, resultMsg);
 
   const int entries = reply.processedmessageentries_size();
   QEL_LOG(kLogDebug, "processed msg entry size : %d", entries);
@@ -430,9 +428,7 @@ void get_all_unread_message_reply_deserialize(const unsigned char* data, int siz
   }
 
   *requestId = reply.requestid();
-  if (reply.has_result()) {
-    copy_result(reply.result(), resultCode, resultMsg);
-  }
+  copy_result(reply, resultCode, resultMsg);
 
   QEL_LOG(kLogWarn, "%s: exit", __func__);
 }
@@ -479,6 +475,7 @@ void forward_online_message_get_deserialize(const unsigned char* data, int size,
     *skipReply = false;
   }
 
+  // Copied first: if memory runs out here, the record is as it was.
   const InboxEntry entry = push.inboxentry();
   if (*inboxEntry == nullptr) {  // the caller's record
     *errorCode = 18;
@@ -613,9 +610,7 @@ void read_message_reply_deserialize(const unsigned char* data, int size, int64_t
 
   *requestId = reply.requestid();
   *chatroomId = reply.chatroomid();
-  if (reply.has_result()) {
-    copy_result(reply.result(), resultCode, resultMsg);
-  }
+  copy_result(reply, resultCode, resultMsg);
 
   QEL_LOG(kLogWarn, "%s: exit", __func__);
 }
@@ -647,9 +642,7 @@ void end_chat_reply_deserialize(const unsigned char* data, int size, int64_t* re
   }
 
   *requestId = reply.requestid();
-  if (reply.has_result()) {
-    copy_result(reply.result(), resultCode, resultMsg);
-  }
+  copy_result(reply, resultCode, resultMsg);
 
   QEL_LOG(kLogWarn, "%s: exit", __func__);
 }
@@ -693,9 +686,7 @@ void invite_reply_deserialize(
   if (sentTime != nullptr && reply.has_senttime()) {
     *sentTime = reply.senttime();
   }
-  if (reply.has_result()) {
-    copy_result(reply.result(), resultCode, resultMsg);
-  }
+  copy_result(reply, resultCode, resultMsg);
 
   // The code is read back through the caller's pointer, which is required by now and not tested.
   // Of the lists, only the last two are zeroed, and only the last has no count line.
@@ -797,9 +788,7 @@ void current_time_deserialize(const unsigned char* data, int size, int64_t* requ
 
   *requestId = reply.requestid();
   *currentTimeMillis = reply.has_currenttimemillis() ? reply.currenttimemillis() : -1;
-  if (reply.has_result()) {
-    copy_result(reply.result(), resultCode, resultMsg);
-  }
+  copy_result(reply, resultCode, resultMsg);
 
   QEL_LOG(kLogWarn, "%s: exit", __func__);
 }
@@ -834,9 +823,7 @@ void unseal_message_reply_deserialize(const unsigned char* data, int size, int64
 
   *requestId = reply.requestid();
   *chatroomId = reply.chatroomid();
-  if (reply.has_result()) {
-    copy_result(reply.result(), resultCode, resultMsg);
-  }
+  copy_result(reply, resultCode, resultMsg);
 
   QEL_LOG(kLogWarn, "%s: exit", __func__);
 }
@@ -871,9 +858,7 @@ void save_call_log_reply_deserialize(const unsigned char* data, int size, int64_
   }
 
   *requestId = reply.requestid();
-  if (reply.has_result()) {
-    copy_result(reply.result(), resultCode, resultMsg);
-  }
+  copy_result(reply, resultCode, resultMsg);
 
   QEL_LOG(kLogWarn, "%s: exit", __func__);
 }
@@ -977,9 +962,7 @@ void change_chatroom_meta_reply_deserialize(const unsigned char* data, int size,
 
   *requestId = reply.requestid();
   *chatroomId = reply.chatroomid();
-  if (reply.has_result()) {
-    copy_result(reply.result(), resultCode, resultMsg);
-  }
+  copy_result(reply, resultCode, resultMsg);
 
   QEL_LOG(kLogWarn, "%s: exit", __func__);
 }
