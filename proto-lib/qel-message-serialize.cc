@@ -366,7 +366,7 @@ void allow_chat_reply_deserialize(const unsigned char* data, int size, int64_t* 
   *requestId = reply.requestid();
   *chatroomId = reply.chatroomid();
   if (reply.has_result()) {
-    *resultCode = reply.result().code();  // not tested, unlike in the other replies
+    *resultCode = reply.result().code();  // not tested, unlike in most replies
     copy_result_msg(reply.result(), resultMsg);
   }
 

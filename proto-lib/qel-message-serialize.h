@@ -11,7 +11,8 @@
  *
  * Types. Identifiers and times are int64_t; 32-bit values, counts and lengths are int; received
  * bytes are data and size, their length in bytes. Text is NUL-terminated, UTF-8, and measured in
- * bytes.
+ * bytes; text that is not UTF-8 passes through unchanged, after a line of the protocol runtime on
+ * standard error.
  *
  * Serializers. They return 0, or -1 after one error line in the log. The last two arguments
  * receive the encoded message: its first byte and its length. The buffer has exactly that length,
@@ -19,8 +20,9 @@
  * leaves both outputs as they were. If the buffer cannot be allocated, *size holds the length and
  * *serialized_data is NULL. If the length is below 1, which no message of these functions is, *size
  * holds it and *serialized_data is as it was. Values passed by value are always put on the wire, 0
- * and "" included; values passed by pointer are optional, and NULL leaves the field out. userId and
- * deviceId of a message stay unset unless the function takes them.
+ * and "" included. A number or a bool that is passed by pointer is optional: NULL leaves the field
+ * out. A text is required unless the function says that it may be NULL. userId and deviceId of a
+ * message stay unset unless the function takes them.
  *
  * Deserializers. They return nothing. An output is written only after the bytes were parsed and
  * consumed whole; otherwise every output keeps what the caller left in it, and the log has the
@@ -40,8 +42,8 @@
  * otherwise either pointer may be NULL, *resultCode is written only if the reply has a result, and
  * *resultMsg only if that result has a text: set both before the call.
  *
- * Pointers. None may be NULL unless the function says so, and none is tested: a NULL pointer
- * faults.
+ * Pointers. None may be NULL unless these notes say so, and none is tested: a NULL pointer faults
+ * as soon as the call reads or writes through it.
  *
  * Memory. Every deserializer keeps one small block (its input stream) allocated for good, except
  * where the function says that it is released.
@@ -56,7 +58,7 @@
  *   IsTypingContentType  CONTENT_TEXT 0, CONTENT_IMAGE 1, CONTENT_VIDEO 2, CONTENT_AUDIO 3
  *
  * Exceptions. C++ exceptions out of the protocol runtime, for example std::bad_alloc while a text
- * is copied, are not caught.
+ * is copied, are not caught: called from C, they end the process.
  *
  * Threads. Any thread may call any function at any time.
  *
@@ -93,7 +95,7 @@ typedef struct {
 typedef struct {
   int64_t userId;
   int64_t available; /* 1 or 0 */
-  char* name;        /* never NULL as handed out; "" without a name */
+  char* name;        /* as handed out: "" without a name */
 } qel_message_chatroommember_t;
 
 /* A message in the inbox. */
@@ -103,7 +105,7 @@ typedef struct {
   int64_t sender;
   int64_t receiver;
   int64_t sentTime;
-  char* chatMsg; /* never NULL as handed out; "" without a text */
+  char* chatMsg; /* as handed out: "" without a text */
   int64_t chatroomId;
   int32_t chatType; /* a ChatType */
   int32_t msgTtl;   /* the message's lifetime */
@@ -178,8 +180,8 @@ int create_chatroom_request_serialize(int64_t requestId, int chatType, const int
  *
  * chatroomId  the new chatroom
  * msgTtl      the lifetime of its messages. Not written if the reply has none.
- * resultCode  may be NULL only if the result carries no details of refused receivers: the code is
- *             then read back through this pointer.
+ * resultCode  must not be NULL if the result carries details of refused receivers: their gate reads
+ *             the code back through this pointer.
  *
  * The details are four lists. They are written, counts included, only if the reply carries details
  * and its code is 1000, 1001 or 3009:
@@ -312,10 +314,11 @@ int forward_online_message_reply_serialize(int64_t requestId, int64_t chatroomId
  * inboxEntry            *inboxEntry points to a record of the caller's, which is filled: msgId,
  *                       msgType, sentTime and chatMsg always, sender, receiver and msgTtl only if
  *                       the message has them, chatroomId and chatType never. What is not filled
- *                       keeps what the caller put there. Release chatMsg.
- * skipReply             true if the service wants no acknowledgement; false if it does not say
- * errorCode, errorMsg   written only if *inboxEntry is NULL: 18, and a text to release; the outputs
- *                       above have been written all the same.
+ *                       keeps what the caller put there; a chatMsg that was there is overwritten,
+ *                       not released. Release the new one.
+ * skipReply             whether to leave out the acknowledgement; false if the message does not say
+ * errorCode, errorMsg   written only if *inboxEntry is NULL: 18, and a text to release. requestId,
+ *                       chatroomId, chatType and skipReply have been written all the same.
  *
  * Logs values at error level too, in calls that succeed.
  */
@@ -403,8 +406,8 @@ int invite_chat_request_serialize(int64_t requestId, int64_t chatroomId,
  * InviteReply: when the invitations were sent, and the users whom the service refused.
  *
  * sentTime    may be NULL. Not written if the reply has none.
- * resultCode  may be NULL only if the result carries no details of refused users: the code is then
- *             read back through this pointer.
+ * resultCode  must not be NULL if the result carries details of refused users: their gate reads the
+ *             code back through this pointer.
  *
  * The details are six lists. They are written, counts included, only if the reply carries details
  * and its code is 1000, 1001, 3003 or 3009:

@@ -5,14 +5,13 @@
 #include <sys/wait.h>
 #include <unistd.h>
 
-#include <atomic>
-#include <functional>
 #include <set>
 #include <thread>
 
 #include "support/heap.h"
 #include "support/outputs.h"
 #include "support/serializers.h"
+#include "support/threads.h"
 
 namespace {
 
@@ -24,24 +23,10 @@ using support::kSerializers;
 using support::Line;
 using support::logged_calls;
 using support::Serializer;
+using support::wrong_calls_of_two_threads;
 
 int log_thread(size_t call) {
   return std::get<int>(logged_calls().at(call).arguments.at(3));
-}
-
-// Two threads at once, numbered 0 and 1, call many times; returns how many calls were not right.
-int wrong_calls_of_two_threads(const std::function<bool(size_t thread)>& call_is_right) {
-  std::atomic<int> wrong = 0;
-  const auto call_often = [&](size_t thread) {
-    for (int n = 0; n < 5000; ++n) {
-      wrong += call_is_right(thread) ? 0 : 1;
-    }
-  };
-  std::thread first(call_often, 0);
-  std::thread second(call_often, 1);
-  first.join();
-  second.join();
-  return wrong;
 }
 
 // ---- Serializers

@@ -5,6 +5,7 @@
 #include <unistd.h>
 
 #include <cstdarg>
+#include <cstdio>
 #include <fstream>
 #include <map>
 #include <mutex>
@@ -17,6 +18,7 @@ namespace {
 
 std::mutex mutex;
 std::vector<LogCall> calls;
+thread_local std::function<void(const LogCall&)> observer;
 
 std::vector<LogArgument> read_arguments(const std::string& format, va_list list) {
   std::vector<LogArgument> arguments;
@@ -155,6 +157,17 @@ void clear_log() {
   calls.clear();
 }
 
+LogObserver::LogObserver(std::function<void(const LogCall&)> observe) {
+  observer = std::move(observe);
+}
+LogObserver::~LogObserver() {
+  observer = nullptr;
+}
+
+void print_format(const LogCall& call) {
+  std::fprintf(stderr, "%s\n", call.format.c_str());
+}
+
 void expect_log(const std::string& function, const std::vector<Line>& lines) {
   const std::vector<LogCall> logged = logged_calls();
   clear_log();
@@ -209,6 +222,9 @@ extern "C" int __dlog_print(int log_id, int priority, const char* tag, const cha
                         support::read_arguments(format, list),
                         static_cast<int>(syscall(SYS_gettid))};
   va_end(list);
+  if (support::observer) {
+    support::observer(call);
+  }
   const std::lock_guard<std::mutex> lock(support::mutex);
   support::calls.push_back(std::move(call));
   return 0;

@@ -2,6 +2,7 @@
 #ifndef TESTS_SUPPORT_LOG_CAPTURE_H
 #define TESTS_SUPPORT_LOG_CAPTURE_H
 
+#include <functional>
 #include <ostream>
 #include <string>
 #include <variant>
@@ -38,6 +39,18 @@ Line next_round(Line line);
 // All calls since the last clear_log(), of all threads, in order.
 std::vector<LogCall> logged_calls();
 void clear_log();
+
+// While it lives, is shown each line that this thread logs, at that moment. One at a time.
+class LogObserver {
+ public:
+  explicit LogObserver(std::function<void(const LogCall&)> observe);
+  ~LogObserver();
+  LogObserver(const LogObserver&) = delete;
+  LogObserver& operator=(const LogObserver&) = delete;
+};
+
+// For it: to stderr, so that a death test sees what was logged before the end.
+void print_format(const LogCall& call);
 
 // The log holds exactly these lines: each in the frame of its priority, naming the module, the
 // function, the line of the statement that logs it or of the shared step that does, and the calling
