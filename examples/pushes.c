@@ -54,7 +54,8 @@ static int take_online_message(session_t* session, const frame_t* push) {
   if (skip_reply) {
     return 0;
   }
-  status = forward_online_message_reply_serialize(request_id, chatroom, &mark_as_read, &message, &size);
+  status =
+      forward_online_message_reply_serialize(request_id, chatroom, &mark_as_read, &message, &size);
   return send_message(session, "ForwardOnlineMessageReply", status, message, size);
 }
 
