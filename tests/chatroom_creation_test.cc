@@ -496,7 +496,7 @@ TEST_P(CreateChatroomReplyIdList, WhenThereAre1000Ids_WritesThemAll) {
   EXPECT_EQ(list_.elements(), ids);
 }
 
-TEST_P(CreateChatroomReplyIdList, WhenThereAreIds_LogsTheirCountIfItDoesAndEach) {
+TEST_P(CreateChatroomReplyIdList, WhenThereAreIds_LogsTheCountLineIfItHasOneAndEachId) {
   read_ids({5, kSmallest, 4});
   std::vector<Line> lines;
   for (const auto& text : GetParam().count_text) {
@@ -527,7 +527,7 @@ TEST_P(CreateChatroomReplyIdList, WhenThereAreIds_AllocatesOneZeroedArray) {
   EXPECT_TRUE(watch.mallocs().empty());
 }
 
-TEST_P(CreateChatroomReplyIdList, WhenTheArrayCannotBeAllocated_FaultsAfterTheCountLine) {
+TEST_P(CreateChatroomReplyIdList, WhenTheArrayCannotBeAllocated_FaultsAfterTheLinesBeforeIt) {
   const auto last_line = GetParam().count_text.empty() ? "%s: enter" : GetParam().count_text[0];
   EXPECT_EXIT(
       {

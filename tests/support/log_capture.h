@@ -49,7 +49,7 @@ class LogObserver {
   LogObserver& operator=(const LogObserver&) = delete;
 };
 
-// For it: to stderr, so that a death test sees what was logged before the end.
+// An observer that prints to stderr, so that a death test sees what was logged before the end.
 void print_format(const LogCall& call);
 
 // The log holds exactly these lines: each in the frame of its priority, naming the module, the
