@@ -2,6 +2,7 @@
 
 #include <algorithm>
 #include <limits>
+#include <ostream>
 
 #include "support/exchange.h"
 #include "support/heap.h"
@@ -395,6 +396,9 @@ struct MarkList {
   int last_field;  // the time up to which the list goes
   int64_t AllowChatReplyOutputs::*last;
 };
+void PrintTo(const MarkList& one, std::ostream* out) {
+  *out << one.name;
+}
 
 const MarkList kMarkLists[] = {
     {"Deliveries", 20, &AllowChatReplyOutputs::deliveries, 21,
@@ -418,7 +422,7 @@ class AllowChatReplyMarks : public AllowChatReplyDeserialize,
     for (const Wire& mark : marks) {
       reply.message(GetParam().field, mark);
     }
-    support::HeapWatch watch;
+    support::HeapWatch watch;  // a field that is not written shows
     out_.read(reply.bytes());
     watch.stop();
   }
@@ -499,7 +503,7 @@ TEST_P(AllowChatReplyMarks, WhenARecordCannotBeAllocated_Faults) {
   EXPECT_EXIT(read_with_failing_malloc(2, reply), support::faults, "");
 }
 
-// One output pointer that is NULL, and a reply that makes the function write through it.
+// All output pointers, of which a test clears one.
 struct AllowChatReplyPointers {
   explicit AllowChatReplyPointers(AllowChatReplyOutputs* out)
       : request_id(&out->request_id),
@@ -543,8 +547,11 @@ struct AllowChatReplyPointers {
 struct NullPointer {
   const char* name;
   void (*clear)(AllowChatReplyPointers* pointers);
-  const char* reply;
+  const char* reply;  // makes the function write through it
 };
+void PrintTo(const NullPointer& one, std::ostream* out) {
+  *out << one.name;
+}
 
 class AllowChatReplyNull : public AllowChatReplyDeserialize,
                            public ::testing::WithParamInterface<NullPointer> {

@@ -1,6 +1,7 @@
 // Fetching unread messages, and the service's pushes of messages.
 
 #include <limits>
+#include <ostream>
 
 #include "support/exchange.h"
 #include "support/heap.h"
@@ -428,7 +429,7 @@ TEST_F(ForwardOnlineMessageGetDeserialize, WhenPushIsMalformed_LogsCheckAndKeeps
                      support::error(support::kMergeError), support::error(support::kStreamError)});
 }
 
-// One output pointer that is NULL.
+// All output pointers, of which a test clears one.
 struct OnlinePointers {
   explicit OnlinePointers(support::ForwardOnlineMessageOutputs* out)
       : request_id(&out->request_id),
@@ -459,6 +460,9 @@ struct OnlineNullPointer {
   const char* name;
   void (*clear)(OnlinePointers* pointers);
 };
+void PrintTo(const OnlineNullPointer& one, std::ostream* out) {
+  *out << one.name;
+}
 
 class ForwardOnlineMessageNull : public ForwardOnlineMessageGetDeserialize,
                                  public ::testing::WithParamInterface<OnlineNullPointer> {
