@@ -59,7 +59,7 @@ Function real(const char* name) {
 }  // namespace
 
 // AddressSanitizer asks here: a size that no allocator can serve is refused with NULL, as it is
-// without the sanitizer. NOLINTNEXTLINE(bugprone-reserved-identifier)
+// without the sanitizer.
 extern "C" const char* __asan_default_options() {
   return "allocator_may_return_null=1";
 }
