@@ -1,6 +1,5 @@
 // The record of a call.
 
-#include <limits>
 #include <new>
 
 #include "qel-message-serialize.h"
@@ -12,13 +11,12 @@ namespace {
 
 using support::Encoded;
 using support::ExchangeTest;
+using support::kLargest;
+using support::kLargestInt;
+using support::kSmallest;
+using support::kSmallestInt;
 using support::to_hex;
 using support::Wire;
-
-constexpr int64_t kSmallest = std::numeric_limits<int64_t>::min();
-constexpr int64_t kLargest = std::numeric_limits<int64_t>::max();
-constexpr int kSmallestInt = std::numeric_limits<int>::min();
-constexpr int kLargestInt = std::numeric_limits<int>::max();
 
 class SaveCallLogRequestSerialize : public ExchangeTest {
  protected:

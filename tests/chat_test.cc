@@ -1,7 +1,5 @@
 // Sending chat messages.
 
-#include <limits>
-
 #include "support/exchange.h"
 #include "support/heap.h"
 #include "support/outputs.h"
@@ -16,14 +14,13 @@ using support::FailingCalloc;
 using support::hex;
 using support::IdListOutput;
 using support::kIntSentinel;
+using support::kLargestInt;
+using support::kSmallest;
+using support::kSmallestInt;
 using support::Received;
 using support::TextOutput;
 using support::to_hex;
 using support::Wire;
-
-constexpr int64_t kSmallest = std::numeric_limits<int64_t>::min();
-constexpr int kSmallestInt = std::numeric_limits<int>::min();
-constexpr int kLargestInt = std::numeric_limits<int>::max();
 
 // ---- chat_request_serialize
 

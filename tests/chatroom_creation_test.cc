@@ -1,6 +1,5 @@
 // Creating a chatroom, and the receivers whom the service refuses.
 
-#include <limits>
 #include <utility>
 
 #include "support/exchange.h"
@@ -17,6 +16,10 @@ using support::FailingCalloc;
 using support::HeapWatch;
 using support::hex;
 using support::kIntSentinel;
+using support::kLargest;
+using support::kLargestInt;
+using support::kSmallest;
+using support::kSmallestInt;
 using support::Line;
 using support::ListOutput;
 using support::LogObserver;
@@ -26,11 +29,6 @@ using support::warn;
 using support::Wire;
 using testing::Values;
 using testing::ValuesIn;
-
-constexpr int64_t kSmallest = std::numeric_limits<int64_t>::min();
-constexpr int64_t kLargest = std::numeric_limits<int64_t>::max();
-constexpr int kSmallestInt = std::numeric_limits<int>::min();
-constexpr int kLargestInt = std::numeric_limits<int>::max();
 
 // ---- create_chatroom_request_serialize
 

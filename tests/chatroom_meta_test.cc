@@ -1,6 +1,5 @@
 // Changing a chatroom's title or lifetime.
 
-#include <limits>
 #include <new>
 #include <optional>
 #include <ostream>
@@ -14,14 +13,13 @@ namespace {
 using support::Encoded;
 using support::ExchangeTest;
 using support::expect_log;
+using support::kLargest;
+using support::kLargestInt;
+using support::kSmallest;
+using support::kSmallestInt;
 using support::Line;
 using support::to_hex;
 using support::Wire;
-
-constexpr int64_t kSmallest = std::numeric_limits<int64_t>::min();
-constexpr int64_t kLargest = std::numeric_limits<int64_t>::max();
-constexpr int kSmallestInt = std::numeric_limits<int>::min();
-constexpr int kLargestInt = std::numeric_limits<int>::max();
 
 class ChangeChatroomMetaRequestSerialize : public ExchangeTest {
  protected:

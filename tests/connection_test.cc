@@ -1,7 +1,5 @@
 // Channel authentication, echo, and the service's clock.
 
-#include <limits>
-
 #include "support/exchange.h"
 #include "support/heap.h"
 #include "support/outputs.h"
@@ -13,13 +11,12 @@ using support::Encoded;
 using support::ExchangeTest;
 using support::hex;
 using support::kIntSentinel;
+using support::kLargest;
 using support::kLongSentinel;
+using support::kSmallest;
 using support::Received;
 using support::TextOutput;
 using support::to_hex;
-
-constexpr int64_t kSmallest = std::numeric_limits<int64_t>::min();
-constexpr int64_t kLargest = std::numeric_limits<int64_t>::max();
 
 // ---- channel_auth_request_serialize
 

@@ -10,11 +10,10 @@ namespace {
 
 using support::Encoded;
 using support::ExchangeTest;
+using support::kLargest;
+using support::kSmallest;
 using support::to_hex;
 using support::Wire;
-
-constexpr int64_t kSmallest = std::numeric_limits<int64_t>::min();
-constexpr int64_t kLargest = std::numeric_limits<int64_t>::max();
 
 // ---- end_chat_request_serialize
 

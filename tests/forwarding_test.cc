@@ -1,6 +1,5 @@
 // Fetching unread messages, and the service's pushes of messages.
 
-#include <limits>
 #include <ostream>
 
 #include "support/exchange.h"
@@ -15,15 +14,14 @@ using support::ExchangeTest;
 using support::expect_log;
 using support::hex;
 using support::kIntSentinel;
+using support::kLargest;
+using support::kLargestInt;
 using support::kLongSentinel;
+using support::kSmallest;
+using support::kSmallestInt;
 using support::Received;
 using support::to_hex;
 using support::Wire;
-
-constexpr int64_t kSmallest = std::numeric_limits<int64_t>::min();
-constexpr int64_t kLargest = std::numeric_limits<int64_t>::max();
-constexpr int kSmallestInt = std::numeric_limits<int>::min();
-constexpr int kLargestInt = std::numeric_limits<int>::max();
 
 // Of a page, which has 1 to 500 messages.
 const int kSizesInRange[] = {1, 2, 499, 500};

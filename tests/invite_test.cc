@@ -1,7 +1,6 @@
 // Inviting members into a chatroom, and the users whom the service refuses.
 
 #include <algorithm>
-#include <limits>
 #include <utility>
 
 #include "support/exchange.h"
@@ -19,7 +18,11 @@ using support::FailingMalloc;
 using support::HeapWatch;
 using support::hex;
 using support::kIntSentinel;
+using support::kLargest;
+using support::kLargestInt;
 using support::kLongSentinel;
+using support::kSmallest;
+using support::kSmallestInt;
 using support::Line;
 using support::ListOutput;
 using support::LogObserver;
@@ -29,11 +32,6 @@ using support::warn;
 using support::Wire;
 using testing::Values;
 using testing::ValuesIn;
-
-constexpr int64_t kSmallest = std::numeric_limits<int64_t>::min();
-constexpr int64_t kLargest = std::numeric_limits<int64_t>::max();
-constexpr int kSmallestInt = std::numeric_limits<int>::min();
-constexpr int kLargestInt = std::numeric_limits<int>::max();
 
 // ---- invite_chat_request_serialize
 

@@ -3,7 +3,6 @@
 
 #include <algorithm>
 #include <iterator>
-#include <limits>
 #include <ostream>
 #include <vector>
 
@@ -16,15 +15,14 @@ namespace {
 using support::ExchangeTest;
 using support::hex;
 using support::kIntSentinel;
+using support::kLargest;
+using support::kLargestInt;
 using support::kLongSentinel;
+using support::kSmallest;
+using support::kSmallestInt;
 using support::Received;
 using support::TextOutput;
 using support::Wire;
-
-constexpr int64_t kSmallest = std::numeric_limits<int64_t>::min();
-constexpr int64_t kLargest = std::numeric_limits<int64_t>::max();
-constexpr int kSmallestInt = std::numeric_limits<int>::min();
-constexpr int kLargestInt = std::numeric_limits<int>::max();
 
 // For those that do not hand out the chatroom's id.
 template <auto Deserialize>

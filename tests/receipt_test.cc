@@ -15,11 +15,10 @@ using support::ExchangeTest;
 using support::expect_log;
 using support::FailingNew;
 using support::HeapWatch;
+using support::kLargest;
+using support::kSmallest;
 using support::to_hex;
 using support::Wire;
-
-constexpr int64_t kSmallest = std::numeric_limits<int64_t>::min();
-constexpr int64_t kLargest = std::numeric_limits<int64_t>::max();
 
 // ---- read_message_request_serialize
 

@@ -1,6 +1,5 @@
 // Typing status: the notice, and the service's push.
 
-#include <limits>
 #include <new>
 #include <type_traits>
 
@@ -20,15 +19,14 @@ using support::FailingNew;
 using support::HeapWatch;
 using support::hex;
 using support::kIntSentinel;
+using support::kLargest;
+using support::kLargestInt;
 using support::kLongSentinel;
+using support::kSmallest;
+using support::kSmallestInt;
 using support::Received;
 using support::to_hex;
 using support::Wire;
-
-constexpr int64_t kSmallest = std::numeric_limits<int64_t>::min();
-constexpr int64_t kLargest = std::numeric_limits<int64_t>::max();
-constexpr int kSmallestInt = std::numeric_limits<int>::min();
-constexpr int kLargestInt = std::numeric_limits<int>::max();
 
 // ---- is_typing_request_serialize: the one without a status, so what all other serializers share
 // is tested here too.

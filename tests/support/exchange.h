@@ -8,6 +8,7 @@
 
 #include <cstdint>
 #include <cstdlib>
+#include <limits>
 #include <string>
 #include <type_traits>
 #include <vector>
@@ -20,6 +21,12 @@ namespace support {
 // Values that outputs hold before a call; whoever finds one after it knows that it was not written.
 constexpr int kIntSentinel = -77707;
 constexpr int64_t kLongSentinel = -7770777077707;
+
+// The ends of what ids, times, counts and codes can be.
+constexpr int64_t kSmallest = std::numeric_limits<int64_t>::min();
+constexpr int64_t kLargest = std::numeric_limits<int64_t>::max();
+constexpr int kSmallestInt = std::numeric_limits<int>::min();
+constexpr int kLargestInt = std::numeric_limits<int>::max();
 
 // An output that receives a block: what was written is released in the end.
 template <typename T>
