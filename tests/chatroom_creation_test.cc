@@ -286,29 +286,6 @@ TEST_F(CreateChatroomReplyDeserialize, WhenResultIsEmpty_WritesCodeZeroAlone) {
   EXPECT_TRUE(out_.details_untouched());
 }
 
-TEST_F(CreateChatroomReplyDeserialize, WhenTextIsAbsent_WritesCodeAndLeavesText) {
-  out_.read(hex("6a 03 08 e9 07"));
-  EXPECT_EQ(out_.code, 1001);
-  EXPECT_TRUE(out_.text.untouched());
-}
-
-TEST_F(CreateChatroomReplyDeserialize, WhenTextIsEmptyButPresent_WritesEmptyText) {
-  out_.read(hex("6a 02 12 00"));
-  ASSERT_FALSE(out_.text.untouched());
-  EXPECT_STREQ(out_.text.block, "");
-}
-
-TEST_F(CreateChatroomReplyDeserialize, WhenTextIsLong_CopiesAllOfIt) {
-  const std::string text(5000, 'x');
-  out_.read(Wire().message(13, Wire().text(2, text)).bytes());
-  EXPECT_EQ(out_.text.block, text);
-}
-
-TEST_F(CreateChatroomReplyDeserialize, WhenTextHoldsANul_CopiesUpToIt) {
-  out_.read(hex("6a 05 12 03 61 00 62"));
-  EXPECT_STREQ(out_.text.block, "a");
-}
-
 TEST_F(CreateChatroomReplyDeserialize, WhenTextIsNull_WritesCodeAndDetails) {
   out_.read(hex(kReply), &out_.code, nullptr);
   EXPECT_EQ(out_.code, 1001);

@@ -250,28 +250,6 @@ TEST_F(AllowChatReplyDeserialize, WhenTtlIsZeroButPresent_WritesZero) {
   EXPECT_EQ(out_.ttl, 0);
 }
 
-TEST_F(AllowChatReplyDeserialize, WhenResultIsEmpty_WritesCodeZeroAndLeavesText) {
-  out_.read(hex("6a 00"));
-  EXPECT_EQ(out_.code, 0);
-  EXPECT_TRUE(out_.text.untouched());
-}
-
-TEST_F(AllowChatReplyDeserialize, WhenTextIsAbsent_WritesCodeAndLeavesText) {
-  out_.read(hex("6a 0b 08 fe ff ff ff ff ff ff ff ff 01"));
-  EXPECT_EQ(out_.code, -2);
-  EXPECT_TRUE(out_.text.untouched());
-}
-
-TEST_F(AllowChatReplyDeserialize, WhenTextIsEmptyButPresent_WritesEmptyText) {
-  out_.read(hex("6a 02 12 00"));
-  EXPECT_STREQ(out_.text.block, "");
-}
-
-TEST_F(AllowChatReplyDeserialize, WhenTextHoldsANul_CopiesUpToIt) {
-  out_.read(hex("6a 05 12 03 61 00 62"));
-  EXPECT_STREQ(out_.text.block, "a");
-}
-
 TEST_F(AllowChatReplyDeserialize, WhenResultMsgIsNull_WritesCodeAndWhatFollows) {
   out_.read(hex(kAllowChatReply), &out_.code, nullptr);
   EXPECT_EQ(out_.code, 3);

@@ -250,49 +250,12 @@ TEST_F(CurrentTimeDeserialize, WhenInputIsEmpty_WritesZeroAndMinusOneAlone) {
   EXPECT_TRUE(out_.text.untouched());
 }
 
-TEST_F(CurrentTimeDeserialize, WhenResultIsAbsent_LeavesCodeAndText) {
-  out_.read(hex("58 07 68 01"));
-  EXPECT_EQ(out_.code, kIntSentinel);
-  EXPECT_TRUE(out_.text.untouched());
-}
-
-TEST_F(CurrentTimeDeserialize, WhenResultIsEmpty_WritesCodeZeroAndLeavesText) {
-  out_.read(hex("58 07 62 00"));
-  EXPECT_EQ(out_.code, 0);
-  EXPECT_TRUE(out_.text.untouched());
-}
-
-TEST_F(CurrentTimeDeserialize, WhenTextIsAbsent_WritesCodeAndLeavesText) {
-  out_.read(hex("58 07 62 02 08 05"));
-  EXPECT_EQ(out_.code, 5);
-  EXPECT_TRUE(out_.text.untouched());
-}
-
-TEST_F(CurrentTimeDeserialize, WhenTextIsEmptyButPresent_WritesEmptyText) {
-  out_.read(hex("62 02 12 00"));
-  EXPECT_STREQ(out_.text.block, "");
-}
-
 TEST_F(CurrentTimeDeserialize, WhenCodeAndTextAreNull_WritesTheOtherTwo) {
   const Received received(hex(kTimeReply));
   current_time_deserialize(received.data(), received.size(), &out_.request_id, &out_.millis,
                            nullptr, nullptr);
   EXPECT_EQ(out_.request_id, 7);
   EXPECT_EQ(out_.millis, 1500);
-}
-
-TEST_F(CurrentTimeDeserialize, WhenCodeIsNull_WritesText) {
-  const Received received(hex(kTimeReply));
-  current_time_deserialize(received.data(), received.size(), &out_.request_id, &out_.millis,
-                           nullptr, &out_.text.block);
-  EXPECT_STREQ(out_.text.block, "no");
-}
-
-TEST_F(CurrentTimeDeserialize, WhenTextIsNull_WritesCode) {
-  const Received received(hex(kTimeReply));
-  current_time_deserialize(received.data(), received.size(), &out_.request_id, &out_.millis,
-                           &out_.code, nullptr);
-  EXPECT_EQ(out_.code, 3);
 }
 
 TEST_F(CurrentTimeDeserialize, WhenTheStreamCannotBeAllocated_WritesNothing) {

@@ -273,51 +273,28 @@ TEST_F(InviteReplyDeserialize, WhenResultIsEmpty_WritesCodeZeroAlone) {
   EXPECT_TRUE(out_.details_untouched());
 }
 
-TEST_F(InviteReplyDeserialize, WhenTextIsAbsent_WritesCodeAndLeavesText) {
-  out_.read(hex("6a 03 08 e9 07"));
-  EXPECT_EQ(out_.code, 1001);
-  EXPECT_TRUE(out_.text.untouched());
-}
-
-TEST_F(InviteReplyDeserialize, WhenTextIsEmptyButPresent_WritesEmptyText) {
-  out_.read(hex("6a 02 12 00"));
-  ASSERT_FALSE(out_.text.untouched());
-  EXPECT_STREQ(out_.text.block, "");
-}
-
-TEST_F(InviteReplyDeserialize, WhenTextIsLong_CopiesAllOfIt) {
-  const std::string text(5000, 'x');
-  out_.read(Wire().message(13, Wire().text(2, text)).bytes());
-  EXPECT_EQ(out_.text.block, text);
-}
-
-TEST_F(InviteReplyDeserialize, WhenTextHoldsANul_CopiesUpToIt) {
-  out_.read(hex("6a 05 12 03 61 00 62"));
-  EXPECT_STREQ(out_.text.block, "a");
-}
-
 TEST_F(InviteReplyDeserialize, WhenTextIsNull_WritesCodeAndDetails) {
-  out_.read(hex(kReply), &out_.sent_time, &out_.code, nullptr);
+  out_.read(hex(kReply), &out_.code, nullptr);
   EXPECT_EQ(out_.code, 3003);
   EXPECT_EQ(out_.denied.elements(), std::vector<int64_t>{5});
 }
 
 TEST_F(InviteReplyDeserialize, WhenCodeIsNullAndThereAreNoDetails_WritesText) {
-  out_.read(hex("6a 06 08 e9 07 12 01 78"), &out_.sent_time, nullptr, &out_.text.block);
+  out_.read(hex("6a 06 08 e9 07 12 01 78"), nullptr, &out_.text.block);
   EXPECT_STREQ(out_.text.block, "x");
   EXPECT_TRUE(out_.details_untouched());
   expect_details({});
 }
 
 TEST_F(InviteReplyDeserialize, WhenCodeIsNullAndResultAbsent_WritesIds) {
-  out_.read(hex("58 07 60 06"), &out_.sent_time, nullptr, &out_.text.block);
+  out_.read(hex("58 07 60 06"), nullptr, &out_.text.block);
   EXPECT_EQ(out_.request_id, 7);
   EXPECT_EQ(out_.chatroom_id, 6);
 }
 
 TEST_F(InviteReplyDeserialize, WhenCodeIsNullAndDetailsAreEmpty_Faults) {
-  EXPECT_EXIT(out_.read(reply(2000, Wire()).bytes(), &out_.sent_time, nullptr, &out_.text.block),
-              support::faults, "");
+  EXPECT_EXIT(out_.read(reply(2000, Wire()).bytes(), nullptr, &out_.text.block), support::faults,
+              "");
 }
 
 TEST_F(InviteReplyDeserialize, WhenAllListsAreEmpty_WritesZeroCountsAndLeavesArrays) {
@@ -382,9 +359,8 @@ TEST_P(InviteReplyDetailCode, WhenReplyHasDetails_WritesTheSixLists) {
 }
 
 TEST_P(InviteReplyDetailCode, WhenCodeIsNull_Faults) {
-  EXPECT_EXIT(
-      out_.read(reply(GetParam(), Wire()).bytes(), &out_.sent_time, nullptr, &out_.text.block),
-      support::faults, "");
+  EXPECT_EXIT(out_.read(reply(GetParam(), Wire()).bytes(), nullptr, &out_.text.block),
+              support::faults, "");
 }
 
 INSTANTIATE_TEST_SUITE_P(Reply, InviteReplyDetailCode, Values(1000, 1001, 3003, 3009));

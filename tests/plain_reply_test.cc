@@ -85,9 +85,6 @@ class PlainReplyDeserialize : public ExchangeTest,
     const Received received(bytes);
     reply_.call(received.data(), received.size(), request_id, chatroom_id, code, text);
   }
-  void read_result(const Wire& result) {
-    read(Wire().message(reply_.result_field, result).bytes());
-  }
 
   void expect_ids(int64_t request_id, int64_t chatroom_id) const {
     EXPECT_EQ(request_id_, request_id);
@@ -142,41 +139,6 @@ TEST_P(PlainReplyDeserialize, WhenResultIsAbsent_LeavesCodeAndText) {
   expect_ids(7, 0);
   EXPECT_EQ(code_, kIntSentinel);
   EXPECT_TRUE(text_.untouched());
-}
-
-TEST_P(PlainReplyDeserialize, WhenResultIsEmpty_WritesCodeZeroAndLeavesText) {
-  read_result(Wire());
-  expect_ids(0, 0);
-  EXPECT_EQ(code_, 0);
-  EXPECT_TRUE(text_.untouched());
-}
-
-TEST_P(PlainReplyDeserialize, WhenTextIsAbsent_WritesCodeAndLeavesText) {
-  read_result(Wire().number(1, 5));
-  EXPECT_EQ(code_, 5);
-  EXPECT_TRUE(text_.untouched());
-}
-
-TEST_P(PlainReplyDeserialize, WhenCodeIsAbsent_WritesZeroAndText) {
-  read_result(Wire().text(2, "no"));
-  EXPECT_EQ(code_, 0);
-  EXPECT_STREQ(text_.block, "no");
-}
-
-TEST_P(PlainReplyDeserialize, WhenTextIsEmptyButPresent_WritesEmptyText) {
-  read_result(Wire().text(2, ""));
-  EXPECT_STREQ(text_.block, "");
-}
-
-TEST_P(PlainReplyDeserialize, WhenTextIsLong_CopiesAllOfIt) {
-  const std::string text(5000, 'x');
-  read_result(Wire().text(2, text));
-  EXPECT_EQ(text_.block, text);
-}
-
-TEST_P(PlainReplyDeserialize, WhenTextHoldsANul_CopiesUpToIt) {
-  read_result(Wire().text(2, std::string("a\0b", 3)));
-  EXPECT_STREQ(text_.block, "a");
 }
 
 TEST_P(PlainReplyDeserialize, WhenResultCodeIsNull_WritesTheOthers) {

@@ -1,4 +1,5 @@
-// The outputs of each deserializer, set to sentinels before the call.
+// The outputs of each deserializer, set to sentinels before the call. Where a reply carries a
+// result, read() also takes other pointers for its code and its text.
 #ifndef TESTS_SUPPORT_OUTPUTS_H
 #define TESTS_SUPPORT_OUTPUTS_H
 
@@ -16,9 +17,10 @@ struct ResultOutputs {
   int code = kIntSentinel;
   TextOutput text;
 
-  void read(const std::string& bytes) {
+  void read(const std::string& bytes) { read(bytes, &code, &text.block); }
+  void read(const std::string& bytes, int* result_code, char** result_msg) {
     const Received received(bytes);
-    Deserialize(received.data(), received.size(), &request_id, &code, &text.block);
+    Deserialize(received.data(), received.size(), &request_id, result_code, result_msg);
   }
   bool untouched() const {
     return request_id == kLongSentinel && code == kIntSentinel && text.untouched();
@@ -38,9 +40,11 @@ struct ChatroomResultOutputs {
   int code = kIntSentinel;
   TextOutput text;
 
-  void read(const std::string& bytes) {
+  void read(const std::string& bytes) { read(bytes, &code, &text.block); }
+  void read(const std::string& bytes, int* result_code, char** result_msg) {
     const Received received(bytes);
-    Deserialize(received.data(), received.size(), &request_id, &chatroom_id, &code, &text.block);
+    Deserialize(received.data(), received.size(), &request_id, &chatroom_id, result_code,
+                result_msg);
   }
   bool untouched() const {
     return request_id == kLongSentinel && chatroom_id == kLongSentinel && code == kIntSentinel &&
@@ -75,7 +79,6 @@ struct CreateChatroomReplyOutputs {
   ListOutput<int64_t> denied;
 
   void read(const std::string& bytes) { read(bytes, &code, &text.block); }
-  // With other pointers for the result.
   void read(const std::string& bytes, int* result_code, char** result_msg) {
     const Received received(bytes);
     create_chatroom_reply_deserialize(
@@ -102,10 +105,11 @@ struct ChatReplyOutputs {
   IdListOutput ids;
   IdListOutput times;
 
-  void read(const std::string& bytes) {
+  void read(const std::string& bytes) { read(bytes, &code, &text.block); }
+  void read(const std::string& bytes, int* result_code, char** result_msg) {
     const Received received(bytes);
-    chat_reply_deserialize(received.data(), received.size(), &request_id, &chatroom_id, &code,
-                           &text.block, &count, &ids.block, &times.block);
+    chat_reply_deserialize(received.data(), received.size(), &request_id, &chatroom_id, result_code,
+                           result_msg, &count, &ids.block, &times.block);
   }
   bool untouched() const {
     return request_id == kLongSentinel && chatroom_id == kLongSentinel && code == kIntSentinel &&
@@ -150,7 +154,6 @@ struct AllowChatReplyOutputs {
   int ttl = kIntSentinel;
 
   void read(const std::string& bytes) { read(bytes, &code, &text.block); }
-  // With other pointers for the result.
   void read(const std::string& bytes, int* result_code, char** result_msg) {
     const Received received(bytes);
     allow_chat_reply_deserialize(
@@ -231,8 +234,11 @@ struct InviteReplyOutputs {
   ListOutput<qel_message_didviolationuser_t> violations;
   ListOutput<int64_t> denied;
 
-  void read(const std::string& bytes) { read(bytes, &sent_time, &code, &text.block); }
-  // With other pointers for the outputs that may be NULL.
+  void read(const std::string& bytes) { read(bytes, &code, &text.block); }
+  void read(const std::string& bytes, int* result_code, char** result_msg) {
+    read(bytes, &sent_time, result_code, result_msg);
+  }
+  // With another pointer for the time too.
   void read(const std::string& bytes, int64_t* time, int* result_code, char** result_msg) {
     const Received received(bytes);
     invite_reply_deserialize(
@@ -258,10 +264,11 @@ struct CurrentTimeOutputs {
   int code = kIntSentinel;
   TextOutput text;
 
-  void read(const std::string& bytes) {
+  void read(const std::string& bytes) { read(bytes, &code, &text.block); }
+  void read(const std::string& bytes, int* result_code, char** result_msg) {
     const Received received(bytes);
-    current_time_deserialize(received.data(), received.size(), &request_id, &millis, &code,
-                             &text.block);
+    current_time_deserialize(received.data(), received.size(), &request_id, &millis, result_code,
+                             result_msg);
   }
   bool untouched() const {
     return request_id == kLongSentinel && millis == kLongSentinel && code == kIntSentinel &&
