@@ -10,6 +10,7 @@
 #include <set>
 #include <sstream>
 #include <string>
+#include <typeinfo>
 #include <vector>
 
 #include "msgspec_frontend.pb.h"
@@ -363,6 +364,14 @@ TEST(Generated, FieldNumberConstants_AreTheNumbers) {
 TEST(Generated, FileFunction_CanBeCalledByUsers) {
   protobuf_AddDesc_msgspec_5ffrontend_2eproto();  // a second time does no harm
   EXPECT_EQ(ChatRequest::descriptor(), schema().FindMessageTypeByName("ChatRequest"));
+}
+
+TEST(Generated, AMessageMadeByTheLibrary_IsOfItsClassInOtherModules) {
+  const std::unique_ptr<const Message> made(
+      MessageFactory::generated_factory()->GetPrototype(ChatRequest::descriptor())->New());
+  const Message& message = *made;
+  EXPECT_EQ(typeid(message), typeid(ChatRequest));
+  EXPECT_EQ(dynamic_cast<const ChatRequest*>(&message), &message);
 }
 
 TEST(Descriptors, OfEnumerations_AreTheRegisteredOnes) {
