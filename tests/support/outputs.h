@@ -3,10 +3,13 @@
 #ifndef TESTS_SUPPORT_OUTPUTS_H
 #define TESTS_SUPPORT_OUTPUTS_H
 
+#include <cstdint>
+#include <cstdlib>
 #include <string>
 
 #include "qel-message-serialize.h"
-#include "support/exchange.h"
+#include "support/received.h"
+#include "support/sentinels.h"
 
 namespace support {
 

@@ -1,6 +1,7 @@
-#include "support/exchange.h"
+#include "support/received.h"
 
 #include <algorithm>
+#include <cstdlib>
 
 #include "support/heap.h"
 
