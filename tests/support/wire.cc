@@ -73,4 +73,51 @@ Wire& Wire::message(int field, const Wire& value) {
   return text(field, value.bytes());
 }
 
+Wire& Wire::group(int field, const Wire& value) {
+  tag(field, 3);
+  bytes_ += value.bytes();
+  tag(field, 4);
+  return *this;
+}
+
+void Wire::fixed(uint64_t value, int size) {
+  for (int i = 0; i < size; ++i, value >>= 8) {
+    bytes_ += static_cast<char>(value);
+  }
+}
+
+Wire& Wire::fixed64(int field, uint64_t value) {
+  tag(field, 1);
+  fixed(value, 8);
+  return *this;
+}
+
+Wire& Wire::fixed32(int field, uint32_t value) {
+  tag(field, 5);
+  fixed(value, 4);
+  return *this;
+}
+
+uint64_t WireReader::varint() {
+  uint64_t value = 0;
+  for (int shift = 0;; shift += 7) {
+    const auto byte = static_cast<unsigned char>(bytes_.at(next_++));
+    value |= static_cast<uint64_t>(byte & 0x7f) << shift;
+    if (byte < 0x80) {
+      return value;
+    }
+  }
+}
+
+std::string WireReader::text() {
+  const uint64_t tag = varint();
+  if (tag % 8 != 2) {
+    throw std::invalid_argument("no text or message: tag " + std::to_string(tag));
+  }
+  const uint64_t size = varint();
+  std::string value = bytes_.substr(next_, size);
+  next_ += size;
+  return value;
+}
+
 }  // namespace support

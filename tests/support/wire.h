@@ -4,6 +4,7 @@
 
 #include <cstdint>
 #include <string>
+#include <utility>
 
 namespace support {
 
@@ -20,12 +21,29 @@ class Wire {
   Wire& number(int field, int64_t value);           // int32, int64, bool, enumerations
   Wire& text(int field, const std::string& value);  // string, bytes
   Wire& message(int field, const Wire& value);      // an embedded message
+  Wire& group(int field, const Wire& value);
+  Wire& fixed64(int field, uint64_t value);
+  Wire& fixed32(int field, uint32_t value);
   const std::string& bytes() const { return bytes_; }
 
  private:
   void varint(uint64_t value);
   void tag(int field, unsigned wire_type);
+  void fixed(uint64_t value, int size);
   std::string bytes_;
+};
+
+// Takes such bytes apart again, field by field.
+class WireReader {
+ public:
+  explicit WireReader(std::string bytes) : bytes_(std::move(bytes)) {}
+  bool at_end() const { return next_ == bytes_.size(); }
+  std::string text();  // of a string, bytes or an embedded message, whatever its field
+
+ private:
+  uint64_t varint();
+  std::string bytes_;
+  size_t next_ = 0;
 };
 
 }  // namespace support
