@@ -1,0 +1,144 @@
+// Every deserializer with bytes that the independent peer made: the outputs are those of the
+// message that the peer was given, which itself was never bytes.
+
+#include <gtest/gtest.h>
+
+#include <algorithm>
+#include <iterator>
+#include <string>
+#include <vector>
+
+#include "msgspec_frontend.pb.h"
+#include "support/agreement.h"
+#include "support/exchange.h"
+#include "support/outputs.h"
+#include "support/peer.h"
+#include "support/samples.h"
+
+namespace {
+
+using google::protobuf::Descriptor;
+using google::protobuf::Message;
+using support::Filling;
+using support::PeerItem;
+using support::Sample;
+
+struct Deserializer {
+  const char* name;
+  const Descriptor* (*message)();
+  std::string (*disagreement_after_reading)(const std::string& bytes, const Message& message);
+};
+
+template <typename Outputs, typename T>
+constexpr Deserializer deserializer(const char* name) {
+  return {name, &T::descriptor, [](const std::string& bytes, const Message& message) {
+            Outputs outputs;
+            outputs.read(bytes);
+            return disagreement(outputs, dynamic_cast<const T&>(message));
+          }};
+}
+
+const Deserializer kDeserializers[] = {
+    deserializer<support::ChannelAuthReplyOutputs, ChannelAuthReply>(
+        "channel_auth_reply_deserialize"),
+    deserializer<support::ClientEchoOutputs, ClientEcho>("client_echo_deserialize"),
+    deserializer<support::CreateChatroomReplyOutputs, CreateChatroomReply>(
+        "create_chatroom_reply_deserialize"),
+    deserializer<support::ChatReplyOutputs, ChatReply>("chat_reply_deserialize"),
+    deserializer<support::AllowChatReplyOutputs, AllowChatReply>("allow_chat_reply_deserialize"),
+    deserializer<support::GetAllUnreadMessageReplyOutputs, GetAllUnreadMessageReply>(
+        "get_all_unread_message_reply_deserialize"),
+    deserializer<support::ForwardOnlineMessageOutputs, ForwardOnlineMessage>(
+        "forward_online_message_get_deserialize"),
+    deserializer<support::ForwardUnreadMessageOutputs, ForwardUnreadMessage>(
+        "forward_unread_message_deserialize"),
+    deserializer<support::ReadMessageReplyOutputs, ReadMessageReply>(
+        "read_message_reply_deserialize"),
+    deserializer<support::EndChatReplyOutputs, EndChatReply>("end_chat_reply_deserialize"),
+    deserializer<support::InviteReplyOutputs, InviteReply>("invite_reply_deserialize"),
+    deserializer<support::CurrentTimeOutputs, CurrentTimeReply>("current_time_deserialize"),
+    deserializer<support::UnsealMessageReplyOutputs, UnsealMessageReply>(
+        "unseal_message_reply_deserialize"),
+    deserializer<support::SaveCallLogReplyOutputs, SaveCallLogReply>(
+        "save_call_log_reply_deserialize"),
+    deserializer<support::TypingUpdatedOutputs, TypingUpdated>("typing_updated_deserialize"),
+    deserializer<support::ChangeChatroomMetaReplyOutputs, ChangeChatroomMetaReply>(
+        "change_chatroom_meta_reply_deserialize"),
+};
+
+// Those that open the lists of refused receivers, in one reply or in both, and two that do not.
+const int32_t kCodes[] = {0, 1000, 1001, 2000, 3003, 3009};
+
+std::vector<Filling> plain_and_coded_fillings() {
+  std::vector<Filling> all = support::fillings();
+  for (const int32_t code : kCodes) {
+    for (const int elements : {0, 1, 500}) {
+      Filling filling = support::filling_with_code(code);
+      filling.elements = elements;
+      filling.name += "_" + std::to_string(elements) + "Elements";
+      all.push_back(filling);
+    }
+  }
+  return all;
+}
+
+std::vector<Filling> later_and_coded_fillings() {
+  std::vector<Filling> all = support::later_fillings();
+  for (const int32_t code : kCodes) {
+    Filling filling = support::filling_with_code(code);
+    filling.has_later_fields = true;
+    all.push_back(filling);
+  }
+  return all;
+}
+
+struct Case {
+  const Deserializer* function;
+  Sample sample;
+  std::string peers_bytes;
+};
+
+std::vector<Case> make_cases(const std::string& peer_schema, const std::vector<Filling>& fillings) {
+  std::vector<Case> cases;
+  std::vector<PeerItem> texts;
+  for (const Deserializer& function : kDeserializers) {
+    for (const Filling& filling : fillings) {
+      cases.push_back({&function, support::make_sample(*function.message(), filling), ""});
+      texts.push_back({cases.back().sample.type(), cases.back().sample.text});
+    }
+  }
+  const std::vector<std::string> encodings = support::peer_encode_all(peer_schema, texts);
+  for (size_t i = 0; i < cases.size(); ++i) {
+    cases[i].peers_bytes = encodings[i];
+  }
+  return cases;
+}
+
+// Made once for all tests of the program: starting the peer is what takes time.
+const std::vector<Case>& every_case() {
+  static const std::vector<Case> cases = [] {
+    std::vector<Case> all = make_cases(support::library_schema(), plain_and_coded_fillings());
+    std::vector<Case> later = make_cases(support::later_schema(), later_and_coded_fillings());
+    std::move(later.begin(), later.end(), std::back_inserter(all));
+    return all;
+  }();
+  return cases;
+}
+
+class EveryDeserializer : public support::ExchangeTest,
+                          public testing::WithParamInterface<size_t> {};
+
+TEST_P(EveryDeserializer, GivenThePeersBytes_WritesTheValuesThatThePeerWasGiven) {
+  const Case& that = every_case()[GetParam()];
+  EXPECT_EQ(that.function->disagreement_after_reading(that.peers_bytes, *that.sample.message), "")
+      << "the message:\n"
+      << that.sample.text.substr(0, 2000);
+}
+
+INSTANTIATE_TEST_SUITE_P(Filled, EveryDeserializer, testing::Range(size_t{0}, every_case().size()),
+                         [](const auto& place) {
+                           const Case& that = every_case()[place.param];
+                           return that.function->name + ("_" + that.sample.filling);
+                         });
+
+}  // namespace
