@@ -126,16 +126,19 @@ std::unique_ptr<Message> parsed(const Sample& sample, const std::string& bytes) 
   return message;
 }
 
-// ---- Tests of every sample
+// ---- Every sample
 
 // The parameter is a sample's place in its corpus.
-class EveryMessage : public testing::TestWithParam<size_t> {
+template <const Corpus& (*made_corpus)()>
+class SampleTest : public testing::TestWithParam<size_t> {
  protected:
-  const Sample& sample() const { return corpus().samples[GetParam()]; }
-  const std::string& ours() const { return corpus().ours[GetParam()]; }
-  const std::string& peers() const { return corpus().peers[GetParam()]; }
-  const std::string& peer_reading() const { return corpus().peer_reading[GetParam()]; }
+  const Sample& sample() const { return made_corpus().samples[GetParam()]; }
+  const std::string& ours() const { return made_corpus().ours[GetParam()]; }
+  const std::string& peers() const { return made_corpus().peers[GetParam()]; }
+  const std::string& peer_reading() const { return made_corpus().peer_reading[GetParam()]; }
 };
+class EveryMessage : public SampleTest<corpus> {};
+class EveryMessageOfALaterSchema : public SampleTest<later_corpus> {};
 
 TEST_P(EveryMessage, Filled_HoldsTheValues) {
   EXPECT_TRUE(same_text(sample().text, text_of(*sample().message)));
@@ -172,14 +175,6 @@ TEST_P(EveryMessage, Filled_IsSerializedToThePeersBytesOneByOne) {
 TEST_P(EveryMessage, Filled_IsReadByThePeerAsTheValues) {
   EXPECT_TRUE(same_text(sample().text, peer_reading()));
 }
-
-class EveryMessageOfALaterSchema : public testing::TestWithParam<size_t> {
- protected:
-  const Sample& sample() const { return later_corpus().samples[GetParam()]; }
-  const std::string& ours() const { return later_corpus().ours[GetParam()]; }
-  const std::string& peers() const { return later_corpus().peers[GetParam()]; }
-  const std::string& peer_reading() const { return later_corpus().peer_reading[GetParam()]; }
-};
 
 TEST_P(EveryMessageOfALaterSchema, ParsedFromThePeersBytes_HoldsWhatIsKnownAndKeepsTheRest) {
   EXPECT_TRUE(same_text(text_of(*sample().message), text_of(*parsed(sample(), peers()))));
