@@ -8,6 +8,7 @@
 #include <set>
 #include <thread>
 
+#include "support/exchange.h"
 #include "support/heap.h"
 #include "support/outputs.h"
 #include "support/serializers.h"

@@ -1,5 +1,6 @@
 // The functions against the independent peer: what it makes is parsed, what they make it reads.
 
+#include "support/exchange.h"
 #include "support/outputs.h"
 #include "support/peer.h"
 
