@@ -7,33 +7,35 @@
 
 namespace support {
 
-// While it lives, the n-th calloc of this thread from its construction on fails, n from 1.
-class FailingCalloc {
+enum class Allocator { kCalloc, kMalloc, kStrdup, kNew };
+
+// While it lives, the n-th block that this thread asks of the allocator from its construction on is
+// refused: NULL, or an exception of operator new. From 1; with 0 none is. An allocator counts what
+// is asked of itself alone: malloc, for one, not what operator new or strdup takes.
+class FailingAllocation {
  public:
-  explicit FailingCalloc(int n);
-  ~FailingCalloc();
-  FailingCalloc(const FailingCalloc&) = delete;
-  FailingCalloc& operator=(const FailingCalloc&) = delete;
+  FailingAllocation(Allocator allocator, int n);
+  ~FailingAllocation();
+  FailingAllocation(const FailingAllocation&) = delete;
+  FailingAllocation& operator=(const FailingAllocation&) = delete;
+
+  // Whether it has come to the n-th.
+  bool happened() const;
+
+ private:
+  Allocator allocator_;
+  int n_;
 };
 
-// While it lives, the n-th malloc of this thread from its construction on fails, n from 1. Does not
-// count what operator new allocates; whether it counts strdup is the C library's choice.
-class FailingMalloc {
+template <Allocator allocator>
+class Failing : public FailingAllocation {
  public:
-  explicit FailingMalloc(int n);
-  ~FailingMalloc();
-  FailingMalloc(const FailingMalloc&) = delete;
-  FailingMalloc& operator=(const FailingMalloc&) = delete;
+  explicit Failing(int n) : FailingAllocation(allocator, n) {}
 };
-
-// While it lives, the n-th operator new of this thread from its construction on throws, n from 1.
-class FailingNew {
- public:
-  explicit FailingNew(int n);
-  ~FailingNew();
-  FailingNew(const FailingNew&) = delete;
-  FailingNew& operator=(const FailingNew&) = delete;
-};
+using FailingCalloc = Failing<Allocator::kCalloc>;
+using FailingMalloc = Failing<Allocator::kMalloc>;
+using FailingStrdup = Failing<Allocator::kStrdup>;
+using FailingNew = Failing<Allocator::kNew>;
 
 // Watches the calling thread from its construction until stop(). Meanwhile malloc hands out blocks
 // filled with kFreshByte, so that what is not written shows.
@@ -55,18 +57,21 @@ class HeapWatch {
 
   // Every calloc, in order.
   const std::vector<Block>& callocs() const { return callocs_; }
-  // Sizes of every malloc, in order, counted as FailingMalloc does.
+  // Sizes of every malloc, in order; strdup and operator new are none.
   const std::vector<size_t>& mallocs() const { return mallocs_; }
   // How many blocks operator new made.
   size_t news() const { return news_; }
-  // Sizes of the blocks that operator new made and operator delete did not release.
+  // Sizes of the blocks that operator new made and operator delete did not release, least first.
   const std::vector<size_t>& kept() const { return kept_; }
+  // Sizes of the blocks of calloc, malloc and strdup that were not freed, least first.
+  const std::vector<size_t>& not_freed() const { return not_freed_; }
 
  private:
   std::vector<Block> callocs_;
   std::vector<size_t> mallocs_;
   size_t news_ = 0;
   std::vector<size_t> kept_;
+  std::vector<size_t> not_freed_;
 };
 
 // While it lives, the calling thread's allocations neither fail nor show: for the tests' own.
