@@ -400,10 +400,12 @@ class EveryDeserializer : public support::ExchangeTest,
     }
     expect_log(function_.name, lines);
   }
+  // Apart from what it hands out, which is released.
   std::vector<size_t> kept(const std::string& bytes) const {
     HeapWatch watch;
     leaves_outputs(bytes);
     watch.stop();
+    EXPECT_EQ(watch.not_freed(), std::vector<size_t>{});
     return watch.kept();
   }
 };
@@ -506,6 +508,10 @@ TEST_P(EveryDeserializer, WhenTheParseFails_KeepsTheStream) {
 
 TEST_P(EveryDeserializer, WhenTheStreamDoesNotEndCleanly_KeepsTheStream) {
   EXPECT_EQ(kept(hex("00")), std::vector<size_t>{support::kStreamSize});
+}
+
+TEST_P(EveryDeserializer, WhenBothFail_KeepsTheStream) {
+  EXPECT_EQ(kept(hex("0f")), std::vector<size_t>{support::kStreamSize});
 }
 
 TEST_P(EveryDeserializer, WhenTheStreamCannotBeAllocated_ThrowsAfterItsEntryLine) {

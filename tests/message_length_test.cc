@@ -134,6 +134,7 @@ TEST_P(MessageLength, WhenRefused_KeepsNothing) {
   call();
   watch.stop();
   EXPECT_EQ(watch.kept(), std::vector<size_t>{});
+  EXPECT_EQ(watch.not_freed(), std::vector<size_t>{});
 }
 
 TEST_P(MessageLength, WhenSucceeding_IsComputedOnce) {
@@ -155,6 +156,17 @@ TEST(MessageLengthOfIsTyping, WhenNegative_IsAFailedAllocation) {
   const std::string name = "is_typing_request_serialize";
   support::expect_log(name, {support::debug("%s: enter", {name}),
                              support::debug("Memory allocation is failed to serialized_data")});
+}
+
+TEST(MessageLengthOfIsTyping, WhenNegative_KeepsNothing) {
+  replaced_length = -5;
+  support::Encoded out;
+  support::HeapWatch watch;
+  is_typing_request_serialize(1, 2, "a", nullptr, nullptr, &out.data.block, &out.size);
+  watch.stop();
+  replaced_length.reset();
+  EXPECT_EQ(watch.kept(), std::vector<size_t>{});
+  EXPECT_EQ(watch.not_freed(), std::vector<size_t>{});
 }
 
 TEST(MessageLengthOfIsTyping, WhenSucceeding_IsComputedOnce) {
