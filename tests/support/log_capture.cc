@@ -106,12 +106,6 @@ std::string statement_at(int line) {
   return statement;
 }
 
-std::string whole_format(const Line& line) {
-  static const std::map<int, std::string> colours = {
-      {3, "\033[32m"}, {4, "\033[34m"}, {5, "\033[33m"}, {6, "\033[31m"}};
-  return "%s: %s(%d) > " + colours.at(line.priority) + "[%d]" + line.text + "\033[0m";
-}
-
 std::string printed(const std::vector<LogArgument>& arguments) {
   std::string text;
   for (const LogArgument& argument : arguments) {
@@ -145,6 +139,12 @@ Line error(std::string text, std::vector<LogArgument> arguments) {
 Line next_round(Line line) {
   line.next_round = true;
   return line;
+}
+
+std::string whole_format(const Line& line) {
+  static const std::map<int, std::string> colours = {
+      {3, "\033[32m"}, {4, "\033[34m"}, {5, "\033[33m"}, {6, "\033[31m"}};
+  return "%s: %s(%d) > " + colours.at(line.priority) + "[%d]" + line.text + "\033[0m";
 }
 
 std::vector<LogCall> logged_calls() {

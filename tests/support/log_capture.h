@@ -36,6 +36,9 @@ Line warn(std::string text, std::vector<LogArgument> arguments = {});
 Line error(std::string text, std::vector<LogArgument> arguments = {});
 Line next_round(Line line);
 
+// A line's format, with the frame that all lines share.
+std::string whole_format(const Line& line);
+
 // All calls since the last clear_log(), of all threads, in order.
 std::vector<LogCall> logged_calls();
 void clear_log();
