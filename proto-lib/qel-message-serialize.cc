@@ -475,8 +475,10 @@ void forward_online_message_get_deserialize(const unsigned char* data, int size,
     *skipReply = false;
   }
 
-  // Copied first: if memory runs out here, the record is as it was.
-  const InboxEntry entry = push.inboxentry();
+  // Copied first: if memory runs out here, the record is as it was. Not by the class's copy
+  // constructor: what that has allocated until then would never be released.
+  InboxEntry entry;
+  entry.CopyFrom(push.inboxentry());
   if (*inboxEntry == nullptr) {  // the caller's record
     *errorCode = 18;
     *errorMsg = strdup("inboxentry memory allocation failed");

@@ -56,18 +56,18 @@ Wire refusal(int code) {
   return Wire().number(1, code).text(2, kOutcome).message(3, detail);
 }
 
-// Without the bytes of a secure message.
-Wire inbox_entry(const char* text) {
+Wire inbox_entry() {
   return Wire()
       .number(1, 21)
       .number(2, 3)
       .number(3, 22)
       .number(4, 23)
       .number(5, 24)
-      .text(6, text)
+      .text(6, kText)
       .number(7, 25)
       .number(10, 26)
-      .number(11, 1);
+      .number(11, 1)
+      .text(20, kText);
 }
 
 // Calls a serializer with outputs, its last two arguments.
@@ -110,7 +110,7 @@ void observe_push_of_one(Observation* seen, support::ForwardOnlineMessageOutputs
                         .number(11, 7)
                         .number(12, 6)
                         .number(13, 1)
-                        .message(14, inbox_entry("hi"))  // its copy takes one block
+                        .message(14, inbox_entry())
                         .number(15, 1)
                         .number(16, 5)
                         .number(30, 1);
@@ -163,7 +163,7 @@ const Account kAccounts[] = {
 
     {Steps("forward_stored_message_deserialize").returns(),
      [](Observation* seen) {
-       const Wire push = Wire().message(12, inbox_entry(kText)).text(13, kText);
+       const Wire push = Wire().message(12, inbox_entry()).text(13, kText);
        const support::Received received(push.bytes());
        support::ForwardUnreadMessageOutputs out;
        seen->of([&] {
@@ -530,7 +530,7 @@ const Account kAccounts[] = {
          .writes("inboxEntry.sender", "22")
          .writes("inboxEntry.receiver", "23")
          .writes("inboxEntry.sentTime", "24")
-         .hands_out(kStrdup, "inboxEntry.chatMsg", "hi")
+         .hands_out(kStrdup, "inboxEntry.chatMsg", kText)
          .writes("inboxEntry.msgTtl", "25")
          .exits(),
      [](Observation* seen) {
@@ -593,8 +593,8 @@ const Account kAccounts[] = {
                              .number(1, 9)
                              .number(2, 8)
                              .number(11, 7)
-                             .message(12, inbox_entry(kText).text(20, kText))
-                             .message(12, inbox_entry(kText).text(20, kText))
+                             .message(12, inbox_entry())
+                             .message(12, inbox_entry())
                              .text(13, kText)
                              .number(14, 1);
        support::ForwardUnreadMessageOutputs out;
