@@ -1,0 +1,78 @@
+#!/usr/bin/env python3
+"""Are all lines and branches of the module executed by the tests, but for those that are listed?
+
+usage: coverage.py BUILD
+
+BUILD is a folder of the coverage preset in which the tests have run. Writes BUILD/coverage.txt and
+BUILD/html/index.html. Branches that the compiler adds for exceptions do not count.
+"""
+
+import json
+import pathlib
+import re
+import subprocess
+import sys
+
+ROOT = pathlib.Path(__file__).resolve().parent.parent
+LISTED = ROOT / "tools" / "uncovered.txt"
+SOURCES = ["call-frame.h", "log-line.h", "qel-message-serialize.cc"]
+
+
+def gcovr(build, *report):
+    filters = [option for file in SOURCES for option in ("--filter", f"proto-lib/{re.escape(file)}$")]
+    command = ["gcovr", "--root", ROOT, *filters, "--exclude-throw-branches",
+               build / "proto-lib", *report]
+    return subprocess.run(command, check=True, stdout=subprocess.PIPE, text=True).stdout
+
+
+def measured(build):
+    """What was not executed, as 'file | function | line | what', and the number of lines and branches."""
+    found, lines, branches = [], 0, 0
+    files = json.loads(gcovr(build, "--json"))["files"]
+    if sorted(pathlib.Path(f["file"]).name for f in files) != SOURCES:
+        sys.exit(f"coverage: no counters of {', '.join(SOURCES)} in {build}")
+    for file in files:
+        source = (ROOT / file["file"]).read_text().splitlines()
+        functions = sorted((f["lineno"], f["name"]) for f in file["functions"])
+        for line in file["lines"]:
+            if line["gcovr/noncode"] or line["gcovr/excluded"]:
+                continue
+            lines += 1
+            branches += len(line["branches"])
+            number = line["line_number"]
+            name = [name for first, name in functions if first <= number][-1]
+            place = " | ".join([pathlib.Path(file["file"]).name, re.search(r"(\w+)(\(|<|$)", name).group(1),
+                                source[number - 1].strip()])
+            missed = sum(branch["count"] == 0 for branch in line["branches"])
+            if line["count"] == 0:
+                found.append(f"{place} | not executed")
+            elif missed:
+                found.append(f"{place} | {missed} of {len(line['branches'])} branches not taken")
+    return found, lines, branches
+
+
+def listed():
+    """The lines of the list but for the reasons, which stand above them."""
+    return [line for line in LISTED.read_text().splitlines() if line and not line.startswith("#")]
+
+
+def main():
+    if len(sys.argv) != 2:
+        sys.exit(__doc__)
+    build = pathlib.Path(sys.argv[1]).resolve()
+    found, lines, branches = measured(build)
+    known = listed()
+    (build / "coverage.txt").write_text(gcovr(build) + gcovr(build, "--branches") + "\n".join(found) + "\n")
+    (build / "html").mkdir(exist_ok=True)
+    gcovr(build, "--html-details", build / "html" / "index.html")
+
+    wrong = [f"not covered: {entry}" for entry in found if entry not in known]
+    wrong += [f"covered or gone, but listed in {LISTED.name}: {entry}" for entry in known if entry not in found]
+    print("".join(f"{line}\n" for line in wrong), end="")
+    print(f"coverage: {lines} lines and {branches} branches, {len(found)} places not covered, "
+          f"{len(wrong)} not as listed; see {build}/coverage.txt and html/index.html")
+    sys.exit(1 if wrong else 0)
+
+
+if __name__ == "__main__":
+    main()
