@@ -14,6 +14,7 @@ using support::FailingCalloc;
 using support::hex;
 using support::IdListOutput;
 using support::kIntSentinel;
+using support::kLargest;
 using support::kLargestInt;
 using support::kSmallest;
 using support::kSmallestInt;
@@ -217,6 +218,19 @@ TEST_F(ChatReplyDeserialize, WhenReplyHasTwoEntries_WritesTwoArraysInOrder) {
   EXPECT_EQ(out_.ids.block[1], 2);
   EXPECT_EQ(out_.times.block[0], 300);
   EXPECT_EQ(out_.times.block[1], 400);
+}
+
+TEST_F(ChatReplyDeserialize, WhenIdsAndTimesAreExtreme_WritesThem) {
+  out_.read(Wire()
+                .number(11, kSmallest)
+                .number(12, kLargest)
+                .message(14, Wire().number(1, kLargest).number(2, kSmallest))
+                .bytes());
+  EXPECT_EQ(out_.request_id, kSmallest);
+  EXPECT_EQ(out_.chatroom_id, kLargest);
+  ASSERT_EQ(out_.count, 1);
+  EXPECT_EQ(out_.ids.block[0], kLargest);
+  EXPECT_EQ(out_.times.block[0], kSmallest);
 }
 
 TEST_F(ChatReplyDeserialize, WhenReplyHasTwoEntries_LogsTheirNumberAtDebugLevel) {

@@ -17,6 +17,7 @@ using support::kSmallest;
 using support::Received;
 using support::TextOutput;
 using support::to_hex;
+using support::Wire;
 
 // ---- channel_auth_request_serialize
 
@@ -86,6 +87,11 @@ TEST_F(ChannelAuthReplyDeserialize, WhenIdAndCodeAreNegative_WritesThem) {
   out_.read(hex("08 ff ff ff ff ff ff ff ff ff 01 12 0b 08 fe ff ff ff ff ff ff ff ff 01"));
   EXPECT_EQ(out_.request_id, -1);
   EXPECT_EQ(out_.code, -2);
+}
+
+TEST_F(ChannelAuthReplyDeserialize, WhenIdIsSmallest_WritesIt) {
+  out_.read(hex("08 80 80 80 80 80 80 80 80 80 01"));
+  EXPECT_EQ(out_.request_id, kSmallest);
 }
 
 TEST_F(ChannelAuthReplyDeserialize, WhenInputIsEmpty_WritesZerosAndNull) {
@@ -229,6 +235,12 @@ TEST_F(CurrentTimeDeserialize, WhenReplyIsWhole_WritesAllOutputs) {
   EXPECT_EQ(out_.millis, 1500);
   EXPECT_EQ(out_.code, 3);
   EXPECT_STREQ(out_.text.block, "no");
+}
+
+TEST_F(CurrentTimeDeserialize, WhenIdAndTimeAreExtreme_WritesThem) {
+  out_.read(Wire().number(11, kSmallest).number(13, kLargest).bytes());
+  EXPECT_EQ(out_.request_id, kSmallest);
+  EXPECT_EQ(out_.millis, kLargest);
 }
 
 TEST_F(CurrentTimeDeserialize, WhenTimeIsZeroButPresent_WritesZero) {

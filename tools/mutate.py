@@ -1,0 +1,258 @@
+#!/usr/bin/env python3
+"""Changes the module in many small ways, one at a time, and sees whether the tests notice.
+
+usage: mutate.py BUILD [--list | --all] [PATTERN]
+
+BUILD is a folder of the coverage preset, built. A mutant is compiled aside and linked to a library of
+its own, and the programs of BUILD take that one: neither the tree nor BUILD is touched. PATTERN is a
+regular expression of which mutants to take: 'function | kind | line => line' is searched for it.
+"""
+
+import argparse
+import collections
+import concurrent.futures
+import json
+import os
+import pathlib
+import queue
+import re
+import resource
+import shlex
+import signal
+import subprocess
+import sys
+import time
+import zlib
+
+import mutants
+
+ROOT = pathlib.Path(__file__).resolve().parent.parent
+MODULE = "proto-lib/qel-message-serialize.cc"
+LIBRARY = "proto-lib/libqel-message-protosvc.so"
+SOURCES = ["log-line.h", "call-frame.h", "qel-message-serialize.cc"]
+EQUIVALENT = ROOT / "tools" / "equivalent_mutants.txt"
+SAMPLE = 700  # of them, what two idle cores do in about twenty minutes
+MOST_MEMORY = 6 << 30  # a loop without end must not take the machine's
+
+
+def limit():
+    resource.setrlimit(resource.RLIMIT_AS, (MOST_MEMORY, MOST_MEMORY))
+    resource.setrlimit(resource.RLIMIT_CORE, (0, 0))
+
+
+def run(command, seconds, **settings):
+    """Whether the command ends well, in that time; with its output."""
+    process = subprocess.Popen(command, stdin=subprocess.DEVNULL, stdout=subprocess.PIPE,
+                               stderr=subprocess.STDOUT, start_new_session=True,
+                               preexec_fn=limit, **settings)
+    try:
+        output = process.communicate(timeout=seconds)[0]
+    except subprocess.TimeoutExpired:
+        os.killpg(process.pid, signal.SIGKILL)
+        process.communicate()
+        return False, b"took too long"
+    return process.returncode == 0, output
+
+
+class Build:
+    """How the preset builds the library, and which programs test it."""
+
+    def __init__(self, folder):
+        self.folder = folder
+        entries = json.loads((folder / "compile_commands.json").read_text())
+        entry = next(e for e in entries if e["file"] == str(ROOT / MODULE))
+        self.compile = shlex.split(entry["command"])
+        self.object = self.compile[self.compile.index("-o") + 1]
+        commands = subprocess.check_output(["ninja", "-C", folder, "-t", "commands", LIBRARY], text=True)
+        self.link = commands.strip().splitlines()[-1]
+        listed = json.loads(subprocess.check_output(
+            ["ctest", "--test-dir", folder, "--show-only=json-v1"]))
+        self.programs = sorted({t["command"][0] for t in listed["tests"]
+                                if any(a.startswith("--gtest_filter") for a in t["command"])})
+
+
+class Worker:
+    """A folder with a copy of the module, where mutants are built and tested one after the other."""
+
+    def __init__(self, build, folder):
+        self.build = build
+        self.folder = folder
+        self.source = folder / "proto-lib"
+        self.source.mkdir(parents=True, exist_ok=True)
+        for file in (ROOT / "proto-lib").glob("*.[hc]*"):
+            self.restore(file.name)
+        options = [o for o in build.compile if not re.match("-W|-g$|--coverage|-fprofile", o)]
+        options = [o.replace(f"-I{ROOT}/proto-lib", f"-I{self.source}") for o in options]
+        head = options[:options.index("-o")] + ["-w"]
+        prelude = folder / "prelude.h"
+        self.compile = head + ["-include", prelude, "-o", folder / "module.o", "-c",
+                               self.source / os.path.basename(MODULE)]
+        self.link = build.link.replace("--coverage", "").replace(build.object, str(folder / "module.o")).replace(
+            f"-o {LIBRARY}", f"-o {folder / os.path.basename(LIBRARY)}")
+        self._precompile(head, prelude)
+
+    def _precompile(self, head, prelude):
+        """What the module includes of others', once for all mutants."""
+        text = "".join((self.source / name).read_text() for name in SOURCES)
+        includes = re.findall(r'^#include (?:<.*>|".*\.pb\.h")$', text, re.M)
+        prelude.write_text("\n".join(dict.fromkeys(includes)) + "\n")
+        subprocess.run([*head, "-x", "c++-header", prelude, "-o", f"{prelude}.gch"],
+                       cwd=self.build.folder, check=True)
+
+    def restore(self, name):
+        (self.source / name).write_text((ROOT / "proto-lib" / name).read_text())
+
+    def outcome(self, mutant, limits):
+        """'caught', 'survived' or 'not compiled', and by what it was caught."""
+        file = self.source / mutant.file
+        text = file.read_text()
+        file.write_text(text[:mutant.start] + mutant.text + text[mutant.end:])
+        try:
+            if not self.library():
+                return "not compiled", ""
+            for program, pattern in self.stages(mutant.function):
+                passed, output = self.test(program, pattern, limits[program])
+                if not passed:
+                    failed = re.search(rb"\[  FAILED  \] ([\w./]+)", output)
+                    return "caught", failed.group(1).decode() if failed else f"the end of {pattern}"
+            return "survived", ""
+        finally:
+            self.restore(mutant.file)
+
+    def library(self):
+        built, _ = run(self.compile, 120, cwd=self.build.folder)
+        return built and run(self.link, 120, cwd=self.build.folder, shell=True)[0]
+
+    def stages(self, function):
+        """The function's own tests first."""
+        stem = re.sub(r"_(request_|reply_|get_)?(de)?serialize$", "", function)
+        if stem != function:
+            suite = "".join(word.capitalize() for word in stem.split("_"))
+            yield from ((p, f"*{suite}*:*/{stem}_*") for p in self.build.programs)
+        yield from ((p, "*") for p in self.build.programs)
+
+    def test(self, program, pattern, seconds):
+        environment = dict(os.environ, LD_LIBRARY_PATH=str(self.folder))
+        return run([program, "--gtest_brief=1", "--gtest_fail_fast", f"--gtest_filter={pattern}"],
+                   seconds, env=environment, cwd=self.folder)
+
+
+def time_limits(worker):
+    """The module as it is passes; and how long each program may take with a mutant. The shortest
+    comes first from now on."""
+    if not worker.library():
+        sys.exit("mutate: the module itself does not compile")
+    took = {}
+    for program in worker.build.programs:
+        start = time.monotonic()
+        passed, output = worker.test(program, "*", 1200)
+        if not passed:
+            sys.exit(f"mutate: {program} fails without any mutant:\n{output.decode(errors='replace')}")
+        took[program] = time.monotonic() - start
+    worker.build.programs.sort(key=took.get)
+    return {program: 30 + 5 * seconds for program, seconds in took.items()}
+
+
+def read_equivalent():
+    """Names of mutants that nobody can tell from the module. The file has a reason above each group."""
+    lines = EQUIVALENT.read_text().splitlines()
+    return {line for line in lines if line and not line.startswith("#")}
+
+
+def sample(found, most):
+    """As many of each function and kind, spread over it, so that all together are no more than most."""
+    groups = collections.defaultdict(list)
+    for mutant in found:
+        groups[mutant.function, mutant.kind].append(mutant)
+    for size in range(max(map(len, groups.values())), 0, -1):
+        if sum(min(size, len(group)) for group in groups.values()) <= most:
+            break
+    chosen = {group[i * len(group) // min(size, len(group))]
+              for group in groups.values() for i in range(min(size, len(group)))}
+    return [mutant for mutant in found if mutant in chosen]
+
+
+def try_all(chosen, build, folder):
+    """Yields each mutant with its outcome, as they are known."""
+    workers = queue.SimpleQueue()
+    first = Worker(build, folder / "1")
+    limits = time_limits(first)
+    workers.put(first)
+    for n in range(2, os.cpu_count() + 1):
+        workers.put(Worker(build, folder / str(n)))
+
+    def try_one(mutant):
+        worker = workers.get()
+        try:
+            return mutant, *worker.outcome(mutant, limits)
+        finally:
+            workers.put(worker)
+
+    with concurrent.futures.ThreadPoolExecutor(os.cpu_count()) as pool:
+        for done in concurrent.futures.as_completed(pool.submit(try_one, m) for m in chosen):
+            yield done.result()
+
+
+def print_table(counts):
+    columns = ["caught", "equivalent", "survived", "not compiled"]
+    print(f"{'kind':18}" + "".join(f"{c:>14}" for c in columns))
+    for kind, _ in mutants.RULES:
+        if sum(counts[kind].values()):
+            print(f"{kind:18}" + "".join(f"{counts[kind][c]:14}" for c in columns))
+
+
+def main():
+    arguments = argparse.ArgumentParser(usage=__doc__.split("usage: ")[1].split("\n")[0])
+    arguments.add_argument("build")
+    arguments.add_argument("--list", action="store_true")
+    arguments.add_argument("--all", action="store_true")
+    arguments.add_argument("pattern", nargs="?")
+    given = arguments.parse_args()
+
+    found = [mutant for file in SOURCES
+             for mutant in mutants.mutants_of(file, (ROOT / "proto-lib" / file).read_text())]
+    equivalent = read_equivalent()
+    unknown = equivalent - {mutant.name for mutant in found}
+    if given.pattern:
+        chosen = [m for m in found if re.search(given.pattern, m.name)]
+    else:
+        chosen = found if given.all or given.list else sample(
+            [mutant for mutant in found if mutant.name not in equivalent], SAMPLE)
+    chosen.sort(key=lambda mutant: zlib.crc32(mutant.name.encode()))  # of every function soon
+    if given.list:
+        print("\n".join(mutant.name for mutant in chosen))
+        return
+
+    folder = ROOT / "build" / "mutate"
+    folder.mkdir(exist_ok=True)
+    build = Build(pathlib.Path(given.build).resolve())
+    counts = collections.defaultdict(collections.Counter)
+    wrong = [f"listed as equivalent, but no mutant: {name}" for name in sorted(unknown)]
+    start = time.monotonic()
+    with open(folder / "results.txt", "w") as results:
+        for n, (mutant, outcome, by) in enumerate(try_all(chosen, build, folder), 1):
+            name = mutant.name
+            if name in equivalent:
+                if outcome == "caught":
+                    wrong.append(f"listed as equivalent, but caught by {by}: {name}")
+                outcome = "equivalent" if outcome == "survived" else outcome
+            counts[mutant.kind][outcome] += 1
+            print(f"{outcome} | {name} | {by}", file=results, flush=True)
+            if outcome == "survived":
+                wrong.append(f"survived: {name}")
+                print(wrong[-1], flush=True)
+            if n % 25 == 0:
+                print(f"{n} of {len(chosen)}, {(time.monotonic() - start) / 60:.1f} minutes", flush=True)
+
+    print_table(counts)
+    for line in wrong:
+        print(line)
+    total = sum(counts.values(), collections.Counter())
+    print(f"mutate: {total['caught']} of {len(chosen)} mutants caught, {total['survived']} survived, "
+          f"{total['equivalent']} equivalent, {total['not compiled']} did not compile; all of them: "
+          f"{folder / 'results.txt'}")
+    sys.exit(1 if wrong else 0)
+
+
+if __name__ == "__main__":
+    main()
