@@ -137,6 +137,17 @@ TEST_P(MessageLength, WhenRefused_KeepsNothing) {
   EXPECT_EQ(watch.not_freed(), std::vector<size_t>{});
 }
 
+// As far as the allocation, since no message is that short.
+TEST_P(MessageLength, WhenOne_IsAllocated) {
+  replaced_length = 1;
+  {
+    const support::FailingCalloc fault(1);
+    call();
+  }
+  EXPECT_EQ(out_.size, 1);
+  EXPECT_EQ(out_.data.block, nullptr);
+}
+
 TEST_P(MessageLength, WhenSucceeding_IsComputedOnce) {
   lengths_computed = 0;
   call();

@@ -19,14 +19,14 @@ SOURCES = ["call-frame.h", "log-line.h", "qel-message-serialize.cc"]
 
 
 def gcovr(build, *report):
-    filters = [option for file in SOURCES for option in ("--filter", f"proto-lib/{re.escape(file)}$")]
+    filters = [f"--filter=proto-lib/{re.escape(file)}$" for file in SOURCES]
     command = ["gcovr", "--root", ROOT, *filters, "--exclude-throw-branches",
                build / "proto-lib", *report]
     return subprocess.run(command, check=True, stdout=subprocess.PIPE, text=True).stdout
 
 
 def measured(build):
-    """What was not executed, as 'file | function | line | what', and the number of lines and branches."""
+    """What was not executed, as 'file | function | line | what'; numbers of lines and branches."""
     found, lines, branches = [], 0, 0
     files = json.loads(gcovr(build, "--json"))["files"]
     if sorted(pathlib.Path(f["file"]).name for f in files) != SOURCES:
@@ -41,7 +41,8 @@ def measured(build):
             branches += len(line["branches"])
             number = line["line_number"]
             name = [name for first, name in functions if first <= number][-1]
-            place = " | ".join([pathlib.Path(file["file"]).name, re.search(r"(\w+)(\(|<|$)", name).group(1),
+            place = " | ".join([pathlib.Path(file["file"]).name,
+                                re.search(r"(\w+)(\(|<|$)", name).group(1),
                                 source[number - 1].strip()])
             missed = sum(branch["count"] == 0 for branch in line["branches"])
             if line["count"] == 0:
@@ -62,12 +63,14 @@ def main():
     build = pathlib.Path(sys.argv[1]).resolve()
     found, lines, branches = measured(build)
     known = listed()
-    (build / "coverage.txt").write_text(gcovr(build) + gcovr(build, "--branches") + "\n".join(found) + "\n")
+    (build / "coverage.txt").write_text(
+        gcovr(build) + gcovr(build, "--branches") + "\n".join(found) + "\n")
     (build / "html").mkdir(exist_ok=True)
     gcovr(build, "--html-details", build / "html" / "index.html")
 
     wrong = [f"not covered: {entry}" for entry in found if entry not in known]
-    wrong += [f"covered or gone, but listed in {LISTED.name}: {entry}" for entry in known if entry not in found]
+    wrong += [f"covered or gone, but listed in {LISTED.name}: {entry}"
+              for entry in known if entry not in found]
     print("".join(f"{line}\n" for line in wrong), end="")
     print(f"coverage: {lines} lines and {branches} branches, {len(found)} places not covered, "
           f"{len(wrong)} not as listed; see {build}/coverage.txt and html/index.html")

@@ -1,7 +1,7 @@
 """The small ways in which tools/mutate.py changes the module, made by rules from its source.
 
 A rule is a generator: it is given a function's part of a source and yields edits, each a span and
-what replaces it. Edits keep the number of lines, so that what logs a line still stands where it did.
+what replaces it. Edits keep the number of lines, so that the rest still stands where it did.
 """
 
 import collections
@@ -113,13 +113,10 @@ def parts(source):
     """Functions and macros, and what stands between."""
     code = code_view(source)
     at = 0
-    heads = re.compile(r"^(?!return\b|constexpr int k)[a-zA-Z][\w:*&<> ]*?[ *](\w+)\([^;{}]*?\) *\{", re.M)
+    heads = re.compile(r"^[a-zA-Z][\w:*&<> ]*?[ *](\w+)\([^;{}]*?\) *\{", re.M)
     for match in heads.finditer(code):
-        if match.start() > at:
-            yield Part(source, code, "", at, match.start())
-        at = re.compile(r"\}$", re.M).search(code, match.end() - 1).end()
-        if code.find("\n}", match.end()) >= 0 and "\n" in code[match.end():at]:
-            at = code.find("\n}", match.end() - 1) + 2
+        yield Part(source, code, "", at, match.start())
+        at = re.compile(r"^\}|\{ *\}$", re.M).search(code, match.end() - 1).end()
         yield Part(source, code, match.group(1), match.start(), at)
     yield Part(source, code, "", at, len(code))
 
@@ -257,7 +254,10 @@ def _(part):
     for text, start, end in part.statements():
         match = re.match(r"\*(\w+) = |\w+(?:\.|->)set_\w+\((\w+)\);", text)
         name = match and (match.group(1) or match.group(2))
-        if name and re.search(rf"\* ?{name}\b", part.text) and f"{name} != nullptr" not in part.text:
+        if not name or "allocate" in text or f"{name} != nullptr" in part.text:
+            continue  # a block is filled by what follows, which faults as well
+        follows = re.compile(r"[^;{]*").match(part.code, end).group()
+        if re.search(rf"\* ?{name}\b", part.text) and f"*{name}" not in follows:
             yield start, end, f"if ({name} != nullptr) {{ {text} }}"
 
 
@@ -282,7 +282,7 @@ def _(part):
 
 @rule("order")
 def _(part):
-    """Neighbours swapped, but not two that only fill fields or outputs: nobody sees which was first."""
+    """Neighbours swapped, but not two that only fill fields or outputs, whose order nobody sees."""
     fills = re.compile(rf"{SETTER}|{ASSIGNMENT}|copy_result(_msg)?\(|delete ", re.S)
 
     def is_quiet(text):
@@ -326,7 +326,7 @@ def _(part):
 def _(part):
     """The next field of the same message, or the next argument."""
     fields, arguments = collections.defaultdict(list), collections.defaultdict(list)
-    gets = [m for m in part.find(r"\b(\w+)\.(\w+)\(\)") if not re.match("has_|mutable_|c_str|Byte|Cons", m.group(2))]
+    gets = list(part.find(r"\b(\w+)\.(?!has_|mutable_|c_str|ByteSize)(\w+)\(\)"))
     sets = [m for m in part.find(SETTER) if m.group(3) == "set"]
     for match in gets:
         fields[match.group(1)].append(match.group(2))
@@ -344,7 +344,8 @@ def _(part):
 
 @rule("width")
 def _(part):
-    for match in part.find(r"(?:set|add)_\w+\((\w+(?:\[i\])?)\)|lld\(([^;]*?)\)\);|\*(\w+) = (\w+\.\w+\(\));"):
+    for match in part.find(r"(?:set|add)_\w+\((\w+(?:\[i\])?)\)|lld\(([^;]*?)\)\);|"
+                           r"\*(\w+) = (\w+\.\w+\(\));"):
         group = 1 if match.group(1) else 2 if match.group(2) else 4
         name = match.group(3) or match.group(group).split("[")[0]
         if group == 2 or re.search(rf"\bint64_t\*? {name}\b", part.text):
@@ -371,12 +372,14 @@ def _(part):
 @rule("zeroing")
 def _(part):
     for match in part.find(r"\b(allocate_zeroed|allocate)<"):
-        yield *match.span(1), "allocate" if match.group(1) != "allocate" else "allocate_zeroed"
+        others = {"allocate": "allocate_zeroed", "allocate_zeroed": "allocate"}
+        yield *match.span(1), others[match.group(1)]
 
 
 @rule("count")
 def _(part):
-    for match in part.find(r"\ballocate(?:_zeroed)?<[^;]*>\(([^;]*)\);|[mc]alloc\((static_cast<size_t>\(count\))"):
+    for match in part.find(r"\ballocate(?:_zeroed)?<[^;]*>\(([^;]*)\);|"
+                           r"[mc]alloc\((static_cast<size_t>\(count\))"):
         group = 1 if match.group(1) else 2
         if not match.group(group).isdigit():
             for change in (" + 1", " - 1"):

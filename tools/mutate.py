@@ -3,9 +3,9 @@
 
 usage: mutate.py BUILD [--list | --all] [PATTERN]
 
-BUILD is a folder of the coverage preset, built. A mutant is compiled aside and linked to a library of
-its own, and the programs of BUILD take that one: neither the tree nor BUILD is touched. PATTERN is a
-regular expression of which mutants to take: 'function | kind | line => line' is searched for it.
+BUILD is a folder of the coverage preset, built. A mutant is compiled aside and linked to a library
+of its own, and the programs of BUILD take that one: neither the tree nor BUILD is touched. PATTERN
+is a regular expression for which the mutants' names are searched: those that have it are taken.
 """
 
 import argparse
@@ -63,16 +63,18 @@ class Build:
         entry = next(e for e in entries if e["file"] == str(ROOT / MODULE))
         self.compile = shlex.split(entry["command"])
         self.object = self.compile[self.compile.index("-o") + 1]
-        commands = subprocess.check_output(["ninja", "-C", folder, "-t", "commands", LIBRARY], text=True)
-        self.link = commands.strip().splitlines()[-1]
-        listed = json.loads(subprocess.check_output(
-            ["ctest", "--test-dir", folder, "--show-only=json-v1"]))
+        self.link = self._output("ninja", "-C", folder, "-t", "commands", LIBRARY).splitlines()[-1]
+        listed = json.loads(self._output("ctest", "--test-dir", folder, "--show-only=json-v1"))
         self.programs = sorted({t["command"][0] for t in listed["tests"]
                                 if any(a.startswith("--gtest_filter") for a in t["command"])})
 
+    @staticmethod
+    def _output(*command):
+        return subprocess.run(command, check=True, stdout=subprocess.PIPE, text=True).stdout
+
 
 class Worker:
-    """A folder with a copy of the module, where mutants are built and tested one after the other."""
+    """A folder with a copy of the module, where mutants are built and tested one by one."""
 
     def __init__(self, build, folder):
         self.build = build
@@ -87,8 +89,9 @@ class Worker:
         prelude = folder / "prelude.h"
         self.compile = head + ["-include", prelude, "-o", folder / "module.o", "-c",
                                self.source / os.path.basename(MODULE)]
-        self.link = build.link.replace("--coverage", "").replace(build.object, str(folder / "module.o")).replace(
-            f"-o {LIBRARY}", f"-o {folder / os.path.basename(LIBRARY)}")
+        self.link = build.link.replace("--coverage", "")
+        for path, own in [(build.object, "module.o"), (LIBRARY, os.path.basename(LIBRARY))]:
+            self.link = self.link.replace(f" {path}", f" {folder / own}")
         self._precompile(head, prelude)
 
     def _precompile(self, head, prelude):
@@ -114,7 +117,7 @@ class Worker:
                 passed, output = self.test(program, pattern, limits[program])
                 if not passed:
                     failed = re.search(rb"\[  FAILED  \] ([\w./]+)", output)
-                    return "caught", failed.group(1).decode() if failed else f"the end of {pattern}"
+                    return "caught", failed.group(1).decode() if failed else "a program's end"
             return "survived", ""
         finally:
             self.restore(mutant.file)
@@ -147,20 +150,21 @@ def time_limits(worker):
         start = time.monotonic()
         passed, output = worker.test(program, "*", 1200)
         if not passed:
-            sys.exit(f"mutate: {program} fails without any mutant:\n{output.decode(errors='replace')}")
+            sys.exit(f"mutate: {program} fails without any mutant:\n{output.decode()}")
         took[program] = time.monotonic() - start
     worker.build.programs.sort(key=took.get)
     return {program: 30 + 5 * seconds for program, seconds in took.items()}
 
 
 def read_equivalent():
-    """Names of mutants that nobody can tell from the module. The file has a reason above each group."""
+    """Names of mutants that nobody can tell from the module; the reasons stand above them."""
     lines = EQUIVALENT.read_text().splitlines()
     return {line for line in lines if line and not line.startswith("#")}
 
 
 def sample(found, most):
-    """As many of each function and kind, spread over it, so that all together are no more than most."""
+    """As many of each function and kind, spread over it, as together are no more than most, but
+    one at least."""
     groups = collections.defaultdict(list)
     for mutant in found:
         groups[mutant.function, mutant.kind].append(mutant)
@@ -242,15 +246,16 @@ def main():
                 wrong.append(f"survived: {name}")
                 print(wrong[-1], flush=True)
             if n % 25 == 0:
-                print(f"{n} of {len(chosen)}, {(time.monotonic() - start) / 60:.1f} minutes", flush=True)
+                minutes = (time.monotonic() - start) / 60
+                print(f"{n} of {len(chosen)}, {minutes:.1f} minutes", flush=True)
 
     print_table(counts)
     for line in wrong:
         print(line)
     total = sum(counts.values(), collections.Counter())
-    print(f"mutate: {total['caught']} of {len(chosen)} mutants caught, {total['survived']} survived, "
-          f"{total['equivalent']} equivalent, {total['not compiled']} did not compile; all of them: "
-          f"{folder / 'results.txt'}")
+    print(f"mutate: {total['caught']} of {len(chosen)} mutants caught, "
+          f"{total['survived']} survived, {total['equivalent']} equivalent, "
+          f"{total['not compiled']} did not compile; all of them: {folder / 'results.txt'}")
     sys.exit(1 if wrong else 0)
 
 
