@@ -283,7 +283,8 @@ def _(part):
 @rule("order")
 def _(part):
     """Neighbours swapped, but not two that only fill fields or outputs, whose order nobody sees."""
-    fills = re.compile(rf"{SETTER}|{ASSIGNMENT}|copy_result(_msg)?\(|delete ", re.S)
+    fills = re.compile(rf"{SETTER}|{ASSIGNMENT}|\w+\* \w+ = \w+\.add_|copy_result(_msg)?\(|delete ",
+                       re.S)
 
     def is_quiet(text):
         inside = re.sub(r"(if|else|for)\b[^{]*\{|\}", "", text)
