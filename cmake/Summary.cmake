@@ -4,4 +4,6 @@ message(STATUS "  compiler           ${CMAKE_CXX_COMPILER_ID} ${CMAKE_CXX_COMPIL
 message(STATUS "  Protocol Buffers   ${QEL_PROTOBUF_VERSION} (${QEL_PROTOBUF_LIBRARY})")
 message(STATUS "  schema compiler    ${QEL_PROTOC_COMMAND}")
 message(STATUS "  log service        ${QEL_DLOG_USED}")
-message(STATUS "  sanitizers         ${QEL_SANITIZE}")
+if(QEL_SANITIZE)
+  message(STATUS "  sanitizers         ${QEL_SANITIZE}")
+endif()

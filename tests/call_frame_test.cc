@@ -24,7 +24,7 @@ using support::kSerializers;
 using support::Line;
 using support::logged_calls;
 using support::Serializer;
-using support::wrong_calls_of_two_threads;
+using support::wrong_calls_of_threads;
 
 int log_thread(size_t call) {
   return std::get<int>(logged_calls().at(call).arguments.at(3));
@@ -125,7 +125,9 @@ TEST_P(EverySerializer, WhenTwoThreadsCallIt_EncodesEachOnesArguments) {
   };
   const int64_t ids[] = {1, INT64_MAX};
   const std::string expected[] = {encode(ids[0]), encode(ids[1])};
-  EXPECT_EQ(wrong_calls_of_two_threads([&](size_t i) { return encode(ids[i]) == expected[i]; }), 0);
+  EXPECT_EQ(wrong_calls_of_threads(
+                2, 5000, [&](size_t i, int /*call*/) { return encode(ids[i]) == expected[i]; }),
+            0);
 }
 
 INSTANTIATE_TEST_SUITE_P(CallFrame, EverySerializer, ::testing::ValuesIn(kSerializers),
@@ -526,7 +528,8 @@ TEST_P(EveryDeserializer, WhenTwoThreadsCallIt_ReadsEachOnesMessage) {
   // One reads a whole message, the other one that is cut; neither sees the other's.
   const std::string messages[] = {function_.whole, function_.whole.substr(0, 1)};
   EXPECT_EQ(
-      wrong_calls_of_two_threads([&](size_t i) { return leaves_outputs(messages[i]) == (i == 1); }),
+      wrong_calls_of_threads(
+          2, 5000, [&](size_t i, int /*call*/) { return leaves_outputs(messages[i]) == (i == 1); }),
       0);
 }
 

@@ -210,12 +210,12 @@ TEST_F(IsTypingRequestSerialize, WhenTwoThreadsCallIt_EncodesEachOnesArguments) 
   const std::string expected[] = {hex("58 01 60 02 6a 02 6f 6e 70 01 78 ac 02"),
                                   hex("58 ff ff ff ff ff ff ff ff 7f 60 02 6a 02 6f 6e 70 01 "
                                       "78 ac 02")};
-  const auto encodes_its_own = [&](size_t i) {
+  const auto encodes_its_own = [&](size_t i, int /*call*/) {
     Encoded out;
     is_typing_request_serialize(ids[i], 2, "on", &type_, &refresh_, &out.data.block, &out.size);
     return out.bytes() == expected[i];
   };
-  EXPECT_EQ(support::wrong_calls_of_two_threads(encodes_its_own), 0);
+  EXPECT_EQ(support::wrong_calls_of_threads(2, 5000, encodes_its_own), 0);
 }
 
 // ---- typing_updated_deserialize

@@ -4,6 +4,7 @@
 #include <sys/syscall.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <cstdarg>
 #include <cstdio>
 #include <fstream>
@@ -19,6 +20,7 @@ namespace {
 std::mutex mutex;
 std::vector<LogCall> calls;
 thread_local std::function<void(const LogCall&)> observer;
+thread_local ThreadLog* thread_log = nullptr;
 
 std::vector<LogArgument> read_arguments(const std::string& format, va_list list) {
   std::vector<LogArgument> arguments;
@@ -157,6 +159,13 @@ void clear_log() {
   calls.clear();
 }
 
+ThreadLog::ThreadLog() {
+  thread_log = this;
+}
+ThreadLog::~ThreadLog() {
+  thread_log = nullptr;
+}
+
 LogObserver::LogObserver(std::function<void(const LogCall&)> observe) {
   observer = std::move(observe);
 }
@@ -166,6 +175,18 @@ LogObserver::~LogObserver() {
 
 void print_format(const LogCall& call) {
   std::fprintf(stderr, "%s\n", call.format.c_str());
+}
+
+bool is_line(const LogCall& call, const std::string& function, const Line& line) {
+  if (call.log_id != 0 || call.priority != line.priority || call.tag != "MESSAGE_PLUGIN" ||
+      call.format != whole_format(line) || call.arguments.size() != 4 + line.arguments.size()) {
+    return false;
+  }
+  const auto& arguments = call.arguments;
+  return arguments[0] == LogArgument("qel-message-serialize.cc") &&
+         arguments[1] == LogArgument(function) && std::holds_alternative<int>(arguments[2]) &&
+         arguments[3] == LogArgument(static_cast<int>(syscall(SYS_gettid))) &&
+         std::equal(line.arguments.begin(), line.arguments.end(), arguments.begin() + 4);
 }
 
 void expect_log(const std::string& function, const std::vector<Line>& lines) {
@@ -224,6 +245,10 @@ extern "C" int __dlog_print(int log_id, int priority, const char* tag, const cha
   va_end(list);
   if (support::observer) {
     support::observer(call);
+  }
+  if (support::thread_log != nullptr) {
+    support::thread_log->add(std::move(call));
+    return 0;
   }
   const std::lock_guard<std::mutex> lock(support::mutex);
   support::calls.push_back(std::move(call));

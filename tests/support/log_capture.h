@@ -43,6 +43,22 @@ std::string whole_format(const Line& line);
 std::vector<LogCall> logged_calls();
 void clear_log();
 
+// While it lives, this thread's lines come here instead of into the list of all, and without a
+// lock, which would put the threads that log into an order and hide their races. One at a time.
+class ThreadLog {
+ public:
+  ThreadLog();
+  ~ThreadLog();
+  ThreadLog(const ThreadLog&) = delete;
+  ThreadLog& operator=(const ThreadLog&) = delete;
+
+  void add(LogCall call) { calls_.push_back(std::move(call)); }
+  const std::vector<LogCall>& calls() const { return calls_; }
+
+ private:
+  std::vector<LogCall> calls_;
+};
+
 // While it lives, is shown each line that this thread logs, at that moment. One at a time.
 class LogObserver {
  public:
@@ -54,6 +70,9 @@ class LogObserver {
 
 // An observer that prints to stderr, so that a death test sees what was logged before the end.
 void print_format(const LogCall& call);
+
+// Whether this is that line of the function, logged by the calling thread; its number may be any.
+bool is_line(const LogCall& call, const std::string& function, const Line& line);
 
 // The log holds exactly these lines: each in the frame of its priority, naming the module, the
 // function, the line of the statement that logs it or of the shared step that does, and the calling
