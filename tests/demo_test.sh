@@ -31,6 +31,8 @@ case $1 in
   access_token_is_not_shown)
     run || fail 'the demo failed'
     ! grep -q 'example-access-token' "$scratch/out" "$scratch/err" || fail 'the access token shows'
+    ! run --access-token refused-access-token || fail 'a wrong token is no failure'
+    ! grep -q 'access-token' "$scratch/out" "$scratch/err" || fail 'a refused access token shows'
     ;;
   log_is_shown)
     run || fail 'the demo failed'
