@@ -28,24 +28,34 @@ Own own_values(size_t thread, int number) {
           name + std::string(thread * 7, '.')};
 }
 
-// Which function a thread's call of that number is about. In the first round all threads begin with
-// the same, later each with another.
-const FunctionCall& function_call(size_t thread, int number) {
-  const auto& calls = support::function_calls();
-  const size_t round = static_cast<size_t>(number) / calls.size();
-  return calls[(static_cast<size_t>(number) + round * thread * 5) % calls.size()];
+bool gets_its_own_results(const FunctionCall& function, const Own& own) {
+  const support::ThreadLog log;
+  const Values got = function.call(own);
+  const Values expected = function.expected(own);
+  EXPECT_EQ(got, expected) << function.function << ", " << function.situation;
+  return got == expected;
 }
 
-int calls_each() {
-  return kRounds * static_cast<int>(support::function_calls().size());
+bool logs_its_own_lines(const FunctionCall& function, const Own& own) {
+  const support::ThreadLog log;
+  function.call(own);
+  const std::vector<Line> expected = function.lines(own);
+  const bool right = std::equal(log.calls().begin(), log.calls().end(), expected.begin(),
+                                expected.end(), [&](const LogCall& call, const Line& line) {
+                                  return support::is_line(call, function.function, line);
+                                });
+  EXPECT_TRUE(right) << function.function << ", " << function.situation;
+  return right;
 }
 
-bool is_log_of(const std::vector<LogCall>& logged, const std::string& function,
-               const std::vector<Line>& lines) {
-  return std::equal(logged.begin(), logged.end(), lines.begin(), lines.end(),
-                    [&](const LogCall& call, const Line& line) {
-                      return support::is_line(call, function, line);
-                    });
+// Eight threads call each function often, each beginning with another one.
+int wrong_calls_of_all(bool (*is_right)(const FunctionCall&, const Own&)) {
+  const auto& functions = support::function_calls();
+  const int calls = kRounds * static_cast<int>(functions.size());
+  return support::wrong_calls_of_threads(kThreads, calls, [&](size_t thread, int number) {
+    const size_t place = static_cast<size_t>(number) + thread * 9;
+    return is_right(functions[place % functions.size()], own_values(thread, number));
+  });
 }
 
 TEST(Threads, HaveCallsOfAllFunctions) {
@@ -56,35 +66,23 @@ TEST(Threads, HaveCallsOfAllFunctions) {
   EXPECT_EQ(functions.size(), 34u);
 }
 
+TEST(Threads, WhenEightCallOneFunction_EachGetsItsOwnResults) {
+  for (const FunctionCall& function : support::function_calls()) {
+    EXPECT_EQ(support::wrong_calls_of_threads(kThreads, 2 * kRounds,
+                                              [&](size_t thread, int number) {
+                                                return gets_its_own_results(
+                                                    function, own_values(thread, number));
+                                              }),
+              0);
+  }
+}
+
 TEST(Threads, WhenEightCallEverything_EachGetsItsOwnResults) {
-  EXPECT_EQ(support::wrong_calls_of_threads(kThreads, calls_each(),
-                                            [](size_t thread, int number) {
-                                              const support::ThreadLog log;
-                                              const FunctionCall& function =
-                                                  function_call(thread, number);
-                                              const Own own = own_values(thread, number);
-                                              const Values got = function.call(own);
-                                              const Values expected = function.expected(own);
-                                              EXPECT_EQ(got, expected) << function.function << ", "
-                                                                       << function.situation;
-                                              return got == expected;
-                                            }),
-            0);
+  EXPECT_EQ(wrong_calls_of_all(gets_its_own_results), 0);
 }
 
 TEST(Threads, WhenEightCallEverything_EachLogsItsOwnLines) {
-  EXPECT_EQ(support::wrong_calls_of_threads(
-                kThreads, calls_each(),
-                [](size_t thread, int number) {
-                  const support::ThreadLog log;
-                  const FunctionCall& function = function_call(thread, number);
-                  const Own own = own_values(thread, number);
-                  function.call(own);
-                  const bool right = is_log_of(log.calls(), function.function, function.lines(own));
-                  EXPECT_TRUE(right) << function.function << ", " << function.situation;
-                  return right;
-                }),
-            0);
+  EXPECT_EQ(wrong_calls_of_all(logs_its_own_lines), 0);
 }
 
 }  // namespace
