@@ -16,7 +16,6 @@ namespace {
 
 using support::FunctionCall;
 using support::LogCall;
-using support::Own;
 
 // Recognisable, even where a part is cut off.
 const char kPrivate[] = "private-4711";

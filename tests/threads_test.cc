@@ -22,7 +22,7 @@ constexpr size_t kThreads = 8;
 constexpr int kRounds = 40;
 
 // No two calls have the same, and no two threads texts of the same length.
-Own own_values(size_t thread, int number) {
+Own own_values(size_t thread, int64_t number) {
   const std::string name = "call " + std::to_string(number) + " of " + std::to_string(thread);
   return {static_cast<int64_t>(thread) * 100'000'000'000 + number * 100,
           name + std::string(thread * 7, '.')};
