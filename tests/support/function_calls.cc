@@ -1,5 +1,7 @@
 #include "support/function_calls.h"
 
+#include <utility>
+
 #include "support/heap.h"
 #include "support/outputs.h"
 #include "support/wire.h"
@@ -804,7 +806,7 @@ void add_deserializers(std::vector<FunctionCall>& calls) {
        page_of_two,
        [](const Own& own) {
          const char* none = nullptr;
-         return values(own.id, none, TextOutput());
+         return values(own.id, 2, none, TextOutput());
        },
        [](const Own& /*own*/) -> std::vector<Line> {
          return {error("qel_message_inboxentry_t * allocation fail")};
@@ -817,9 +819,8 @@ void add_deserializers(std::vector<FunctionCall>& calls) {
           out.read(bytes);
         }
         const char* array = reinterpret_cast<const char*>(out.entries.array.block);
-        const bool counted = out.entries.count == 2;
-        out.entries.count = 0;  // nobody may walk the array
-        return counted ? values(out.request_id, array, out.next_key) : Values{};
+        const int count = std::exchange(out.entries.count, 0);  // there is no array to walk
+        return values(out.request_id, count, array, out.next_key);
       });
   add_whole_and_cut<ReadMessageReplyOutputs>(calls, {"read_message_reply_deserialize",
                                                      "all fields",
@@ -891,7 +892,7 @@ void add_deserializers(std::vector<FunctionCall>& calls) {
 
 // ---- Serializers that refuse an argument
 
-void add_refused(std::vector<FunctionCall>& calls) {
+void add_refusing_serializers(std::vector<FunctionCall>& calls) {
   add_refused(
       calls, "create_chatroom_request_serialize", "no receivers",
       [](const Own& own, Encoded* out) {
@@ -986,7 +987,7 @@ std::vector<FunctionCall> all_calls() {
   for (const SerializerRow& row : kSerializerRows) {
     add(calls, row);
   }
-  add_refused(calls);
+  add_refusing_serializers(calls);
   add_deserializers(calls);
   return calls;
 }
