@@ -19,7 +19,8 @@ using support::Own;
 using support::Values;
 
 constexpr size_t kThreads = 8;
-constexpr int kRounds = 40;
+constexpr int kCallsOfOneFunction = 80;
+constexpr int kRounds = 20;
 
 // No two calls have the same, and no two threads texts of the same length.
 Own own_values(size_t thread, int64_t number) {
@@ -68,7 +69,7 @@ TEST(Threads, HaveCallsOfAllFunctions) {
 
 TEST(Threads, WhenEightCallOneFunction_EachGetsItsOwnResults) {
   for (const FunctionCall& function : support::function_calls()) {
-    EXPECT_EQ(support::wrong_calls_of_threads(kThreads, 2 * kRounds,
+    EXPECT_EQ(support::wrong_calls_of_threads(kThreads, kCallsOfOneFunction,
                                               [&](size_t thread, int number) {
                                                 return gets_its_own_results(
                                                     function, own_values(thread, number));
