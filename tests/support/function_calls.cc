@@ -2,6 +2,7 @@
 
 #include <utility>
 
+#include "support/exchange.h"
 #include "support/heap.h"
 #include "support/outputs.h"
 #include "support/wire.h"
