@@ -28,6 +28,12 @@ if(QEL_SANITIZE)
   endif()
 endif()
 
+# Fuzzing is guided by the paths that an input takes through our code and the generated one.
+option(QEL_FUZZ "Build the fuzz targets (clang, with QEL_SANITIZE)" OFF)
+if(QEL_FUZZ)
+  add_compile_options(-fsanitize=fuzzer-no-link)
+endif()
+
 # Aborts name files as they lie in the tree, wherever the build folder is: generated ones as if
 # beside their sources. The last map that fits wins.
 add_compile_options(

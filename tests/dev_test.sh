@@ -112,6 +112,12 @@ case $1 in
     grep -q '^usage: ./dev COMMAND' "$scratch/out" || refuse 'no usage'
     [ ! -e "$scratch/checkout/.deps" ] || refuse 'left something behind'
     ;;
+  unknown_fuzz_target)
+    status=0
+    "$scratch/checkout/dev" fuzz frobnicate >"$scratch/out" 2>&1 || status=$?
+    [ "$status" -eq 2 ] || refuse "exit status $status"
+    grep -q '^usage: ./dev COMMAND' "$scratch/out" || refuse 'no usage'
+    ;;
   *)
     refuse "no such case: $1"
     ;;

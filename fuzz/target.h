@@ -1,0 +1,24 @@
+// What a fuzz target is: a property of the library that has to hold for any bytes.
+#ifndef FUZZ_TARGET_H
+#define FUZZ_TARGET_H
+
+#include <string>
+#include <vector>
+
+namespace fuzz {
+
+struct Target {
+  std::string name;
+  void (*check)(const std::string& bytes);
+};
+
+const std::vector<Target>& deserializer_targets();  // each named after its function
+void check_serializers(const std::string& bytes);
+void check_round_trip(const std::string& bytes);
+
+// Ends the program, as a finding of libFuzzer's.
+[[noreturn]] void fail(const std::string& finding);
+
+}  // namespace fuzz
+
+#endif
