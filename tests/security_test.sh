@@ -42,6 +42,9 @@ case $1 in
     quoted '[a-z_]+_(de)?serialize' |
       all_in <(sed -nE 's/^(int|void) ([a-z_]+)\(.*/\2/p' "$source/proto-lib/qel-message-serialize.h")
     ;;
+  named_commands_exist)
+    quoted '\./dev [a-z]+' | cut -d ' ' -f 2 | all_in <(sed -nE 's/^  ([a-z]+)( .*)?$/\1/p' "$source/dev")
+    ;;
   *)
     echo "no such case: $1" >&2
     exit 1
