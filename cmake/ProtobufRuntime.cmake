@@ -1,26 +1,34 @@
 # Protocol Buffers, 2.6 series: the target protobuf26 (headers and shared library) and the compiler
 # of the schema, QEL_PROTOC. ./dev setup builds one in .deps; an existing installation, a device
-# SDK's for example, is used where QEL_PROTOBUF_ROOT names it. When cross-compiling QEL_PROTOC names
-# a compiler that runs on this machine.
+# SDK's for example, is used where QEL_PROTOBUF_ROOT names it. When cross-compiling, the target's
+# runtime is the one of ./dev arm, and its compiler the one of this machine.
 
-set(QEL_PROTOBUF_ROOT "" CACHE PATH "Installation of Protocol Buffers 2.6 (empty: the one of ./dev setup)")
-set(QEL_PROTOC "" CACHE FILEPATH "Compiler of the schema (empty: the installation's)")
+set(QEL_PROTOBUF_ROOT "" CACHE PATH "Installation of Protocol Buffers 2.6 (empty: the one of ./dev)")
+set(QEL_PROTOC "" CACHE FILEPATH "Compiler of the schema (empty: the installation's, or the one of ./dev when cross-compiling)")
 
-set(QEL_PROTOBUF_PREFIX "${QEL_PROTOBUF_ROOT}")
-if(NOT QEL_PROTOBUF_PREFIX)
-  set(QEL_PROTOBUF_PREFIX "${PROJECT_SOURCE_DIR}/.deps/protobuf-2.6.1")
+set(_build_command "./dev setup")
+set(QEL_PROTOBUF_PREFIX "${PROJECT_SOURCE_DIR}/.deps/protobuf-2.6.1")
+set(_protoc "${QEL_PROTOBUF_PREFIX}/bin/protoc")
+if(CMAKE_CROSSCOMPILING)
+  set(_build_command "./dev arm")
+  string(APPEND QEL_PROTOBUF_PREFIX "-${CMAKE_LIBRARY_ARCHITECTURE}")
 endif()
-set(_protoc "${QEL_PROTOC}")
-if(NOT _protoc)
-  set(_protoc "${QEL_PROTOBUF_PREFIX}/bin/protoc")
+if(QEL_PROTOBUF_ROOT)
+  set(QEL_PROTOBUF_PREFIX "${QEL_PROTOBUF_ROOT}")
+  if(NOT CMAKE_CROSSCOMPILING)
+    set(_protoc "${QEL_PROTOBUF_PREFIX}/bin/protoc")
+  endif()
+endif()
+if(QEL_PROTOC)
+  set(_protoc "${QEL_PROTOC}")
 endif()
 
 set(_version_header "${QEL_PROTOBUF_PREFIX}/include/google/protobuf/stubs/common.h")
 if(NOT EXISTS "${_version_header}")
   if(QEL_PROTOBUF_ROOT)
-    set(_advice "let QEL_PROTOBUF_ROOT name an installation's folder, or leave it out and run './dev setup'")
+    set(_advice "let QEL_PROTOBUF_ROOT name an installation's folder, or leave it out and run '${_build_command}'")
   else()
-    set(_advice "run './dev setup', or let QEL_PROTOBUF_ROOT name an installation")
+    set(_advice "run '${_build_command}', or let QEL_PROTOBUF_ROOT name an installation")
   endif()
   message(FATAL_ERROR "No Protocol Buffers in ${QEL_PROTOBUF_PREFIX}: ${_advice}.")
 endif()

@@ -1,19 +1,21 @@
 #!/usr/bin/env bash
 # Lets the example's plug-in talk to its front end. Exits with 0 only if both ends are content.
 #
-#   run_demo.sh FOLDER [--no-log] [--port PORT] [--access-token TEXT]
+#   run_demo.sh FOLDER [--no-log] [--port PORT] [--access-token TEXT] [--emulator COMMAND]
 #
-# FOLDER holds the two programs. --no-log silences the library's log lines.
+# FOLDER holds the two programs. --no-log silences the library's log lines. COMMAND, an emulator, runs
+# the programs.
 set -u
 
 usage() {
-  echo 'usage: run_demo.sh FOLDER [--no-log] [--port PORT] [--access-token TEXT]' >&2
+  echo 'usage: run_demo.sh FOLDER [--no-log] [--port PORT] [--access-token TEXT] [--emulator COMMAND]' >&2
   exit 2
 }
 
 [ $# -ge 1 ] || usage
 programs=$1
 shift
+emulator=()
 front_end_options=()
 plugin_options=()
 while [ $# -gt 0 ]; do
@@ -21,6 +23,7 @@ while [ $# -gt 0 ]; do
     --no-log) export DLOG_STANDIN_PRIORITY=S && shift ;;
     --port) front_end_options+=("$1" "${2?--port takes a number}") && shift 2 ;;
     --access-token) plugin_options+=("$1" "${2?--access-token takes a text}") && shift 2 ;;
+    --emulator) emulator=("${2?--emulator takes a command}") && shift 2 ;;
     *) usage ;;
   esac
 done
@@ -33,7 +36,7 @@ cleanup() {
 }
 trap cleanup EXIT
 
-"$programs/front_end" "${front_end_options[@]}" --port-file "$scratch/port" &
+"${emulator[@]}" "$programs/front_end" "${front_end_options[@]}" --port-file "$scratch/port" &
 front_end=$!
 while [ ! -e "$scratch/port" ]; do
   if ! kill -0 "$front_end" 2>/dev/null; then
@@ -43,7 +46,7 @@ while [ ! -e "$scratch/port" ]; do
   sleep 0.05
 done
 
-"$programs/plugin_session" "$(cat "$scratch/port")" "${plugin_options[@]}"
+"${emulator[@]}" "$programs/plugin_session" "$(cat "$scratch/port")" "${plugin_options[@]}"
 plugin_status=$?
 wait "$front_end"
 front_end_status=$?

@@ -1,9 +1,11 @@
 #!/usr/bin/env bash
-# demo_test.sh CASE EXAMPLES: the demo as a user runs it, from the folder of its programs.
+# demo_test.sh CASE EXAMPLES [EMULATOR]: the demo as a user runs it, from the folder of its programs,
+# which run in the emulator.
 set -euo pipefail
 unset DLOG_STANDIN_PRIORITY
 demo=$(dirname "${BASH_SOURCE[0]}")/../examples/run_demo.sh
 examples=$2
+emulator=${3:-}
 scratch=$(mktemp -d)
 trap 'rm -rf "$scratch"' EXIT
 
@@ -13,7 +15,7 @@ fail() {
   exit 1
 }
 
-run() { "$demo" "$examples" "$@" >"$scratch/out" 2>"$scratch/err"; }
+run() { "$demo" "$examples" ${emulator:+--emulator "$emulator"} "$@" >"$scratch/out" 2>"$scratch/err"; }
 
 case $1 in
   whole_session)
@@ -70,7 +72,7 @@ case $1 in
     grep -qx 'demo: failed (plug-in 1, front end 1)' "$scratch/err" || fail 'other exit statuses'
     ;;
   taken_port)
-    "$examples/front_end" --port-file "$scratch/port" >"$scratch/first" &
+    ${emulator:+"$emulator"} "$examples/front_end" --port-file "$scratch/port" >"$scratch/first" &
     for _ in $(seq 200); do [ -e "$scratch/port" ] || sleep 0.05; done
     status=0
     run --port "$(cat "$scratch/port")" || status=$?

@@ -14,11 +14,11 @@ replace() {
   chmod +x "$scratch/bin/$1"
 }
 
-# run FOLDER [VARIABLE=VALUE...]: './dev setup' must fail; its last line goes to $last.
+# run FOLDER [VARIABLE=VALUE...]: './dev setup', or $dev_command, must fail; its last line goes to $last.
 run() {
   local folder=$1 status=0
   shift
-  env PATH="$scratch/bin:$PATH" QEL_PROTOBUF_ROOT= "$@" "$folder/dev" setup >"$scratch/out" 2>&1 ||
+  env PATH="$scratch/bin:$PATH" QEL_PROTOBUF_ROOT= "$@" "$folder/dev" "${dev_command:-setup}" >"$scratch/out" 2>&1 ||
     status=$?
   last=$(tail -n 1 "$scratch/out")
   [ "$status" -eq 1 ] || refuse "exit status $status"
@@ -35,6 +35,13 @@ refuse() {
 expect() { [[ $last == $1 ]] || refuse "expected as the last line: $1"; }
 
 all_installed() { replace dpkg-query 'echo installed'; }
+
+# An archive that passes for the right one and cannot be unpacked.
+broken_archive() {
+  mkdir "$scratch/checkout/.deps"
+  echo broken >"$scratch/checkout/.deps/$archive"
+  replace sha256sum "echo 'dbbd7bdd2381633995404de65a945ff1a7610b0da14593051b4738c90c6dd164  $archive'"
+}
 
 case $1 in
   no_mirror_for_packages)
@@ -81,12 +88,19 @@ case $1 in
     ;;
   broken_build_of_the_runtime)
     all_installed
-    mkdir "$scratch/checkout/.deps"
-    echo broken >"$scratch/checkout/.deps/$archive"
-    replace sha256sum "echo 'dbbd7bdd2381633995404de65a945ff1a7610b0da14593051b4738c90c6dd164  $archive'"
+    broken_archive
     run "$scratch/checkout"
-    expect 'dev: build Protocol Buffers 2.6.1 *: failed; the log says why; call ./dev again *'
+    expect 'dev: build Protocol Buffers 2.6.1 (*: failed; the log says why; call ./dev again *'
     [ ! -e "$scratch/checkout/.deps/protobuf-2.6.1/complete" ] || refuse 'the half-done build counts as done'
+    ;;
+  broken_build_of_the_runtime_for_arm)
+    all_installed
+    broken_archive
+    dev_command=arm
+    run "$scratch/checkout" QEL_PROTOBUF_ROOT=/opt
+    expect 'dev: build Protocol Buffers 2.6.1 for arm-linux-gnueabihf (*: failed; the log says why; call ./dev again *'
+    [ ! -e "$scratch/checkout/.deps/protobuf-2.6.1-arm-linux-gnueabihf/complete" ] ||
+      refuse 'the half-done build counts as done'
     ;;
   finished_runtime_is_used_again)
     all_installed

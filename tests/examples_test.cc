@@ -31,6 +31,9 @@ const char kTimeout[] = "3";
 class Program {
  public:
   explicit Program(std::vector<std::string> command) {
+    if (*QEL_EMULATOR != '\0') {
+      command.insert(command.begin(), QEL_EMULATOR);
+    }
     int ends[2];
     EXPECT_EQ(pipe2(ends, O_CLOEXEC), 0);
     errors_ = ends[0];

@@ -1,11 +1,13 @@
 #!/usr/bin/env bash
-# readme_test.sh SOURCE BUILD CC [FLAG...]: the first program in the README compiles as printed, with
-# the command as printed, without a warning, and prints what the README says.
+# readme_test.sh SOURCE BUILD EMULATOR CC [FLAG...]: the first program in the README compiles as
+# printed, with the command as printed, without a warning, and prints what the README says. EMULATOR
+# may be empty.
 set -euo pipefail
 source=$1
 build=$2
-compiler=$3
-flags=("${@:4}")
+emulator=$3
+compiler=$4
+flags=("${@:5}")
 scratch=$(mktemp -d)
 trap 'rm -rf "$scratch"' EXIT
 
@@ -25,5 +27,5 @@ cc() { "$compiler" "${flags[@]}" -std=c99 -pedantic -Wall -Wextra -Werror "$@"; 
 cd "$scratch"
 # shellcheck disable=SC1091
 . "$scratch/command"
-DLOG_STANDIN_PRIORITY=S ./first >printed
+DLOG_STANDIN_PRIORITY=S ${emulator:+"$emulator"} ./first >printed
 diff expected printed

@@ -1,0 +1,34 @@
+# What the tests need of the machine that they run on.
+
+# GoogleTest. Debian has its library for this machine alone, and its source.
+if(CMAKE_CROSSCOMPILING)
+  set(QEL_GOOGLETEST_SOURCE /usr/src/googletest CACHE PATH
+    "Source of GoogleTest, to be built for the target")
+  add_subdirectory("${QEL_GOOGLETEST_SOURCE}/googletest" googletest EXCLUDE_FROM_ALL SYSTEM)
+  target_compile_options(gtest PRIVATE -O0) # run less than it is built
+else()
+  find_package(GTest REQUIRED)
+endif()
+
+# In the emulator the two threads' calls take a minute, if what counts them is not optimised.
+if(CMAKE_CROSSCOMPILING)
+  set_source_files_properties(support/heap.cc support/log_capture.cc PROPERTIES COMPILE_OPTIONS -O2)
+endif()
+
+# For tests that start programs themselves: what to put in front. Empty where programs run as they
+# are. ctest does that by itself.
+set(emulator "")
+if(CMAKE_CROSSCOMPILING_EMULATOR)
+  set(emulator "${CMAKE_CURRENT_BINARY_DIR}/emulate")
+  list(JOIN CMAKE_CROSSCOMPILING_EMULATOR "' '" words)
+  file(GENERATE OUTPUT "${emulator}" CONTENT "#!/bin/sh\nexec '${words}' \"$@\"\n"
+    FILE_PERMISSIONS OWNER_READ OWNER_WRITE OWNER_EXECUTE)
+endif()
+
+# What the tests that compile something themselves hand to the compiler, as the build does.
+foreach(language C CXX)
+  separate_arguments(${language}_flags UNIX_COMMAND "${CMAKE_${language}_FLAGS}")
+  if(CMAKE_SYSROOT)
+    list(APPEND ${language}_flags "--sysroot=${CMAKE_SYSROOT}")
+  endif()
+endforeach()
