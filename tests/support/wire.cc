@@ -114,7 +114,7 @@ std::string WireReader::text() {
   if (tag % 8 != 2) {
     throw std::invalid_argument("no text or message: tag " + std::to_string(tag));
   }
-  const uint64_t size = varint();
+  const auto size = static_cast<size_t>(varint());
   std::string value = bytes_.substr(next_, size);
   next_ += size;
   return value;
