@@ -23,7 +23,7 @@ block text >"$scratch/expected"
 block sh | sed -n '/^cc first.c/,/[^\\]$/p' >"$scratch/command"
 [ -s "$scratch/first.c" ] && [ -s "$scratch/expected" ] && [ -s "$scratch/command" ]
 
-cc() { "$compiler" "${flags[@]}" -std=c99 -pedantic -Wall -Wextra -Werror "$@"; }
+cc() { command "$compiler" "${flags[@]}" -std=c99 -pedantic -Wall -Wextra -Werror "$@"; }
 cd "$scratch"
 # shellcheck disable=SC1091
 . "$scratch/command"
