@@ -5,7 +5,7 @@ usage: mutate.py BUILD [--list | --all] [PATTERN]
 
 BUILD is a folder of the coverage preset, built. A mutant is compiled aside and linked to a library
 of its own, and the programs of BUILD take that one: neither the tree nor BUILD is touched. PATTERN
-is a regular expression for which the mutants' names are searched: those that have it are taken.
+is a regular expression for which the mutants' names are searched: all that have it are taken.
 """
 
 import argparse
@@ -212,7 +212,7 @@ def main():
     arguments.add_argument("--list", action="store_true")
     arguments.add_argument("--all", action="store_true")
     arguments.add_argument("pattern", nargs="?")
-    given = arguments.parse_args()
+    given = arguments.parse_intermixed_args()
 
     found = [mutant for file in SOURCES
              for mutant in mutants.mutants_of(file, (ROOT / "proto-lib" / file).read_text())]
@@ -224,6 +224,8 @@ def main():
         chosen = found if given.all or given.list else sample(
             [mutant for mutant in found if mutant.name not in equivalent], SAMPLE)
     chosen.sort(key=lambda mutant: zlib.crc32(mutant.name.encode()))  # of every function soon
+    if not chosen:
+        sys.exit(f"mutate: no mutant's name has '{given.pattern}'; see --list")
     if given.list:
         print("\n".join(mutant.name for mutant in chosen))
         return
