@@ -13,7 +13,8 @@ case $1 in
     ! grep -v '^typing_updated' <<<"$listed" >&2 || exit 1
     ;;
   pattern_that_no_mutant_has)
-    ! list 'no such mutant' 2>/dev/null
+    ! said=$(list 'no such mutant' 2>&1) || exit 1
+    grep -q "no mutant's name has 'no such mutant'" <<<"$said"
     ;;
   every_function_has_mutants)
     listed=$(list)
