@@ -9,6 +9,7 @@
 #include "msgspec_frontend.pb.h"
 #include "support/exchange.h"
 #include "support/outputs.h"
+#include "support/wire.h"
 
 namespace {
 
@@ -77,6 +78,19 @@ TEST_P(ReceivedInput, WhenOfEmptyElements_TakesLessMemoryPerByteThanCallersCount
 
 INSTANTIATE_TEST_SUITE_P(Security, ReceivedInput, ::testing::ValuesIn(kCostlyInputs),
                          [](const auto& row) { return row.param.name; });
+
+// ---- Log lines
+
+// The shortest user there is: an id below 128 in a packed list.
+TEST(LogLines, WhenUsersAreRefused_AreOneForEachByteOfThem) {
+  const std::string users(1000, '\1');
+  const support::Wire result =
+      support::Wire().number(1, 1000).message(3, support::Wire().text(1, users));
+  support::clear_log();
+  support::InviteReplyOutputs out;
+  out.read(support::Wire().message(13, result).bytes());
+  EXPECT_EQ(support::logged_calls().size(), users.size() + 3);  // entry, exit and their number
+}
 
 // ---- Parts of the runtime
 
