@@ -119,6 +119,26 @@ case $1 in
     PATH="$scratch/bin:$PATH" QEL_PROTOBUF_ROOT=/opt "$scratch/checkout/dev" setup >"$scratch/out" 2>&1 ||
       refuse 'did something all the same'
     ;;
+  configured_by_hand_is_configured_anew)
+    all_installed
+    replace ctest ''
+    # A cmake that says how it was called, and whose configuration never changes.
+    replace cmake 'echo "$*"; [ -e build/release/CMakeCache.txt ] || touch build/release/CMakeCache.txt'
+    configure() { # by './dev test'
+      PATH="$scratch/bin:$PATH" QEL_PROTOBUF_ROOT=/opt "$scratch/checkout/dev" test >"$scratch/out" 2>&1 ||
+        refuse 'it failed'
+      called=$(grep -- '^--preset release ' "$scratch/checkout/build/dev.log") || refuse 'it configured nothing'
+    }
+    configure
+    [[ $called != *--fresh* ]] || refuse 'what was not there was configured anew'
+    configure
+    [[ $called != *--fresh* ]] || refuse 'what had not changed was configured anew'
+    touch "$scratch/checkout/build/release/CMakeCache.txt"
+    configure
+    [[ $called == *--fresh* ]] || refuse 'what had been changed was kept'
+    configure
+    [[ $called != *--fresh* ]] || refuse 'what had not changed since was configured anew'
+    ;;
   unknown_command)
     status=0
     "$scratch/checkout/dev" frobnicate >"$scratch/out" 2>&1 || status=$?
