@@ -17,6 +17,10 @@ describe() {
 case $command in
   write) describe >"$baseline" ;;
   compare)
+    if [ ! -e "$baseline" ]; then
+      printf '%s\n' "There is no baseline $baseline: './dev abi' writes it." >&2
+      exit 1
+    fi
     scratch=$(mktemp -d)
     trap 'rm -rf "$scratch"' EXIT
     describe >"$scratch/now.abi"
