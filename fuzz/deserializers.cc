@@ -1,14 +1,15 @@
 // Any bytes into any deserializer: it succeeds exactly where the message's class takes all of them,
 // hands out what the class reads in them, and otherwise touches no output.
 
+#include "support/deserializers.h"
+
 #include <google/protobuf/io/coded_stream.h>
 
 #include <algorithm>
+#include <type_traits>
 
-#include "msgspec_frontend.pb.h"
 #include "observation.h"
 #include "support/agreement.h"
-#include "support/outputs.h"
 #include "target.h"
 
 namespace fuzz {
@@ -24,8 +25,21 @@ struct Frame {
   bool releases_stream = false;  // after a success
 };
 
-Frame entered_with(const std::string& text, const std::string& function) {
-  return {function, {{kWarn, function + text}}};
+Frame frame_of(const std::string& function) {
+  Frame frame = {function, {{kWarn, function + ": start"}}};
+  if (function == "channel_auth_reply_deserialize") {
+    frame.entry = {{kWarn, function + " start"}};
+    frame.has_exit = false;
+    frame.releases_stream = true;
+  } else if (function == "client_echo_deserialize") {
+    frame.entry = {{kWarn, function + " start"}};
+    frame.releases_stream = true;
+  } else if (function == "create_chatroom_reply_deserialize") {
+    frame.entry = {{kWarn, function + ": enter"}};
+  } else if (function == "forward_online_message_get_deserialize") {
+    frame.entry = {{kError, "check "}, {kWarn, function + ": start"}};
+  }
+  return frame;
 }
 
 // Fails unless these are the lines of a success: the entry first, the exit last, and neither an
@@ -105,98 +119,22 @@ struct OutputsWithoutRecord : support::ForwardOnlineMessageOutputs {
   }
 };
 
-void check_forward_online_message(const std::string& bytes) {
-  Frame frame = entered_with(": start", "forward_online_message_get_deserialize");
-  frame.entry.insert(frame.entry.begin(), {kError, "check "});
-  check<support::ForwardOnlineMessageOutputs, ForwardOnlineMessage>(frame, bytes);
-  check<OutputsWithoutRecord, ForwardOnlineMessage>(frame, bytes);
+template <typename Outputs, typename Message>
+Target target(const support::Deserializer<Outputs, Message>& deserializer) {
+  const Frame frame = frame_of(deserializer.name);
+  return {deserializer.name, [frame](const std::string& bytes) {
+            check<Outputs, Message>(frame, bytes);
+            if constexpr (std::is_same_v<Outputs, support::ForwardOnlineMessageOutputs>) {
+              check<OutputsWithoutRecord, Message>(frame, bytes);
+            }
+          }};
 }
 
 }  // namespace
 
-const std::vector<Target>& deserializer_targets() {
-  static const std::vector<Target> targets = {
-      {"channel_auth_reply_deserialize",
-       [](const std::string& bytes) {
-         Frame frame = entered_with(" start", "channel_auth_reply_deserialize");
-         frame.has_exit = false;
-         frame.releases_stream = true;
-         check<support::ChannelAuthReplyOutputs, ChannelAuthReply>(frame, bytes);
-       }},
-      {"client_echo_deserialize",
-       [](const std::string& bytes) {
-         Frame frame = entered_with(" start", "client_echo_deserialize");
-         frame.releases_stream = true;
-         check<support::ClientEchoOutputs, ClientEcho>(frame, bytes);
-       }},
-      {"create_chatroom_reply_deserialize",
-       [](const std::string& bytes) {
-         check<support::CreateChatroomReplyOutputs, CreateChatroomReply>(
-             entered_with(": enter", "create_chatroom_reply_deserialize"), bytes);
-       }},
-      {"chat_reply_deserialize",
-       [](const std::string& bytes) {
-         check<support::ChatReplyOutputs, ChatReply>(
-             entered_with(": start", "chat_reply_deserialize"), bytes);
-       }},
-      {"allow_chat_reply_deserialize",
-       [](const std::string& bytes) {
-         check<support::AllowChatReplyOutputs, AllowChatReply>(
-             entered_with(": start", "allow_chat_reply_deserialize"), bytes);
-       }},
-      {"get_all_unread_message_reply_deserialize",
-       [](const std::string& bytes) {
-         check<support::GetAllUnreadMessageReplyOutputs, GetAllUnreadMessageReply>(
-             entered_with(": start", "get_all_unread_message_reply_deserialize"), bytes);
-       }},
-      {"forward_online_message_get_deserialize", check_forward_online_message},
-      {"forward_unread_message_deserialize",
-       [](const std::string& bytes) {
-         check<support::ForwardUnreadMessageOutputs, ForwardUnreadMessage>(
-             entered_with(": start", "forward_unread_message_deserialize"), bytes);
-       }},
-      {"read_message_reply_deserialize",
-       [](const std::string& bytes) {
-         check<support::ReadMessageReplyOutputs, ReadMessageReply>(
-             entered_with(": start", "read_message_reply_deserialize"), bytes);
-       }},
-      {"end_chat_reply_deserialize",
-       [](const std::string& bytes) {
-         check<support::EndChatReplyOutputs, EndChatReply>(
-             entered_with(": start", "end_chat_reply_deserialize"), bytes);
-       }},
-      {"invite_reply_deserialize",
-       [](const std::string& bytes) {
-         check<support::InviteReplyOutputs, InviteReply>(
-             entered_with(": start", "invite_reply_deserialize"), bytes);
-       }},
-      {"current_time_deserialize",
-       [](const std::string& bytes) {
-         check<support::CurrentTimeOutputs, CurrentTimeReply>(
-             entered_with(": start", "current_time_deserialize"), bytes);
-       }},
-      {"unseal_message_reply_deserialize",
-       [](const std::string& bytes) {
-         check<support::UnsealMessageReplyOutputs, UnsealMessageReply>(
-             entered_with(": start", "unseal_message_reply_deserialize"), bytes);
-       }},
-      {"save_call_log_reply_deserialize",
-       [](const std::string& bytes) {
-         check<support::SaveCallLogReplyOutputs, SaveCallLogReply>(
-             entered_with(": start", "save_call_log_reply_deserialize"), bytes);
-       }},
-      {"typing_updated_deserialize",
-       [](const std::string& bytes) {
-         check<support::TypingUpdatedOutputs, TypingUpdated>(
-             entered_with(": start", "typing_updated_deserialize"), bytes);
-       }},
-      {"change_chatroom_meta_reply_deserialize",
-       [](const std::string& bytes) {
-         check<support::ChangeChatroomMetaReplyOutputs, ChangeChatroomMetaReply>(
-             entered_with(": start", "change_chatroom_meta_reply_deserialize"), bytes);
-       }},
-  };
-  return targets;
+std::vector<Target> deserializer_targets() {
+  return std::apply([](const auto&... each) { return std::vector<Target>{target(each)...}; },
+                    support::kDeserializers);
 }
 
 }  // namespace fuzz

@@ -2,6 +2,7 @@
 #ifndef FUZZ_TARGET_H
 #define FUZZ_TARGET_H
 
+#include <functional>
 #include <string>
 #include <vector>
 
@@ -9,10 +10,10 @@ namespace fuzz {
 
 struct Target {
   std::string name;
-  void (*check)(const std::string& bytes);
+  std::function<void(const std::string& bytes)> check;
 };
 
-const std::vector<Target>& deserializer_targets();  // each named after its function
+std::vector<Target> deserializer_targets();  // each named after its function
 void check_serializers(const std::string& bytes);
 void check_round_trip(const std::string& bytes);
 

@@ -3,6 +3,7 @@
 
 #include "support/agreement.h"
 
+#include "support/deserializers.h"
 #include "support/exchange.h"
 
 namespace {
@@ -55,12 +56,6 @@ void fill(Message* message) {
   }
 }
 
-template <typename OutputsType, typename MessageType>
-struct Deserializer {
-  using Outputs = OutputsType;
-  using Message = MessageType;
-};
-
 template <typename T>
 class Agreement : public support::ExchangeTest {
  protected:
@@ -68,23 +63,10 @@ class Agreement : public support::ExchangeTest {
   typename T::Message message_;
 };
 
-using Deserializers = ::testing::Types<
-    Deserializer<support::ChannelAuthReplyOutputs, ChannelAuthReply>,
-    Deserializer<support::ClientEchoOutputs, ClientEcho>,
-    Deserializer<support::CreateChatroomReplyOutputs, CreateChatroomReply>,
-    Deserializer<support::ChatReplyOutputs, ChatReply>,
-    Deserializer<support::AllowChatReplyOutputs, AllowChatReply>,
-    Deserializer<support::GetAllUnreadMessageReplyOutputs, GetAllUnreadMessageReply>,
-    Deserializer<support::ForwardOnlineMessageOutputs, ForwardOnlineMessage>,
-    Deserializer<support::ForwardUnreadMessageOutputs, ForwardUnreadMessage>,
-    Deserializer<support::ReadMessageReplyOutputs, ReadMessageReply>,
-    Deserializer<support::EndChatReplyOutputs, EndChatReply>,
-    Deserializer<support::InviteReplyOutputs, InviteReply>,
-    Deserializer<support::CurrentTimeOutputs, CurrentTimeReply>,
-    Deserializer<support::UnsealMessageReplyOutputs, UnsealMessageReply>,
-    Deserializer<support::SaveCallLogReplyOutputs, SaveCallLogReply>,
-    Deserializer<support::TypingUpdatedOutputs, TypingUpdated>,
-    Deserializer<support::ChangeChatroomMetaReplyOutputs, ChangeChatroomMetaReply>>;
+template <typename... Each>
+::testing::Types<Each...> types_of(const std::tuple<Each...>& each);
+
+using Deserializers = decltype(types_of(support::kDeserializers));
 TYPED_TEST_SUITE(Agreement, Deserializers);
 
 TYPED_TEST(Agreement, WhenEveryFieldIsThere_NothingDiffers) {

@@ -10,8 +10,8 @@
 
 #include "msgspec_frontend.pb.h"
 #include "support/agreement.h"
+#include "support/deserializers.h"
 #include "support/exchange.h"
-#include "support/outputs.h"
 #include "support/peer.h"
 #include "support/samples.h"
 
@@ -23,48 +23,24 @@ using support::Filling;
 using support::PeerItem;
 using support::Sample;
 
-struct Deserializer {
-  const char* name;
+struct Function {
+  std::string name;
   const Descriptor* (*message)();
   std::string (*disagreement_after_reading)(const std::string& bytes, const Message& message);
 };
 
 template <typename Outputs, typename T>
-constexpr Deserializer deserializer(const char* name) {
-  return {name, &T::descriptor, [](const std::string& bytes, const Message& message) {
+Function function(const support::Deserializer<Outputs, T>& deserializer) {
+  return {deserializer.name, &T::descriptor, [](const std::string& bytes, const Message& message) {
             Outputs outputs;
             outputs.read(bytes);
             return disagreement(outputs, dynamic_cast<const T&>(message));
           }};
 }
 
-const Deserializer kDeserializers[] = {
-    deserializer<support::ChannelAuthReplyOutputs, ChannelAuthReply>(
-        "channel_auth_reply_deserialize"),
-    deserializer<support::ClientEchoOutputs, ClientEcho>("client_echo_deserialize"),
-    deserializer<support::CreateChatroomReplyOutputs, CreateChatroomReply>(
-        "create_chatroom_reply_deserialize"),
-    deserializer<support::ChatReplyOutputs, ChatReply>("chat_reply_deserialize"),
-    deserializer<support::AllowChatReplyOutputs, AllowChatReply>("allow_chat_reply_deserialize"),
-    deserializer<support::GetAllUnreadMessageReplyOutputs, GetAllUnreadMessageReply>(
-        "get_all_unread_message_reply_deserialize"),
-    deserializer<support::ForwardOnlineMessageOutputs, ForwardOnlineMessage>(
-        "forward_online_message_get_deserialize"),
-    deserializer<support::ForwardUnreadMessageOutputs, ForwardUnreadMessage>(
-        "forward_unread_message_deserialize"),
-    deserializer<support::ReadMessageReplyOutputs, ReadMessageReply>(
-        "read_message_reply_deserialize"),
-    deserializer<support::EndChatReplyOutputs, EndChatReply>("end_chat_reply_deserialize"),
-    deserializer<support::InviteReplyOutputs, InviteReply>("invite_reply_deserialize"),
-    deserializer<support::CurrentTimeOutputs, CurrentTimeReply>("current_time_deserialize"),
-    deserializer<support::UnsealMessageReplyOutputs, UnsealMessageReply>(
-        "unseal_message_reply_deserialize"),
-    deserializer<support::SaveCallLogReplyOutputs, SaveCallLogReply>(
-        "save_call_log_reply_deserialize"),
-    deserializer<support::TypingUpdatedOutputs, TypingUpdated>("typing_updated_deserialize"),
-    deserializer<support::ChangeChatroomMetaReplyOutputs, ChangeChatroomMetaReply>(
-        "change_chatroom_meta_reply_deserialize"),
-};
+const std::vector<Function> kFunctions =
+    std::apply([](const auto&... each) { return std::vector<Function>{function(each)...}; },
+               support::kDeserializers);
 
 // Those that open the lists of refused receivers, in one reply or in both, and two that do not.
 const int32_t kCodes[] = {0, 1000, 1001, 2000, 3003, 3009};
@@ -93,7 +69,7 @@ std::vector<Filling> later_and_coded_fillings() {
 }
 
 struct Case {
-  const Deserializer* function;
+  const Function* function;
   Sample sample;
   std::string peers_bytes;
 };
@@ -101,7 +77,7 @@ struct Case {
 std::vector<Case> make_cases(const std::string& peer_schema, const std::vector<Filling>& fillings) {
   std::vector<Case> cases;
   std::vector<PeerItem> texts;
-  for (const Deserializer& function : kDeserializers) {
+  for (const Function& function : kFunctions) {
     for (const Filling& filling : fillings) {
       cases.push_back({&function, support::make_sample(*function.message(), filling), ""});
       texts.push_back({cases.back().sample.type(), cases.back().sample.text});
@@ -138,7 +114,7 @@ TEST_P(EveryDeserializer, GivenThePeersBytes_WritesTheValuesThatThePeerWasGiven)
 INSTANTIATE_TEST_SUITE_P(Filled, EveryDeserializer, testing::Range(size_t{0}, every_case().size()),
                          [](const auto& place) {
                            const Case& that = every_case()[place.param];
-                           return that.function->name + ("_" + that.sample.filling);
+                           return that.function->name + "_" + that.sample.filling;
                          });
 
 }  // namespace
