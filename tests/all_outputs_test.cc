@@ -12,6 +12,7 @@
 #include "support/agreement.h"
 #include "support/deserializers.h"
 #include "support/exchange.h"
+#include "support/exported_functions.h"
 #include "support/peer.h"
 #include "support/samples.h"
 
@@ -99,6 +100,10 @@ const std::vector<Case>& every_case() {
     return all;
   }();
   return cases;
+}
+
+TEST(Functions, AreTheDeserializers) {
+  EXPECT_EQ(support::names_in(kFunctions, &Function::name), support::working_deserializers());
 }
 
 class EveryDeserializer : public support::ExchangeTest,

@@ -3,6 +3,7 @@
 // everything that it takes, and one for each refusal of its own.
 
 #include "support/call_account.h"
+#include "support/exported_functions.h"
 #include "support/outputs.h"
 #include "support/process_death.h"
 
@@ -891,6 +892,11 @@ const Account kAccounts[] = {
     {reading_chatroom_result("change_chatroom_meta_reply_deserialize"),
      observe_chatroom_result<support::ChangeChatroomMetaReplyOutputs>},
 };
+
+TEST(Accounts, AreThoseOfAllFunctions) {
+  const auto function = [](const Account& account) { return account.steps.function(); };
+  EXPECT_EQ(support::names_in(kAccounts, function), support::exported_functions());
+}
 
 class Faults : public support::ExchangeTest {
  protected:

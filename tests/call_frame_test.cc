@@ -9,6 +9,7 @@
 #include <thread>
 
 #include "support/exchange.h"
+#include "support/exported_functions.h"
 #include "support/heap.h"
 #include "support/outputs.h"
 #include "support/serializers.h"
@@ -128,6 +129,12 @@ TEST_P(EverySerializer, WhenTwoThreadsCallIt_EncodesEachOnesArguments) {
   EXPECT_EQ(wrong_calls_of_threads(
                 2, 5000, [&](size_t i, int /*call*/) { return encode(ids[i]) == expected[i]; }),
             0);
+}
+
+TEST(CallFrame, IsTestedOfEverySerializerThatHasAStatus) {
+  std::set<std::string> functions = support::working_serializers();
+  functions.erase("is_typing_request_serialize");
+  EXPECT_EQ(support::names_in(kSerializers, &Serializer::name), functions);
 }
 
 INSTANTIATE_TEST_SUITE_P(CallFrame, EverySerializer, ::testing::ValuesIn(kSerializers),
@@ -531,6 +538,11 @@ TEST_P(EveryDeserializer, WhenTwoThreadsCallIt_ReadsEachOnesMessage) {
       wrong_calls_of_threads(
           2, 5000, [&](size_t i, int /*call*/) { return leaves_outputs(messages[i]) == (i == 1); }),
       0);
+}
+
+TEST(CallFrame, IsTestedOfEveryDeserializer) {
+  EXPECT_EQ(support::names_in(kDeserializers, &Deserializer::name),
+            support::working_deserializers());
 }
 
 INSTANTIATE_TEST_SUITE_P(CallFrame, EveryDeserializer, ::testing::ValuesIn(kDeserializers),

@@ -1,6 +1,6 @@
 #!/usr/bin/env bash
-# interface_test.sh CASE SOURCE: the public header, the module, the docs and the README against the
-# list of the exported functions, which has them in the interface's order.
+# interface_test.sh CASE SOURCE: the public header, the module, the docs, the README and the fuzz
+# targets against the list of the exported functions, which has them in the interface's order.
 # shellcheck disable=SC2016 # backticks of Markdown
 set -euo pipefail
 source=$2
@@ -29,6 +29,11 @@ case $1 in
   readme_shows_each)
     diff <(sort "$list") \
       <(grep '^|' "$source/README.md" | grep -oE '`[a-z_]+serialize`' | tr -d '`' | sort) >&2
+    ;;
+  fuzz_targets_are_the_deserializers)
+    # Each target is named by its folder of seeds; two are for all functions and all messages.
+    diff <({ working | grep '_deserialize$' && printf '%s\n' round_trip serializers; } | sort) \
+      <(find "$source/fuzz/seeds" -mindepth 1 -maxdepth 1 -printf '%f\n' | sort) >&2
     ;;
   *)
     echo "no such case: $1" >&2
