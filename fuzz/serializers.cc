@@ -29,16 +29,13 @@ class Arguments {
   }
   bool flag() { return byte() % 2 == 1; }
   // Of any magnitude: a byte says how many bytes of it follow.
-  int64_t number() {
-    const int length = byte() % 9;
-    uint64_t value = 0;
-    for (int i = 0; i < length; ++i) {
-      value |= static_cast<uint64_t>(byte()) << (8 * i);
-    }
-    const bool negative = length > 0 && length < 8 && (value >> (8 * length - 1)) == 1;
-    return static_cast<int64_t>(negative ? value | ~uint64_t{0} << (8 * length) : value);
+  int64_t number() { return number_of(byte() % (kLongest + 1)); }
+  // Of any magnitude too, and often one at the ends of a page's sizes.
+  int small_number() {
+    constexpr int kEnds[] = {0, 1, -1, 500, 501};
+    const size_t choice = byte() % (kLongest + 1 + std::size(kEnds));
+    return choice > kLongest ? kEnds[choice - kLongest - 1] : static_cast<int>(number_of(choice));
   }
-  int small_number() { return static_cast<int>(number()); }
   // Short ones, and long ones about the longest that is accepted anywhere.
   Text text() {
     const unsigned char length = byte();
@@ -69,6 +66,17 @@ class Arguments {
   int count_of(size_t elements) { return flag() ? -(byte() % 2) : static_cast<int>(elements); }
 
  private:
+  static constexpr size_t kLongest = 8;  // bytes of a number
+
+  int64_t number_of(size_t length) {
+    uint64_t value = 0;
+    for (size_t i = 0; i < length; ++i) {
+      value |= static_cast<uint64_t>(byte()) << (8 * i);
+    }
+    const bool negative = length > 0 && length < kLongest && (value >> (8 * length - 1)) == 1;
+    return static_cast<int64_t>(negative ? value | ~uint64_t{0} << (8 * length) : value);
+  }
+
   const std::string& input_;
   size_t at_ = 0;
 };
