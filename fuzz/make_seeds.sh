@@ -1,6 +1,6 @@
 #!/usr/bin/env bash
-# make_seeds.sh FOLDER [PROTOC]: writes the seeds of every target into FOLDER/TARGET. The bytes are
-# those of the independent peer, Debian's protoc.
+# make_seeds.sh FOLDER [PROTOC]: makes FOLDER, which must not be there yet, and writes the seeds of
+# every target into FOLDER/TARGET. The bytes are those of the independent peer, Debian's protoc.
 set -euo pipefail
 folder=$1
 protoc=${2:-protoc}
@@ -55,8 +55,8 @@ all_fields() {
     END { print_all(message) }' "$table"
 }
 
-rm -rf "${folder:?}"/*
-
+mkdir -p "$(dirname "$folder")"
+mkdir "$folder" # nothing is deleted, and no seed of an earlier time stays
 
 refused='wrongReceiverDetail { invalidReceivers: [1, 2] interruptedReceivers: 3 disabledReceivers: [4, -5]
   existing: 6 notExisting: 7 invitationDenied: [8, 9] didViolationUsers { userA: 10 userB: 11 }
