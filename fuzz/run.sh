@@ -9,7 +9,7 @@ shift 3
 here=$(cd "$(dirname "${BASH_SOURCE[0]}")" && pwd -P)
 
 run_target() {
-  local target=$1 log=$corpus/$1.log folders inputs
+  local target=$1 log=$corpus/$1.log folders inputs artifact
   mkdir -p "$corpus/$target"
   folders=("$corpus/$target" "$here/seeds/$target")
   [ ! -d "$here/regressions/$target" ] || folders+=("$here/regressions/$target")
@@ -17,8 +17,13 @@ run_target() {
   if ! "$programs/$target" "$limit" -print_final_stats=1 -rss_limit_mb=1024 -timeout=10 \
     -artifact_prefix="$corpus/$target-" "${folders[@]}" >"$log" 2>&1; then
     tail -n 60 "$log"
-    echo "$target: a finding. To see it again: $programs/$target FILE, with the file named above ($corpus/$target-...)."
-    echo "When it is mended, keep the file in fuzz/regressions/$target. Whole log: $log"
+    artifact=$(sed -nE 's/.*Test unit written to (.*-(crash|leak|oom|timeout)-[0-9a-f]+)$/\1/p' "$log")
+    if [ -n "$artifact" ]; then
+      echo "$target: a finding. To see it again: $programs/$target $artifact"
+      echo "When it is mended, keep the file in fuzz/regressions/$target. Whole log: $log"
+    else
+      echo "$target failed to run. Whole log: $log"
+    fi
     return 1
   fi
   awk -v target="$target" -v inputs="$inputs" '
