@@ -35,6 +35,10 @@ case $1 in
     diff <({ working | grep '_deserialize$' && printf '%s\n' round_trip serializers; } | sort) \
       <(find "$source/fuzz/seeds" -mindepth 1 -maxdepth 1 -printf '%f\n' | sort) >&2
     ;;
+  fuzzing_calls_each_serializer)
+    diff <(working | grep -v '_deserialize$' | sort) \
+      <(grep -oE '\<[a-z_]+_serialize\>' "$source/fuzz/serializers.cc" | sort -u) >&2
+    ;;
   *)
     echo "no such case: $1" >&2
     exit 1
