@@ -6,6 +6,7 @@
 #include <algorithm>
 #include <iterator>
 #include <string>
+#include <type_traits>
 #include <vector>
 
 #include "msgspec_frontend.pb.h"
@@ -28,15 +29,36 @@ struct Function {
   std::string name;
   const Descriptor* (*message)();
   std::string (*disagreement_after_reading)(const std::string& bytes, const Message& message);
+  std::string (*disagreement_at_the_exit_line)(const std::string& bytes, const Message& message);
 };
 
 template <typename Outputs, typename T>
+std::string disagreement_after_reading(const std::string& bytes, const Message& message) {
+  Outputs outputs;
+  outputs.read(bytes);
+  return disagreement(outputs, dynamic_cast<const T&>(message));
+}
+
+template <typename Outputs, typename T>
+std::string disagreement_at_the_exit_line(const std::string& bytes, const Message& message) {
+  Outputs outputs;
+  std::string found = "no exit line";
+  const support::LogObserver observer([&](const support::LogCall& call) {
+    if (call.format.find("%s: exit") != std::string::npos) {
+      if constexpr (std::is_same_v<Outputs, support::ForwardOnlineMessageOutputs>) {
+        outputs.chat_msg.block = outputs.record.chatMsg;  // as read() does in the end
+      }
+      found = disagreement(outputs, dynamic_cast<const T&>(message));
+    }
+  });
+  outputs.read(bytes);
+  return found;
+}
+
+template <typename Outputs, typename T>
 Function function(const support::Deserializer<Outputs, T>& deserializer) {
-  return {deserializer.name, &T::descriptor, [](const std::string& bytes, const Message& message) {
-            Outputs outputs;
-            outputs.read(bytes);
-            return disagreement(outputs, dynamic_cast<const T&>(message));
-          }};
+  return {deserializer.name, &T::descriptor, disagreement_after_reading<Outputs, T>,
+          disagreement_at_the_exit_line<Outputs, T>};
 }
 
 const std::vector<Function> kFunctions =
@@ -114,6 +136,13 @@ TEST_P(EveryDeserializer, GivenThePeersBytes_WritesTheValuesThatThePeerWasGiven)
   EXPECT_EQ(that.function->disagreement_after_reading(that.peers_bytes, *that.sample.message), "")
       << "the message:\n"
       << that.sample.text.substr(0, 2000);
+}
+
+TEST_P(EveryDeserializer, WhenItLogsItsExit_HasWrittenItsOutputs) {
+  const Case& that = every_case()[GetParam()];
+  const bool has_exit_line = that.function->name != "channel_auth_reply_deserialize";
+  EXPECT_EQ(that.function->disagreement_at_the_exit_line(that.peers_bytes, *that.sample.message),
+            has_exit_line ? "" : "no exit line");
 }
 
 INSTANTIATE_TEST_SUITE_P(Filled, EveryDeserializer, testing::Range(size_t{0}, every_case().size()),

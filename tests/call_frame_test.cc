@@ -25,6 +25,7 @@ using support::kSerializers;
 using support::Line;
 using support::logged_calls;
 using support::Serializer;
+using support::to_hex;
 using support::wrong_calls_of_threads;
 
 int log_thread(size_t call) {
@@ -58,6 +59,19 @@ TEST_P(EverySerializer, WhenSucceeding_ReturnsZeroAndTheLength) {
 TEST_P(EverySerializer, WhenSucceeding_LogsEntryAndExit) {
   call();
   expect_lines(support::debug("%s: exit", {function_.name}));
+}
+
+TEST_P(EverySerializer, WhenItLogsItsExit_HasEncoded) {
+  std::string encoding_at_exit;
+  {
+    const support::LogObserver observer([&](const support::LogCall& call) {
+      if (call.format.find("%s: exit") != std::string::npos) {
+        encoding_at_exit = out_.bytes();
+      }
+    });
+    call();
+  }
+  EXPECT_EQ(to_hex(encoding_at_exit), to_hex(out_.bytes()));
 }
 
 TEST_P(EverySerializer, WhenSucceeding_AllocatesOneZeroedBufferOfTheLength) {

@@ -11,6 +11,7 @@ using support::Encoded;
 using support::ExchangeTest;
 using support::expect_log;
 using support::FailingCalloc;
+using support::HeapWatch;
 using support::hex;
 using support::IdListOutput;
 using support::kIntSentinel;
@@ -174,6 +175,14 @@ TEST_F(ChatRequestSerialize, WhenTheTextCannotBeCopied_ThrowsAndDestroysTheMessa
   watch.stop();
   EXPECT_EQ(watch.kept(), std::vector<size_t>{});
   EXPECT_TRUE(out_.untouched());
+}
+
+TEST_F(ChatRequestSerialize, WhenTextHas40001Bytes_IsNotCopied) {
+  const std::string text(40001, 'x');
+  HeapWatch watch;
+  call_with_text(text.c_str());
+  watch.stop();
+  EXPECT_EQ(watch.news(), 2u);  // the parameter, and the list of them
 }
 
 TEST_F(ChatRequestSerialize, WhenTextIsTooLongAndTypeOutOfRange_NamesTheType) {

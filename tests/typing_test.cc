@@ -126,6 +126,19 @@ TEST_F(IsTypingRequestSerialize, WhenSucceeding_LogsEntryAndExit) {
   expect_log(name_, {enter(), support::debug("%s: exit", {name_})});
 }
 
+TEST_F(IsTypingRequestSerialize, WhenItLogsItsExit_HasEncoded) {
+  std::string encoding_at_exit;
+  {
+    const support::LogObserver observer([&](const support::LogCall& call) {
+      if (call.format.find("%s: exit") != std::string::npos) {
+        encoding_at_exit = out_.bytes();
+      }
+    });
+    call_with_all();
+  }
+  EXPECT_EQ(to_hex(encoding_at_exit), "58 01 60 02 6a 02 6f 6e 70 01 78 ac 02");
+}
+
 TEST_F(IsTypingRequestSerialize, WhenSucceeding_AllocatesOneZeroedBufferOfTheLength) {
   HeapWatch watch;
   call_with_all();
