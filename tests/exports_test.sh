@@ -101,14 +101,27 @@ case $1 in
     ! grep -F '.gnu.version_d' <<<"$sections" >&2 || exit 1
     ;;
   only_the_schema_is_initialised)
-    # The C runtime's own entry, and that of the generated code.
+    # The C runtime's own entry, and that of the generated code or of the one unit that it is part of.
     initialisers=$("$readelf" -sW "$library" |
       awk '$4 == "FUNC" && $8 ~ /^(frame_dummy|_GLOBAL__.*)$/ {print $8}' | sort)
-    [ "$initialisers" = $'_GLOBAL__sub_I_msgspec_frontend.pb.cc\nframe_dummy' ] || fail "$initialisers"
+    [[ $initialisers == _GLOBAL__sub_I_@(msgspec_frontend.pb|whole_library).cc$'\nframe_dummy' ]] ||
+      fail "$initialisers"
     # Nor is there an entry by another name.
     size=$("$readelf" -SW "$library" | sed -nE 's/.* \.init_array +INIT_ARRAY +[^ ]+ [^ ]+ ([^ ]+) .*/\1/p')
     case $("$readelf" -h "$library") in *ELF64*) pointer=8 ;; *) pointer=4 ;; esac
     [ $((16#$size)) -eq $((2 * pointer)) ] || fail "0x$size bytes of initialisers"
+    ;;
+  own_functions_are_bound_when_linked)
+    # The addresses that the loader has to look up are those of other libraries' functions.
+    looked_up=$("$readelf" -rW "$library" | awk 'NF >= 5 {sub(/@.*/, "", $5); print $5}' | sort -u)
+    own=$(exported | sed -n 's/^[TW] //p' | sort -u)
+    again=$(comm -12 <(echo "$looked_up") <(echo "$own"))
+    [ -z "$again" ] || fail "$(head -n 5 <<<"$again")"
+    [ -n "$own" ] || fail 'no functions'
+    ;;
+  module_initialises_nothing)
+    sections=$("$readelf" -SW "$library") # of its object file
+    ! grep -E '\.(init_array|ctors)' <<<"$sections" >&2 || exit 1
     ;;
   only_known_libraries_are_needed)
     dynamic=$("$readelf" -dW "$library")

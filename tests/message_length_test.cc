@@ -1,89 +1,32 @@
 // The length of the encoded message: a length below 1 is refused, and the length is computed once.
-// Every request carries at least its id, so the test replaces the length that the messages report;
-// in a program of its own, because that concerns every call.
+// Every request carries at least its id, so the test replaces what the runtime answers for the
+// length of an id; in a program of its own, because that concerns every call.
 
-#include <dlfcn.h>
+#include <google/protobuf/io/coded_stream.h>
 
-#include <cstring>
-#include <optional>
-#include <stdexcept>
-
-#include "msgspec_frontend.pb.h"
 #include "support/exchange.h"
 #include "support/heap.h"
 #include "support/serializers.h"
 
 namespace {
 
-std::optional<int> replaced_length;
-int lengths_computed = 0;
+// No other id of the requests is the same. It shows in the traces that their table expects.
+constexpr int64_t kRequestId = 1;
 
-// What the messages answer, unless a test replaces it.
-template <typename Message>
-int length_of(const Message* message, const char* symbol) {
-  ++lengths_computed;
-  if (replaced_length) {
-    return *replaced_length;
-  }
-  int (*real)(const Message*) = nullptr;
-  void* found = dlsym(RTLD_NEXT, symbol);
-  if (found == nullptr) {
-    throw std::runtime_error(symbol);
-  }
-  std::memcpy(&real, &found, sizeof real);
-  return real(message);
-}
+int added_to_next_id = 0;
+int request_ids_measured = 0;
 
 }  // namespace
 
-// In the program itself, so that the library's virtual calls come here.
-int ChannelAuthRequest::ByteSize() const {
-  return length_of(this, "_ZNK18ChannelAuthRequest8ByteSizeEv");
-}
-int ClientEchoReply::ByteSize() const {
-  return length_of(this, "_ZNK15ClientEchoReply8ByteSizeEv");
-}
-int CreateChatroomRequest::ByteSize() const {
-  return length_of(this, "_ZNK21CreateChatroomRequest8ByteSizeEv");
-}
-int ChatRequest::ByteSize() const {
-  return length_of(this, "_ZNK11ChatRequest8ByteSizeEv");
-}
-int AllowChatRequest::ByteSize() const {
-  return length_of(this, "_ZNK16AllowChatRequest8ByteSizeEv");
-}
-int GetAllUnreadMessageRequest::ByteSize() const {
-  return length_of(this, "_ZNK26GetAllUnreadMessageRequest8ByteSizeEv");
-}
-int ForwardOnlineMessageReply::ByteSize() const {
-  return length_of(this, "_ZNK25ForwardOnlineMessageReply8ByteSizeEv");
-}
-int ForwardUnreadMessageReply::ByteSize() const {
-  return length_of(this, "_ZNK25ForwardUnreadMessageReply8ByteSizeEv");
-}
-int ReadMessageRequest::ByteSize() const {
-  return length_of(this, "_ZNK18ReadMessageRequest8ByteSizeEv");
-}
-int EndChatRequest::ByteSize() const {
-  return length_of(this, "_ZNK14EndChatRequest8ByteSizeEv");
-}
-int InviteRequest::ByteSize() const {
-  return length_of(this, "_ZNK13InviteRequest8ByteSizeEv");
-}
-int CurrentTimeRequest::ByteSize() const {
-  return length_of(this, "_ZNK18CurrentTimeRequest8ByteSizeEv");
-}
-int UnsealMessageRequest::ByteSize() const {
-  return length_of(this, "_ZNK20UnsealMessageRequest8ByteSizeEv");
-}
-int SaveCallLogRequest::ByteSize() const {
-  return length_of(this, "_ZNK18SaveCallLogRequest8ByteSizeEv");
-}
-int IsTyping::ByteSize() const {
-  return length_of(this, "_ZNK8IsTyping8ByteSizeEv");
-}
-int ChangeChatroomMetaRequest::ByteSize() const {
-  return length_of(this, "_ZNK25ChangeChatroomMetaRequest8ByteSizeEv");
+// In the program itself, so that the library's calls come here.
+int google::protobuf::io::CodedOutputStream::VarintSize64(google::protobuf::uint64 value) {
+  request_ids_measured += value == kRequestId ? 1 : 0;
+  int length = added_to_next_id;
+  added_to_next_id = 0;
+  for (; value >= 0x80; value >>= 7) {
+    ++length;
+  }
+  return length + 1;
 }
 
 namespace {
@@ -97,21 +40,26 @@ class MessageLength : public support::ExchangeTest,
   const Serializer& function_ = GetParam();
   support::Encoded out_;
 
-  void TearDown() override { replaced_length.reset(); }
-  void call() { out_.status = function_.call(1, &out_.data.block, &out_.size); }
+  void call() {
+    out_.status = function_.call(kRequestId, &out_.data.block, &out_.size);
+    added_to_next_id = 0;
+  }
+  // With a message that reports this length.
+  void call_with_length(int length) {
+    added_to_next_id = length - function_.length;
+    call();
+  }
 };
 
 TEST_P(MessageLength, WhenZero_IsRefused) {
-  replaced_length = 0;
-  call();
+  call_with_length(0);
   EXPECT_EQ(out_.status, -1);
   EXPECT_EQ(out_.size, 0);
   EXPECT_TRUE(out_.data.untouched());
 }
 
 TEST_P(MessageLength, WhenNegative_IsRefused) {
-  replaced_length = -5;
-  call();
+  call_with_length(-5);
   EXPECT_EQ(out_.status, -1);
   EXPECT_EQ(out_.size, -5);
   EXPECT_TRUE(out_.data.untouched());
@@ -119,8 +67,8 @@ TEST_P(MessageLength, WhenNegative_IsRefused) {
 
 TEST_P(MessageLength, WhenRefused_IsLogged) {
   for (const int length : {0, -5}) {
-    replaced_length = length;
-    call();
+    support::clear_log();
+    call_with_length(length);
     std::vector<support::Line> lines = {support::debug(function_.entry, {function_.name})};
     lines.insert(lines.end(), function_.detail.begin(), function_.detail.end());
     lines.push_back(support::error("Invalid serialized data size : %d", {length}));
@@ -129,9 +77,8 @@ TEST_P(MessageLength, WhenRefused_IsLogged) {
 }
 
 TEST_P(MessageLength, WhenRefused_KeepsNothing) {
-  replaced_length = 0;
   support::HeapWatch watch;
-  call();
+  call_with_length(0);
   watch.stop();
   EXPECT_EQ(watch.kept(), std::vector<size_t>{});
   EXPECT_EQ(watch.not_freed(), std::vector<size_t>{});
@@ -139,52 +86,63 @@ TEST_P(MessageLength, WhenRefused_KeepsNothing) {
 
 // As far as the allocation, since no message is that short.
 TEST_P(MessageLength, WhenOne_IsAllocated) {
-  replaced_length = 1;
   {
     const support::FailingCalloc fault(1);
-    call();
+    call_with_length(1);
   }
   EXPECT_EQ(out_.size, 1);
   EXPECT_EQ(out_.data.block, nullptr);
 }
 
 TEST_P(MessageLength, WhenSucceeding_IsComputedOnce) {
-  lengths_computed = 0;
+  request_ids_measured = 0;
   call();
   ASSERT_EQ(out_.status, 0);
-  EXPECT_EQ(lengths_computed, 1);
+  EXPECT_EQ(request_ids_measured, 1);
 }
 
 // The one serializer without a check: a length that is none goes to calloc, which refuses it.
-TEST(MessageLengthOfIsTyping, WhenNegative_IsAFailedAllocation) {
-  replaced_length = -5;
-  support::clear_log();
-  support::Encoded out;
-  is_typing_request_serialize(1, 2, nullptr, nullptr, nullptr, &out.data.block, &out.size);
-  replaced_length.reset();
-  EXPECT_EQ(out.size, -5);
-  EXPECT_EQ(out.data.block, nullptr);
+class MessageLengthOfIsTyping : public support::ExchangeTest {
+ protected:
+  static constexpr int kLength = 4;
+  support::Encoded out_;
+
+  void call() {
+    is_typing_request_serialize(kRequestId, 2, nullptr, nullptr, nullptr, &out_.data.block,
+                                &out_.size);
+  }
+  void call_with_length(int length) {
+    added_to_next_id = length - kLength;
+    call();
+  }
+};
+
+TEST_F(MessageLengthOfIsTyping, WhenNegative_IsAFailedAllocation) {
+  call_with_length(-5);
+  EXPECT_EQ(out_.size, -5);
+  EXPECT_EQ(out_.data.block, nullptr);
+}
+
+TEST_F(MessageLengthOfIsTyping, WhenNegative_IsLogged) {
+  call_with_length(-5);
   const std::string name = "is_typing_request_serialize";
   support::expect_log(name, {support::debug("%s: enter", {name}),
                              support::debug("Memory allocation is failed to serialized_data")});
 }
 
-TEST(MessageLengthOfIsTyping, WhenNegative_KeepsNothing) {
-  replaced_length = -5;
-  support::Encoded out;
+TEST_F(MessageLengthOfIsTyping, WhenNegative_KeepsNothing) {
   support::HeapWatch watch;
-  is_typing_request_serialize(1, 2, "a", nullptr, nullptr, &out.data.block, &out.size);
+  call_with_length(-5);
   watch.stop();
-  replaced_length.reset();
   EXPECT_EQ(watch.kept(), std::vector<size_t>{});
   EXPECT_EQ(watch.not_freed(), std::vector<size_t>{});
 }
 
-TEST(MessageLengthOfIsTyping, WhenSucceeding_IsComputedOnce) {
-  lengths_computed = 0;
-  support::Encoded out;
-  is_typing_request_serialize(1, 2, nullptr, nullptr, nullptr, &out.data.block, &out.size);
-  EXPECT_EQ(lengths_computed, 1);
+TEST_F(MessageLengthOfIsTyping, WhenSucceeding_IsComputedOnce) {
+  request_ids_measured = 0;
+  call();
+  EXPECT_EQ(out_.size, kLength);
+  EXPECT_EQ(request_ids_measured, 1);
 }
 
 INSTANTIATE_TEST_SUITE_P(CallFrame, MessageLength, ::testing::ValuesIn(kSerializers),

@@ -15,16 +15,6 @@ if(CMAKE_CROSSCOMPILING)
   set_source_files_properties(support/heap.cc support/log_capture.cc PROPERTIES COMPILE_OPTIONS -O2)
 endif()
 
-# For tests that start programs themselves: what to put in front. Empty where programs run as they
-# are. ctest does that by itself.
-set(emulator "")
-if(CMAKE_CROSSCOMPILING_EMULATOR)
-  set(emulator "${CMAKE_CURRENT_BINARY_DIR}/emulate")
-  list(JOIN CMAKE_CROSSCOMPILING_EMULATOR "' '" words)
-  file(GENERATE OUTPUT "${emulator}" CONTENT "#!/bin/sh\nexec '${words}' \"$@\"\n"
-    FILE_PERMISSIONS OWNER_READ OWNER_WRITE OWNER_EXECUTE)
-endif()
-
 # What the tests that compile something themselves hand to the compiler, as the build does.
 foreach(language C CXX)
   separate_arguments(${language}_flags UNIX_COMMAND "${CMAKE_${language}_FLAGS}")

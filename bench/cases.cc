@@ -1,0 +1,123 @@
+#include "cases.h"
+
+#include <cstdlib>
+#include <cstring>
+#include <memory>
+#include <stdexcept>
+
+#include "calls.h"
+#include "inputs.h"
+
+namespace {
+
+using Block = std::unique_ptr<unsigned char, decltype(&free)>;
+
+// The calls by name, with what is asked of each.
+struct Call {
+  std::string name;
+  bool is_implemented;
+  std::vector<int> amounts;
+  Case (*make)(const std::string& name, int amount);
+};
+
+template <typename Serialize>
+Case serializer(const std::string& name, const std::string& bytes, Serialize serialize) {
+  return {name,
+          [serialize] {
+            int size;
+            free(serialize(&size));
+          },
+          [serialize, bytes] {
+            int size = -1;
+            const Block block(serialize(&size), &free);
+            return std::string(reinterpret_cast<const char*>(block.get()),
+                               static_cast<size_t>(size)) == bytes;
+          }};
+}
+
+using Parse = void (*)(const unsigned char*, int, struct digest*);
+
+Case parser(const std::string& name, const Received& received, Parse parse) {
+  const auto input = std::make_shared<const Received>(received);
+  const auto call = [input, parse](struct digest* digest) {
+    parse(reinterpret_cast<const unsigned char*>(input->bytes.data()),
+          static_cast<int>(input->bytes.size()), digest);
+  };
+  return {name, [call] { call(nullptr); },
+          [call, input] {
+            struct digest digest = {0};
+            call(&digest);
+            return digest.value == input->digest.value;
+          }};
+}
+
+Case echo_reply(const std::string& name, int /*amount*/) {
+  return serializer(name, echo_reply_bytes(),
+                    [](int* size) { return implementation.echo_reply(kRequestId, size); });
+}
+
+Case chat_request(const std::string& name, int length) {
+  const std::string text = text_of(length);
+  return serializer(name, chat_request_bytes(text),
+                    [text](int* size) { return implementation.chat_request(text.c_str(), size); });
+}
+
+Case chat_reply(const std::string& name, int entries) {
+  return parser(name, chat_reply_of(entries), implementation.chat_reply);
+}
+
+Case message_page(const std::string& name, int messages) {
+  return parser(name, message_page_of(messages), implementation.message_page);
+}
+
+Case chatroom_entry(const std::string& name, int members) {
+  return parser(name, chatroom_entry_of(members), implementation.chatroom_entry);
+}
+
+const std::vector<Call>& calls() {
+  static const std::vector<Call> all = {
+      {"echo_reply", implementation.echo_reply != nullptr, {0}, echo_reply},
+      {"chat_request",
+       implementation.chat_request != nullptr,
+       {10, 100, 1000, 10000, 40000},
+       chat_request},
+      {"chat_reply", implementation.chat_reply != nullptr, {1, 10, 50, 100, 500, 5000}, chat_reply},
+      {"message_page",
+       implementation.message_page != nullptr,
+       {1, 10, 100, 500, 5000},
+       message_page},
+      {"chatroom_entry",
+       implementation.chatroom_entry != nullptr,
+       {1, 10, 100, 500, 5000},
+       chatroom_entry}};
+  return all;
+}
+
+std::string name_of(const Call& call, int amount) {
+  return amount == 0 ? call.name : call.name + "/" + std::to_string(amount);
+}
+
+}  // namespace
+
+std::vector<std::string> case_names() {
+  std::vector<std::string> names;
+  for (const Call& call : calls()) {
+    for (const int amount : call.amounts) {
+      if (call.is_implemented) {
+        names.push_back(name_of(call, amount));
+      }
+    }
+  }
+  return names;
+}
+
+Case make_case(const std::string& name) {
+  for (const Call& call : calls()) {
+    for (const int amount : call.amounts) {
+      if (call.is_implemented && name_of(call, amount) == name) {
+        return call.make(name, amount);
+      }
+    }
+  }
+  throw std::invalid_argument("no such case: " + name);
+}

@@ -1,0 +1,51 @@
+/*
+ * A plug-in of QEMU, whose user-mode emulator runs a program for another processor: at its end, the
+ * number of instructions that it executed goes to standard error.
+ */
+#include <inttypes.h>
+#include <stddef.h>
+#include <stdint.h>
+#include <stdio.h>
+
+/* What is used of QEMU's interface for plug-ins, version 1: Debian has no header of it. */
+typedef uint64_t qemu_plugin_id_t;
+struct qemu_info_t;
+struct qemu_plugin_tb;
+enum qemu_plugin_op { QEMU_PLUGIN_INLINE_ADD_U64 };
+void qemu_plugin_register_vcpu_tb_trans_cb(qemu_plugin_id_t id,
+                                           void (*callback)(qemu_plugin_id_t,
+                                                            struct qemu_plugin_tb*));
+void qemu_plugin_register_vcpu_tb_exec_inline(struct qemu_plugin_tb* block, enum qemu_plugin_op op,
+                                              void* counter, uint64_t increment);
+size_t qemu_plugin_tb_n_insns(const struct qemu_plugin_tb* block);
+void qemu_plugin_register_atexit_cb(qemu_plugin_id_t id, void (*callback)(qemu_plugin_id_t, void*),
+                                    void* data);
+
+extern int qemu_plugin_version;
+int qemu_plugin_version = 1;
+int qemu_plugin_install(qemu_plugin_id_t id, const struct qemu_info_t* info, int argc, char** argv);
+
+static uint64_t instructions;
+
+/* A block of instructions is left early only by a signal, of which there are none. */
+static void count_block(qemu_plugin_id_t id, struct qemu_plugin_tb* block) {
+  (void)id;
+  qemu_plugin_register_vcpu_tb_exec_inline(block, QEMU_PLUGIN_INLINE_ADD_U64, &instructions,
+                                           qemu_plugin_tb_n_insns(block));
+}
+
+static void report(qemu_plugin_id_t id, void* data) {
+  (void)id;
+  (void)data;
+  fprintf(stderr, "instructions %" PRIu64 "\n", instructions);
+}
+
+int qemu_plugin_install(qemu_plugin_id_t id, const struct qemu_info_t* info, int argc,
+                        char** argv) {
+  (void)info;
+  (void)argc;
+  (void)argv;
+  qemu_plugin_register_vcpu_tb_trans_cb(id, count_block);
+  qemu_plugin_register_atexit_cb(id, report, NULL);
+  return 0;
+}

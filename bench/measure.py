@@ -1,0 +1,76 @@
+"""How the benchmark's programs are run, and what they count."""
+
+import dataclasses
+import os
+import pathlib
+import re
+import subprocess
+
+# The table's cases. Those of growth are more of the same.
+CASES = ["echo_reply", "chat_request/100", "chat_request/40000", "chat_reply/1", "chat_reply/50",
+         "message_page/500", "chatroom_entry/500"]
+# What a call may execute on ARM, as a ratio to the generated classes.
+INSTRUCTION_BARS = {"echo_reply": 1.11, "chat_request/100": 1.02, "chat_request/40000": 1.02,
+                    "chat_reply/1": 1.08, "message_page/500": 0.98, "chatroom_entry/500": 0.98}
+LISTS = ["message_page/500", "chatroom_entry/500"]
+
+AMOUNTS = {"chat_request": [10, 100, 1000, 10000, 40000], "chat_reply": [1, 10, 100, 500, 5000],
+           "message_page": [1, 10, 100, 500, 5000], "chatroom_entry": [1, 10, 100, 500, 5000]}
+GROWTH = [f"{call}/{amount}" for call, amounts in AMOUNTS.items() for amount in amounts]
+
+
+def is_parser(case):
+    return case.split("/")[0] in ("chat_reply", "message_page", "chatroom_entry")
+
+
+@dataclasses.dataclass
+class Build:
+    """The benchmark as one preset builds it."""
+
+    folder: pathlib.Path
+    emulator: list  # what runs a program of another machine
+
+    @property
+    def library(self):
+        return self.folder / "proto-lib" / "libqel-message-protosvc.so"
+
+    def run(self, command, **settings):
+        done = subprocess.run(command, stdout=subprocess.PIPE, stderr=subprocess.PIPE, text=True,
+                              env={**os.environ, **settings})
+        if done.returncode != 0:
+            raise RuntimeError(f"{command}: exit status {done.returncode}\n{done.stderr}")
+        return done
+
+    def program(self, name, implementation):
+        return str(self.folder / "bench" / f"{name}-{implementation}")
+
+    def blocks(self, implementation, case, calls=10):
+        """Blocks that a call allocates, those that it keeps, and its log lines."""
+        command = [*self.emulator, self.program("count_blocks", implementation), case, str(calls)]
+        counts = [int(word) for word in self.run(command).stdout.split()]
+        if any(count % calls for count in counts):
+            raise RuntimeError(f"{implementation}, {case}: not the same in each call: {counts}")
+        return [count // calls for count in counts]
+
+    def instructions(self, implementation, case):
+        """Instructions of a call: what a longer run takes more than a shorter one."""
+        few, many = (10, 30) if case in LISTS else (100, 1100)
+        return (self._executed(implementation, case, many) -
+                self._executed(implementation, case, few)) / (many - few)
+
+    def _executed(self, implementation, case, calls):
+        command = [self.program("count_calls", implementation), case, str(calls)]
+        if self.emulator:
+            plugin = str(self.folder / "bench" / "count_instructions.so")
+            out = self.run([*self.emulator, "-plugin", plugin, *command]).stderr
+            return int(re.search(r"^instructions (\d+)$", out, re.MULTILINE)[1])
+        # Without the C library's variants for newer processors, which differ from machine to machine.
+        out = self.run(["valgrind", "--tool=callgrind", "--callgrind-out-file=/dev/null", *command],
+                       GLIBC_TUNABLES="glibc.cpu.hwcaps=-AVX2,-AVX512F,-AVX512VL,-ERMS,-FSRM").stderr
+        return int(re.search(r"Collected : (\d+)", out)[1])
+
+
+def build_of(folder):
+    """The build in a preset's folder."""
+    emulator = folder / "emulate"
+    return Build(folder, [str(emulator)] if emulator.exists() else [])

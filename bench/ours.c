@@ -1,0 +1,158 @@
+/* The library's own functions. */
+
+#include <stdlib.h>
+
+#include "calls.h"
+#include "qel-message-serialize.h"
+
+static unsigned char* echo_reply(int64_t request_id, int* size) {
+  unsigned char* block = NULL;
+  if (client_echo_reply_serialize(request_id, &block, size) != 0) {
+    abort();
+  }
+  return block;
+}
+
+static unsigned char* chat_request(const char* text, int* size) {
+  unsigned char* block = NULL;
+  if (chat_request_serialize(kRequestId, kChatroomId, kMessageId, kMessageType, text, kMessageTtl,
+                             0, &block, size) != 0) {
+    abort();
+  }
+  return block;
+}
+
+static void chat_reply(const unsigned char* data, int size, struct digest* digest) {
+  int64_t request_id = -1;
+  int64_t chatroom_id = -1;
+  int code = -1;
+  char* msg = NULL;
+  int count = -1;
+  int64_t* ids = NULL;
+  int64_t* times = NULL;
+  int i;
+  chat_reply_deserialize(data, size, &request_id, &chatroom_id, &code, &msg, &count, &ids, &times);
+  if (count < 0) {
+    abort();
+  }
+  if (digest != NULL) {
+    digest_number(digest, request_id);
+    digest_number(digest, chatroom_id);
+    digest_number(digest, code);
+    digest_text(digest, msg);
+    digest_number(digest, count);
+    for (i = 0; i < count; ++i) {
+      digest_number(digest, ids[i]);
+      digest_number(digest, times[i]);
+    }
+  }
+  free(msg);
+  free(ids);
+  free(times);
+}
+
+static void message_page(const unsigned char* data, int size, struct digest* digest) {
+  int64_t request_id = -1;
+  qel_message_inboxentry_t** entries = NULL;
+  int count = -1;
+  char* next = NULL;
+  int i;
+  forward_unread_message_deserialize(data, size, &request_id, &entries, &count, &next);
+  if (count < 0) {
+    abort();
+  }
+  if (digest != NULL) {
+    digest_number(digest, request_id);
+    digest_number(digest, count);
+    for (i = 0; i < count; ++i) {
+      digest_number(digest, entries[i]->msgId);
+      digest_number(digest, entries[i]->msgType);
+      digest_number(digest, entries[i]->sender);
+      digest_number(digest, entries[i]->receiver);
+      digest_number(digest, entries[i]->sentTime);
+      digest_text(digest, entries[i]->chatMsg);
+      digest_number(digest, entries[i]->chatroomId);
+      digest_number(digest, entries[i]->chatType);
+      digest_number(digest, entries[i]->msgTtl);
+    }
+    digest_text(digest, next);
+  }
+  for (i = 0; i < count; ++i) {
+    free(entries[i]->chatMsg);
+    free(entries[i]);
+  }
+  free(entries);
+  free(next);
+}
+
+static void release_marks(qel_message_watermarkentry_t** marks, int count, struct digest* digest) {
+  int i;
+  if (digest != NULL) {
+    digest_number(digest, count);
+    for (i = 0; i < count; ++i) {
+      digest_number(digest, marks[i]->userId);
+      digest_number(digest, marks[i]->msgId);
+      digest_number(digest, marks[i]->timestamp);
+    }
+  }
+  for (i = 0; i < count; ++i) {
+    free(marks[i]);
+  }
+  free(marks);
+}
+
+static void chatroom_entry(const unsigned char* data, int size, struct digest* digest) {
+  int64_t request_id = -1;
+  int64_t chatroom_id = -1;
+  int code = -1;
+  char* msg = NULL;
+  qel_message_watermarkentry_t** deliveries = NULL;
+  int delivery_count = -1;
+  int64_t delivery_time = -1;
+  qel_message_watermarkentry_t** reads = NULL;
+  int read_count = -1;
+  int64_t read_time = -1;
+  qel_message_chatroommember_t** members = NULL;
+  int member_count = -1;
+  char* title = NULL;
+  int ttl = -1;
+  int i;
+  allow_chat_reply_deserialize(data, size, &request_id, &chatroom_id, &code, &msg, &deliveries,
+                               &delivery_count, &delivery_time, &reads, &read_count, &read_time,
+                               &members, &member_count, &title, &ttl);
+  if (member_count < 0) {
+    abort();
+  }
+  if (digest != NULL) {
+    digest_number(digest, request_id);
+    digest_number(digest, chatroom_id);
+    digest_number(digest, code);
+    digest_text(digest, msg);
+    digest_number(digest, delivery_time);
+  }
+  release_marks(deliveries, delivery_count, digest);
+  if (digest != NULL) {
+    digest_number(digest, read_time);
+  }
+  release_marks(reads, read_count, digest);
+  if (digest != NULL) {
+    digest_number(digest, member_count);
+    for (i = 0; i < member_count; ++i) {
+      digest_number(digest, members[i]->userId);
+      digest_number(digest, members[i]->available);
+      digest_text(digest, members[i]->name);
+    }
+    digest_text(digest, title);
+    digest_number(digest, ttl);
+  }
+  for (i = 0; i < member_count; ++i) {
+    free(members[i]->name);
+    free(members[i]);
+  }
+  free(members);
+  free(msg);
+  free(title);
+}
+
+const struct implementation implementation = {"this library", echo_reply,   chat_request,
+                                              chat_reply,     message_page, chatroom_entry};

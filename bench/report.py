@@ -1,0 +1,337 @@
+#!/usr/bin/env python3
+"""Measures the library beside other means of doing the same, and writes docs/benchmark.
+
+usage: report.py BUILD ARM_BUILD... [--rounds N] [--to FOLDER]
+
+BUILD is the folder of the preset bench, ARM_BUILD those of the presets for ARM. In a round each
+program runs each case once, in turn, so that what slows the machine down for a while slows them all.
+Times are medians of the rounds, ratios the medians of the rounds' ratios.
+"""
+
+import argparse
+import datetime
+import json
+import os
+import pathlib
+import platform
+import re
+import shutil
+import statistics
+import subprocess
+import sys
+
+import measure
+
+ROOT = pathlib.Path(__file__).resolve().parent.parent
+
+# The programs, and what they are called in the report.
+NAMES = {"ours": "this library", "floor": "generated classes", "by_hand": "by hand",
+         "protobuf3": "Protocol Buffers 3.21", "protobuf_c": "protobuf-c", "nanopb": "nanopb"}
+BY_HAND = ["echo_reply", "chat_request/100", "chat_request/40000"]
+
+CASE_NAMES = {
+    "echo_reply": "echo reply",
+    "chat_request/100": "chat request, 100 bytes",
+    "chat_request/40000": "chat request, 40,000 bytes",
+    "chat_reply/1": "chat reply, 1 entry",
+    "chat_reply/50": "chat reply, 50 entries",
+    "message_page/500": "page, 500 messages",
+    "chatroom_entry/500": "room, 500 members",
+}
+SINGLE = ["echo_reply", "chat_request/100", "chat_request/40000", "chat_reply/1"]
+
+# The bars: see docs/performance.md.
+LIST_RATIO = 1.00
+LINE_NS, CALL_NS = 80, 50
+LOADING_RATIOS = {"ours, plain runtime": 0.85, "ours": 0.65}
+
+
+def say(text):
+    print(f"bench: {text}", flush=True)
+
+
+def benchmark(program, case="", counter="cpu_time", seconds=0.02):
+    """Nanoseconds of the program's benchmarks, by name; of all, or those of a case."""
+    pattern = f"^{re.escape(case)}(/real_time/threads:.*)?$" if case else "."
+    out = subprocess.run([program, f"--benchmark_filter={pattern}", "--benchmark_format=json",
+                          f"--benchmark_min_time={seconds}"],
+                         check=True, stdout=subprocess.PIPE, stderr=subprocess.DEVNULL, text=True).stdout
+    return {run["name"]: run[counter] for run in json.loads(out)["benchmarks"]}
+
+
+class Rounds:
+    """What was measured in each round, by name."""
+
+    def __init__(self):
+        self.values = {}
+
+    def add(self, name, value):
+        self.values.setdefault(name, []).append(value)
+
+    def median(self, name):
+        return statistics.median(self.values[name])
+
+    def ratio(self, name, to):
+        return statistics.median(a / b for a, b in zip(self.values[name], self.values[to]))
+
+
+def time_calls(build, rounds):
+    """Of all programs in all cases, of growth too, and what the interface adds."""
+    times = Rounds()
+    growth = [case for case in measure.GROWTH if case not in measure.CASES]
+    for number in range(rounds):
+        say(f"round {number + 1} of {rounds}")
+        for case in measure.CASES:
+            for program in NAMES:
+                if program != "by_hand" or case in BY_HAND:
+                    time = benchmark(build.program("time_calls", program), case)[case]
+                    times.add((program, case), time)
+        for case in growth:
+            for program in ("ours", "floor"):
+                times.add((program, case), benchmark(build.program("time_calls", program), case)[case])
+        for case in ("chat_request/100", "chat_reply/1"):
+            for name, time in benchmark(build.program("time_calls", "ours"), f"at_once/{case}",
+                                        counter="real_time").items():
+                times.add(("at_once", case, int(name.rsplit(":", 1)[1])), time)
+        for name, time in benchmark(str(build.folder / "bench" / "time_parts")).items():
+            times.add(("part", name), time)
+    return times
+
+
+def time_loading(build, rounds):
+    libraries = {
+        "plain": (build.folder / "bench" / "libplain-protosvc.so", {}),
+        "ours, plain runtime": (build.library, {"LD_LIBRARY_PATH": str(plain_runtime(build))}),
+        "ours": (build.library, {}),
+    }
+    times = Rounds()
+    for _ in range(rounds):
+        for name, (library, settings) in libraries.items():
+            program = str(build.folder / "bench" / "time_loading")
+            times.add(name, int(build.run([program, str(library)], **settings).stdout))
+    return times
+
+
+def plain_runtime(build):
+    cache = (build.folder / "CMakeCache.txt").read_text()
+    return pathlib.Path(re.search(r"^QEL_PLAIN_PROTOBUF_ROOT:\w+=(.+)$", cache, re.MULTILINE)[1]) / "lib"
+
+
+def size_of(build, scratch):
+    """Bytes of the stripped library, and its relocations."""
+    cache = (build.folder / "CMakeCache.txt").read_text()
+    strip = re.search(r"^CMAKE_STRIP:\w+=(.+)$", cache, re.MULTILINE)[1]
+    stripped = scratch / f"{build.folder.name}.so"
+    subprocess.run([strip, "-o", stripped, build.library], check=True)
+    listed = subprocess.run(["readelf", "-rW", build.library], check=True, stdout=subprocess.PIPE,
+                            text=True).stdout
+    relocations = [line for line in listed.splitlines() if re.match(r"^[0-9a-f]{8,} ", line)]
+    return {"bytes": stripped.stat().st_size, "relocations": len(relocations)}
+
+
+def machine():
+    with open("/proc/cpuinfo") as file:
+        model = re.search(r"^model name\s*: (.+)$", file.read(), re.MULTILINE)
+    compiler = subprocess.run(["c++", "--version"], stdout=subprocess.PIPE, text=True).stdout.splitlines()[0]
+    return {"processor": f"{model[1] if model else platform.machine()}, {os.cpu_count()} cores",
+            "system": f"{platform.system()} {platform.machine()}, {platform.libc_ver()[0]} {platform.libc_ver()[1]}",
+            "compiler": compiler}
+
+
+def measure_all(build, arm_builds, rounds):
+    builds = [build, *arm_builds]
+    times = time_calls(build, rounds)
+    say("loading, sizes, blocks and instructions")
+    loading = time_loading(build, 5 * rounds)
+    scratch = build.folder / "bench" / "stripped"
+    shutil.rmtree(scratch, ignore_errors=True)
+    scratch.mkdir()
+    cases = [*measure.CASES, *(case for case in measure.GROWTH if case not in measure.CASES)]
+    return {
+        "date": datetime.date.today().isoformat(),
+        "command": "./dev bench",
+        "machine": machine(),
+        "rounds": rounds,
+        "time": {case: {program: times.median((program, case)) for program in NAMES
+                        if (program, case) in times.values} for case in cases},
+        "ratio": {case: {program: times.ratio((program, case), ("floor", case)) for program in NAMES
+                         if (program, case) in times.values} for case in cases},
+        "at_once": {case: {threads: times.median(("at_once", case, threads)) for threads in (1, 2)}
+                    for case in ("chat_request/100", "chat_reply/1")},
+        "parts": {name[1]: times.median(name) for name in times.values if name[0] == "part"},
+        "loading": {name: {"ns": loading.median(name), "ratio": loading.ratio(name, "plain")}
+                    for name in loading.values},
+        "size": {each.folder.name: size_of(each, scratch) for each in builds},
+        "blocks": {case: {program: build.blocks(program, case) for program in NAMES
+                          if program != "by_hand" or case in BY_HAND} for case in measure.CASES},
+        "allocations": {case: build.blocks("ours", case, 1)[0] for case in measure.GROWTH},
+        "instructions": {each.folder.name: {case: {program: round(each.instructions(program, case))
+                                                   for program in ("ours", "floor")}
+                                            for case in measure.CASES} for each in builds},
+    }
+
+
+def bars(results):
+    """Each bar: what it is about, what was measured, what is allowed."""
+    line = results["parts"]["thread_id"]
+    for case in measure.LISTS:
+        yield f"{CASE_NAMES[case]}: time, ratio", results["ratio"][case]["ours"], LIST_RATIO
+    for case in SINGLE:
+        lines = results["blocks"][case]["ours"][2]
+        time = results["time"][case]
+        allowed = time["floor"] + lines * LINE_NS + CALL_NS
+        yield f"{CASE_NAMES[case]}: time in ns, {lines} log lines", time["ours"], allowed
+        yield (f"{CASE_NAMES[case]}: the same without the kernel's part of the lines ({line:.0f} ns each)",
+               time["ours"] - lines * line, time["floor"] + CALL_NS)
+    for case in measure.CASES:
+        blocks = results["blocks"][case]
+        kept = 1 if measure.is_parser(case) else 0
+        yield f"{CASE_NAMES[case]}: allocations", blocks["ours"][0], blocks["floor"][0] + kept
+        yield f"{CASE_NAMES[case]}: blocks kept", blocks["ours"][1], kept
+    for preset in [name for name in results["instructions"] if name != "bench"]:
+        for case, bar in measure.INSTRUCTION_BARS.items():
+            counted = results["instructions"][preset][case]
+            yield (f"{CASE_NAMES[case]}: instructions on {preset}, ratio",
+                   counted["ours"] / counted["floor"], bar)
+    for name, bar in LOADING_RATIOS.items():
+        yield f"loading {name}, ratio", results["loading"][name]["ratio"], bar
+
+
+def number(value):
+    return f"{value:,.0f}" if value >= 100 else f"{value:.3g}"
+
+
+def table(head, rows):
+    lines = [head, ["---", *["---:"] * (len(head) - 1)], *rows]
+    return "\n".join("| " + " | ".join(row) + " |" for row in lines)
+
+
+def time_table(results):
+    def cell(case, program):
+        if program not in results["time"][case]:
+            return ""
+        return f"{number(results['time'][case][program])} ({results['ratio'][case][program]:.2f})"
+
+    return table(["ns a call (ratio to the generated classes)", *NAMES.values()],
+                 [[CASE_NAMES[case], *(cell(case, program) for program in NAMES)]
+                  for case in measure.CASES])
+
+
+def count_tables(results):
+    def ratio(preset, case):
+        counted = results["instructions"][preset][case]
+        return f"{counted['ours']:,} ({counted['ours'] / counted['floor']:.3f})"
+
+    presets = {"bench": "x86-64", "armhf": "ARM, hard float", "armel": "ARM, soft float"}
+    yield table(["instructions a call (ratio to the generated classes)", *presets.values()],
+                [[CASE_NAMES[case], *(ratio(preset, case) for preset in presets)]
+                 for case in measure.CASES])
+    yield table(["blocks allocated a call", *NAMES.values(), "kept by this library"],
+                [[CASE_NAMES[case], *(f"{blocks[program][0]:,}" if program in blocks else ""
+                                      for program in NAMES), f"{blocks['ours'][1]}"]
+                 for case, blocks in results["blocks"].items()])
+    yield table(["library", *presets.values()],
+                [[what, *(f"{results['size'][preset][key]:,}" for preset in presets)]
+                 for what, key in (("bytes, stripped", "bytes"), ("relocations", "relocations"))])
+    yield table(["loading", "µs", "ratio"],
+                [[name, number(value["ns"] / 1000), f"{value['ratio']:.2f}"]
+                 for name, value in results["loading"].items()])
+
+
+def parts_table(results):
+    parts = results["parts"]
+    steps = ["object", "fields", "length", "block", "encoding"]
+    texts = {"object": "the message object, made and destroyed",
+             "fields": "its fields, of which the text is copied into blocks of its own",
+             "length": "the length of its encoding", "block": "the block for the caller, and free",
+             "encoding": "the encoding"}
+    rows, before = [], 0
+    for step in steps:
+        rows.append([texts[step], number(parts[step] - before)])
+        before = parts[step]
+    rows.append(["two thread ids, asked of the kernel", number(2 * parts["thread_id"])])
+    whole = results["time"]["chat_request/100"]["ours"]
+    rest = whole - before - 2 * parts["thread_id"]
+    rows.append(["the rest: two calls of the log service, the call itself, checks", f"{rest:.0f}"])
+    rows.append(["**in all**", number(whole)])
+    return table(["a chat request of 100 bytes", "ns"], rows)
+
+
+def bars_table(results):
+    return table(["bar", "measured", "at most", ""],
+                 [[name, f"{value:,.3f}" if "ratio" in name else f"{value:,.0f}",
+                   f"{bar:,.2f}" if "ratio" in name else f"{bar:,.0f}",
+                   "met" if value <= bar else "**not met**"]
+                  for name, value, bar in bars(results)])
+
+
+def report(results):
+    about = results["machine"]
+    threads = table(["calls at once", "1 thread, ns a call", "2 threads, ns a call and thread"],
+                    [[CASE_NAMES[case], number(times[1]), number(2 * times[2])]
+                     for case, times in results["at_once"].items()])
+    return f"""# Benchmark
+
+Written by `{results['command']}` on {results['date']}. {about['processor']}; {about['system']};
+{about['compiler']}. Medians of {results['rounds']} rounds. What the columns are, and what the numbers
+mean, is in [performance.md](../performance.md).
+
+{time_table(results)}
+
+![Time of calls beside other means, and as their work grows](benchmark.svg)
+
+""" + "\n\n".join(count_tables(results)) + f"""
+
+{threads}
+
+{parts_table(results)}
+
+## Bars
+
+{bars_table(results)}
+"""
+
+
+def plot(results, folder):
+    data = folder / "plot"
+    data.mkdir(exist_ok=True)
+    with open(data / "cases.txt", "w") as file:
+        for case in measure.CASES:
+            ratios = results["ratio"][case]
+            words = [f"{ratios[program]:.4f}" if program in ratios else "NaN" for program in NAMES]
+            print(f'"{CASE_NAMES[case].replace(", ", chr(92) + "n")}"', *words, file=file)
+    for call, amounts in measure.AMOUNTS.items():
+        with open(data / f"{call}.txt", "w") as file:
+            for amount in amounts:
+                case = f"{call}/{amount}"
+                print(amount, results["time"][case]["ours"], results["time"][case]["floor"],
+                      results["allocations"][case], file=file)
+    subprocess.run(["gnuplot", "-c", ROOT / "bench" / "plot.gp", data, folder / "benchmark.svg"],
+                   check=True)
+    shutil.rmtree(data)
+
+
+def main():
+    arguments = argparse.ArgumentParser(usage=__doc__)
+    arguments.add_argument("builds", nargs="+", type=pathlib.Path)
+    arguments.add_argument("--rounds", type=int, default=11)
+    arguments.add_argument("--to", type=pathlib.Path, default=ROOT / "docs" / "benchmark")
+    given = arguments.parse_args()
+    builds = [measure.build_of(folder) for folder in given.builds]
+    results = measure_all(builds[0], builds[1:], given.rounds)
+    given.to.mkdir(parents=True, exist_ok=True)
+    (given.to / "results.json").write_text(json.dumps(results, indent=1) + "\n")
+    results = json.loads((given.to / "results.json").read_text(), object_hook=numbers_as_keys)
+    (given.to / "README.md").write_text(report(results))
+    plot(results, given.to)
+    missed = [name for name, value, bar in bars(results) if value > bar]
+    say(f"written to {given.to}; bars not met: {'; '.join(missed) or 'none'}")
+
+
+def numbers_as_keys(mapping):
+    """As JSON has only texts."""
+    return {int(key) if key.isdigit() else key: value for key, value in mapping.items()}
+
+
+if __name__ == "__main__":
+    sys.exit(main())
