@@ -540,17 +540,19 @@ void forward_unread_message_deserialize(const unsigned char* data, int size, int
   }
 
   *requestId = push.requestid();
-  *count = push.inboxentries_size();
-  if (*count > 0) {
-    *inboxEntries = allocate_zeroed<qel_message_inboxentry_t*>(*count);
-    if (*inboxEntries == nullptr) {
+  const int entries = push.inboxentries_size();
+  *count = entries;
+  if (entries > 0) {
+    auto** records = allocate_zeroed<qel_message_inboxentry_t*>(entries);
+    *inboxEntries = records;
+    if (records == nullptr) {
       QEL_LOG(kLogError, "qel_message_inboxentry_t * allocation fail");
       return;
     }
-    for (int i = 0; i < *count; ++i) {
+    for (int i = 0; i < entries; ++i) {
       const InboxEntry& entry = push.inboxentries(i);
       auto* record = allocate_zeroed<qel_message_inboxentry_t>(1);
-      (*inboxEntries)[i] = record;
+      records[i] = record;
       record->msgId = entry.msgid();
       record->msgType = entry.msgtype();
       record->sender = entry.sender();
