@@ -59,7 +59,7 @@ static unsigned char* chat_request(const char* text, int* size) {
   out = put_number(out, 2, kMessageType);
   *out++ = 3 << 3 | 2;
   out = put_varint(out, length);
-  memcpy(out, text, length);
+  memcpy(out, text, length); /* NOLINT(bugprone-not-null-terminated-result): no NUL on the wire */
   put_number(out + length, 4, kMessageTtl);
   return block;
 }

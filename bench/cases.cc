@@ -17,13 +17,12 @@ struct Call {
   std::string name;
   bool is_implemented;
   std::vector<int> amounts;
-  Case (*make)(const std::string& name, int amount);
+  Case (*make)(int amount);
 };
 
 template <typename Serialize>
-Case serializer(const std::string& name, const std::string& bytes, Serialize serialize) {
-  return {name,
-          [serialize] {
+Case serializer(const std::string& bytes, Serialize serialize) {
+  return {[serialize] {
             int size;
             free(serialize(&size));
           },
@@ -37,13 +36,13 @@ Case serializer(const std::string& name, const std::string& bytes, Serialize ser
 
 using Parse = void (*)(const unsigned char*, int, struct digest*);
 
-Case parser(const std::string& name, const Received& received, Parse parse) {
+Case parser(const Received& received, Parse parse) {
   const auto input = std::make_shared<const Received>(received);
   const auto call = [input, parse](struct digest* digest) {
     parse(reinterpret_cast<const unsigned char*>(input->bytes.data()),
           static_cast<int>(input->bytes.size()), digest);
   };
-  return {name, [call] { call(nullptr); },
+  return {[call] { call(nullptr); },
           [call, input] {
             struct digest digest = {0};
             call(&digest);
@@ -51,27 +50,27 @@ Case parser(const std::string& name, const Received& received, Parse parse) {
           }};
 }
 
-Case echo_reply(const std::string& name, int /*amount*/) {
-  return serializer(name, echo_reply_bytes(),
+Case echo_reply(int /*amount*/) {
+  return serializer(echo_reply_bytes(),
                     [](int* size) { return implementation.echo_reply(kRequestId, size); });
 }
 
-Case chat_request(const std::string& name, int length) {
+Case chat_request(int length) {
   const std::string text = text_of(length);
-  return serializer(name, chat_request_bytes(text),
+  return serializer(chat_request_bytes(text),
                     [text](int* size) { return implementation.chat_request(text.c_str(), size); });
 }
 
-Case chat_reply(const std::string& name, int entries) {
-  return parser(name, chat_reply_of(entries), implementation.chat_reply);
+Case chat_reply(int entries) {
+  return parser(chat_reply_of(entries), implementation.chat_reply);
 }
 
-Case message_page(const std::string& name, int messages) {
-  return parser(name, message_page_of(messages), implementation.message_page);
+Case message_page(int messages) {
+  return parser(message_page_of(messages), implementation.message_page);
 }
 
-Case chatroom_entry(const std::string& name, int members) {
-  return parser(name, chatroom_entry_of(members), implementation.chatroom_entry);
+Case chatroom_entry(int members) {
+  return parser(chatroom_entry_of(members), implementation.chatroom_entry);
 }
 
 const std::vector<Call>& calls() {
@@ -115,7 +114,7 @@ Case make_case(const std::string& name) {
   for (const Call& call : calls()) {
     for (const int amount : call.amounts) {
       if (call.is_implemented && name_of(call, amount) == name) {
-        return call.make(name, amount);
+        return call.make(amount);
       }
     }
   }

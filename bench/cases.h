@@ -9,7 +9,6 @@
 #include <vector>
 
 struct Case {
-  std::string name;
   // The call as a user would make it, what it hands out freed.
   std::function<void()> call;
   // Whether what it hands out is right.

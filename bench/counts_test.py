@@ -12,6 +12,8 @@ import measure
 
 PUBLISHED = pathlib.Path(__file__).resolve().parent.parent / "docs" / "benchmark" / "results.json"
 
+SKIPPED = 77  # as the build's files say it
+
 # A parser's own: the input stream that it keeps.
 KEPT_BY_PARSERS = 1
 
@@ -41,7 +43,12 @@ def kept_blocks(case, ours, floor):
 
 
 def instructions_are_those_published():
-    published = json.loads(PUBLISHED.read_text())["instructions"][build.folder.name]
+    results = json.loads(PUBLISHED.read_text())
+    compiler = results["compilers"][build.folder.name]
+    if build.compiler != compiler:
+        print(f"published for {compiler}, not {build.compiler}")
+        sys.exit(SKIPPED)
+    published = results["instructions"][build.folder.name]
     for case in measure.CASES:
         for implementation in ("ours", "floor"):
             listed = published[case][implementation]
@@ -57,8 +64,8 @@ def instructions_are_within_the_bars():
                f"{case}: {ours:.0f} instructions, more than {bar} of {floor:.0f}")
 
 
-# Beyond a hundred entries, a further one takes as many blocks as the one before, but for the arrays
-# that the classes double now and then.
+# Each further entry takes as many blocks as the one before, but for the arrays that the classes double
+# now and then.
 def allocations_grow_with_the_entries():
     for call, amounts in measure.AMOUNTS.items():
         taken = [build.blocks("ours", f"{call}/{amount}", 1)[0] for amount in amounts]
@@ -67,8 +74,9 @@ def allocations_grow_with_the_entries():
             expect(len(set(taken[1:])) == 1, f"{call}: {taken} blocks for texts of {amounts} bytes")
             continue
         slopes = [(after - before) / (more - fewer) for before, after, fewer, more
-                  in zip(taken[2:], taken[3:], amounts[2:], amounts[3:])]
-        expect(max(slopes) <= 1.02 * min(slopes), f"{call}: {taken} blocks for {amounts} entries")
+                  in zip(taken, taken[1:], amounts, amounts[1:])]
+        expect(max(slopes) <= 1.25 * min(slopes) and max(slopes[2:]) <= 1.02 * min(slopes[2:]),
+               f"{call}: {taken} blocks for {amounts} entries")
 
 
 CASES = {

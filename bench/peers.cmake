@@ -19,6 +19,11 @@ function(qel_peer_schema peer file)
   target_include_directories(${peer}-schema SYSTEM PUBLIC "${folder}")
 endfunction()
 
+execute_process(COMMAND "${QEL_PEER_PROTOC}" --version OUTPUT_VARIABLE _peer_version)
+if(NOT _peer_version MATCHES "^libprotoc 3\\.21\\.") # under which name it is published
+  message(FATAL_ERROR "The benchmark compares with Protocol Buffers 3.21, but ${QEL_PEER_PROTOC} is '${_peer_version}'.")
+endif()
+
 # Without assertions, as its users build for release; with that goes its check of texts for UTF-8.
 find_library(QEL_PEER_PROTOBUF NAMES protobuf REQUIRED)
 qel_peer_schema(protobuf3 msgspec_frontend.pb.cc

@@ -14,6 +14,7 @@
 #include "calls.h"
 #include "inputs.h"
 #include "msgspec_frontend.pb.h"
+#include "qel-message-serialize.h"
 
 namespace {
 
@@ -65,11 +66,23 @@ void kept_stream(benchmark::State& state) {
   }
 }
 
+void whole(benchmark::State& state) {
+  const std::string text = text_of(100);
+  for (auto _ : state) {
+    unsigned char* block = nullptr;
+    int size = 0;
+    chat_request_serialize(kRequestId, kChatroomId, kMessageId, kMessageType, text.c_str(),
+                           kMessageTtl, 0, &block, &size);
+    free(block);
+  }
+}
+
 BENCHMARK(chat_request<kObject>)->Name("object");
 BENCHMARK(chat_request<kFields>)->Name("fields");
 BENCHMARK(chat_request<kLength>)->Name("length");
 BENCHMARK(chat_request<kBlock>)->Name("block");
 BENCHMARK(chat_request<kEncoding>)->Name("encoding");
+BENCHMARK(whole);
 BENCHMARK(thread_id);
 BENCHMARK(kept_stream);
 

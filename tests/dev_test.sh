@@ -146,9 +146,13 @@ case $1 in
     grep -q '^usage: ./dev COMMAND' "$scratch/out" || refuse 'no usage'
     [ ! -e "$scratch/checkout/.deps" ] || refuse 'left something behind'
     ;;
-  unknown_fuzz_target)
+  unknown_fuzz_target | rounds_that_are_no_number)
     status=0
-    "$scratch/checkout/dev" fuzz frobnicate >"$scratch/out" 2>&1 || status=$?
+    case $1 in
+      unknown_fuzz_target) arguments=(fuzz frobnicate) ;;
+      rounds_that_are_no_number) arguments=(bench --rounds many) ;;
+    esac
+    "$scratch/checkout/dev" "${arguments[@]}" >"$scratch/out" 2>&1 || status=$?
     [ "$status" -eq 2 ] || refuse "exit status $status"
     grep -q '^usage: ./dev COMMAND' "$scratch/out" || refuse 'no usage'
     ;;
