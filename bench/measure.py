@@ -36,8 +36,8 @@ class Build:
 
     @property
     def compiler(self):
-        cache = (self.folder / "CMakeCache.txt").read_text()
-        path = re.search(r"^CMAKE_CXX_COMPILER:\w+=(.+)$", cache, re.MULTILINE)[1]
+        found, = self.folder.glob("CMakeFiles/*/CMakeCXXCompiler.cmake")
+        path = re.search(r'set\(CMAKE_CXX_COMPILER "(.+)"\)', found.read_text())[1]
         return self.run([path, "--version"]).stdout.splitlines()[0]
 
     def run(self, command, **settings):
