@@ -69,7 +69,7 @@ ALLOCATORS = {"glibc's": {},
               "jemalloc": {"LD_PRELOAD": "libjemalloc.so.2"}}
 
 
-def benchmark(program, case="", counter="cpu_time", seconds=0.05, settings=None):
+def benchmark(program, case="", counter="cpu_time", seconds=0.02, settings=None):
     """Nanoseconds of the program's benchmarks, by name; of all, or those of a case."""
     pattern = f"^{re.escape(case)}(/real_time/threads:.*)?$" if case else "."
     out = subprocess.run([program, f"--benchmark_filter={pattern}", "--benchmark_format=json",
