@@ -5,9 +5,8 @@
 #include <cstring>
 #include <string>
 
-#include "calls.h"
 #include "msgspec_frontend.pb.h"
-#include "qel-message-serialize.h"
+#include "records.h"
 
 namespace {
 
@@ -121,15 +120,9 @@ void chat_reply(const unsigned char* data, int size, struct digest* digest) {
   const ProcessedMessages read = read_chat_reply(data, size);
   if (digest != nullptr) {
     digest_head(digest, read.head);
-    digest_number(digest, read.count);
-    for (int i = 0; i < read.count; ++i) {
-      digest_number(digest, read.ids[i]);
-      digest_number(digest, read.times[i]);
-    }
   }
   free(read.head.text);
-  free(read.ids);
-  free(read.times);
+  finish_processed(read.ids, read.times, read.count, digest);
 }
 
 struct Page {
@@ -168,26 +161,11 @@ void message_page(const unsigned char* data, int size, struct digest* digest) {
   const Page page = read_message_page(data, size);
   if (digest != nullptr) {
     digest_number(digest, page.request_id);
-    digest_number(digest, page.count);
-    for (int i = 0; i < page.count; ++i) {
-      const qel_message_inboxentry_t& record = *page.entries[i];
-      digest_number(digest, record.msgId);
-      digest_number(digest, record.msgType);
-      digest_number(digest, record.sender);
-      digest_number(digest, record.receiver);
-      digest_number(digest, record.sentTime);
-      digest_text(digest, record.chatMsg);
-      digest_number(digest, record.chatroomId);
-      digest_number(digest, record.chatType);
-      digest_number(digest, record.msgTtl);
-    }
+  }
+  finish_messages(page.entries, page.count, digest);
+  if (digest != nullptr) {
     digest_text(digest, page.next);
   }
-  for (int i = 0; i < page.count; ++i) {
-    free(page.entries[i]->chatMsg);
-    free(page.entries[i]);
-  }
-  free(page.entries);
   free(page.next);
 }
 
@@ -208,22 +186,6 @@ Watermarks copy_watermarks(const google::protobuf::RepeatedPtrField<WaterMarkEnt
     record->timestamp = mark.timestamp();
   }
   return copy;
-}
-
-void digest_watermarks(struct digest* digest, const Watermarks& marks) {
-  digest_number(digest, marks.count);
-  for (int i = 0; i < marks.count; ++i) {
-    digest_number(digest, marks.entries[i]->userId);
-    digest_number(digest, marks.entries[i]->msgId);
-    digest_number(digest, marks.entries[i]->timestamp);
-  }
-}
-
-void release(const Watermarks& marks) {
-  for (int i = 0; i < marks.count; ++i) {
-    free(marks.entries[i]);
-  }
-  free(marks.entries);
 }
 
 struct Chatroom {
@@ -267,26 +229,18 @@ void chatroom_entry(const unsigned char* data, int size, struct digest* digest) 
   if (digest != nullptr) {
     digest_head(digest, room.head);
     digest_number(digest, room.delivery_time);
-    digest_watermarks(digest, room.delivery);
+  }
+  finish_watermarks(room.delivery.entries, room.delivery.count, digest);
+  if (digest != nullptr) {
     digest_number(digest, room.read_time);
-    digest_watermarks(digest, room.read);
-    digest_number(digest, room.member_count);
-    for (int i = 0; i < room.member_count; ++i) {
-      digest_number(digest, room.members[i]->userId);
-      digest_number(digest, room.members[i]->available);
-      digest_text(digest, room.members[i]->name);
-    }
+  }
+  finish_watermarks(room.read.entries, room.read.count, digest);
+  finish_members(room.members, room.member_count, digest);
+  if (digest != nullptr) {
     digest_text(digest, room.title);
     digest_number(digest, room.msg_ttl);
   }
   free(room.head.text);
-  release(room.delivery);
-  release(room.read);
-  for (int i = 0; i < room.member_count; ++i) {
-    free(room.members[i]->name);
-    free(room.members[i]);
-  }
-  free(room.members);
   free(room.title);
 }
 

@@ -10,12 +10,7 @@ import sys
 
 import measure
 
-PUBLISHED = pathlib.Path(__file__).resolve().parent.parent / "docs" / "benchmark" / "results.json"
-
 SKIPPED = 77  # as the build's files say it
-
-# A parser's own: the input stream that it keeps.
-KEPT_BY_PARSERS = 1
 
 build = measure.build_of(pathlib.Path(sys.argv[2]))
 wrong = []
@@ -26,24 +21,24 @@ def expect(holds, text):
         wrong.append(text)
 
 
-def compare_blocks(cases, check):
-    for case in cases:
+def compare_blocks(check):
+    for case in measure.ALL_CASES:
         check(case, build.blocks("ours", case), build.blocks("floor", case))
 
 
 def allocations(case, ours, floor):
-    expected = floor[0] + (KEPT_BY_PARSERS if measure.is_parser(case) else 0)
+    expected = floor[0] + measure.kept_blocks(case)
     expect(ours[0] == expected, f"{case}: {ours[0]} allocations instead of {expected}")
 
 
 def kept_blocks(case, ours, floor):
-    expected = KEPT_BY_PARSERS if measure.is_parser(case) else 0
+    expected = measure.kept_blocks(case)
     expect(ours[1] == expected, f"{case}: {ours[1]} blocks kept instead of {expected}")
     expect(floor[1] == 0, f"{case}: what it is compared with keeps {floor[1]}")
 
 
 def instructions_are_those_published():
-    results = json.loads(PUBLISHED.read_text())
+    results = json.loads((measure.PUBLISHED / "results.json").read_text())
     compiler = results["compilers"][build.folder.name]
     if build.compiler != compiler:
         print(f"published for {compiler}, not {build.compiler}")
@@ -81,9 +76,9 @@ def allocations_grow_with_the_entries():
 
 CASES = {
     "allocations_are_those_of_the_classes_and_the_stream":
-        lambda: compare_blocks(["echo_reply", "chat_reply/50", *measure.GROWTH], allocations),
+        lambda: compare_blocks(allocations),
     "parsers_keep_the_stream_alone":
-        lambda: compare_blocks(["echo_reply", "chat_reply/50", *measure.GROWTH], kept_blocks),
+        lambda: compare_blocks(kept_blocks),
     "allocations_grow_with_the_entries": allocations_grow_with_the_entries,
     "instructions_are_those_published": instructions_are_those_published,
     "instructions_are_within_the_bars": instructions_are_within_the_bars,

@@ -19,8 +19,18 @@ AMOUNTS = {"chat_request": [10, 100, 1000, 10000, 40000], "chat_reply": [1, 10, 
 GROWTH = [f"{call}/{amount}" for call, amounts in AMOUNTS.items() for amount in amounts]
 
 
+ALL_CASES = list(dict.fromkeys([*CASES, *GROWTH]))
+
+PUBLISHED = pathlib.Path(__file__).resolve().parent.parent / "docs" / "benchmark"
+
+
 def is_parser(case):
     return case.split("/")[0] in ("chat_reply", "message_page", "chatroom_entry")
+
+
+def kept_blocks(case):
+    """A parser keeps its input stream."""
+    return 1 if is_parser(case) else 0
 
 
 @dataclasses.dataclass
@@ -39,6 +49,10 @@ class Build:
         found, = self.folder.glob("CMakeFiles/*/CMakeCXXCompiler.cmake")
         path = re.search(r'set\(CMAKE_CXX_COMPILER "(.+)"\)', found.read_text())[1]
         return self.run([path, "--version"]).stdout.splitlines()[0]
+
+    def setting(self, name):
+        cache = (self.folder / "CMakeCache.txt").read_text()
+        return re.search(rf"^{name}:\w+=(.+)$", cache, re.MULTILINE)[1]
 
     def run(self, command, **settings):
         done = subprocess.run(command, stdout=subprocess.PIPE, stderr=subprocess.PIPE, text=True,

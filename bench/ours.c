@@ -2,8 +2,7 @@
 
 #include <stdlib.h>
 
-#include "calls.h"
-#include "qel-message-serialize.h"
+#include "records.h"
 
 static unsigned char* echo_reply(int64_t request_id, int* size) {
   unsigned char* block = NULL;
@@ -30,7 +29,6 @@ static void chat_reply(const unsigned char* data, int size, struct digest* diges
   int count = -1;
   int64_t* ids = NULL;
   int64_t* times = NULL;
-  int i;
   chat_reply_deserialize(data, size, &request_id, &chatroom_id, &code, &msg, &count, &ids, &times);
   if (count < 0) {
     abort();
@@ -40,15 +38,9 @@ static void chat_reply(const unsigned char* data, int size, struct digest* diges
     digest_number(digest, chatroom_id);
     digest_number(digest, code);
     digest_text(digest, msg);
-    digest_number(digest, count);
-    for (i = 0; i < count; ++i) {
-      digest_number(digest, ids[i]);
-      digest_number(digest, times[i]);
-    }
   }
   free(msg);
-  free(ids);
-  free(times);
+  finish_processed(ids, times, count, digest);
 }
 
 static void message_page(const unsigned char* data, int size, struct digest* digest) {
@@ -56,49 +48,18 @@ static void message_page(const unsigned char* data, int size, struct digest* dig
   qel_message_inboxentry_t** entries = NULL;
   int count = -1;
   char* next = NULL;
-  int i;
   forward_unread_message_deserialize(data, size, &request_id, &entries, &count, &next);
   if (count < 0) {
     abort();
   }
   if (digest != NULL) {
     digest_number(digest, request_id);
-    digest_number(digest, count);
-    for (i = 0; i < count; ++i) {
-      digest_number(digest, entries[i]->msgId);
-      digest_number(digest, entries[i]->msgType);
-      digest_number(digest, entries[i]->sender);
-      digest_number(digest, entries[i]->receiver);
-      digest_number(digest, entries[i]->sentTime);
-      digest_text(digest, entries[i]->chatMsg);
-      digest_number(digest, entries[i]->chatroomId);
-      digest_number(digest, entries[i]->chatType);
-      digest_number(digest, entries[i]->msgTtl);
-    }
+  }
+  finish_messages(entries, count, digest);
+  if (digest != NULL) {
     digest_text(digest, next);
   }
-  for (i = 0; i < count; ++i) {
-    free(entries[i]->chatMsg);
-    free(entries[i]);
-  }
-  free(entries);
   free(next);
-}
-
-static void release_marks(qel_message_watermarkentry_t** marks, int count, struct digest* digest) {
-  int i;
-  if (digest != NULL) {
-    digest_number(digest, count);
-    for (i = 0; i < count; ++i) {
-      digest_number(digest, marks[i]->userId);
-      digest_number(digest, marks[i]->msgId);
-      digest_number(digest, marks[i]->timestamp);
-    }
-  }
-  for (i = 0; i < count; ++i) {
-    free(marks[i]);
-  }
-  free(marks);
 }
 
 static void chatroom_entry(const unsigned char* data, int size, struct digest* digest) {
@@ -116,7 +77,6 @@ static void chatroom_entry(const unsigned char* data, int size, struct digest* d
   int member_count = -1;
   char* title = NULL;
   int ttl = -1;
-  int i;
   allow_chat_reply_deserialize(data, size, &request_id, &chatroom_id, &code, &msg, &deliveries,
                                &delivery_count, &delivery_time, &reads, &read_count, &read_time,
                                &members, &member_count, &title, &ttl);
@@ -130,26 +90,16 @@ static void chatroom_entry(const unsigned char* data, int size, struct digest* d
     digest_text(digest, msg);
     digest_number(digest, delivery_time);
   }
-  release_marks(deliveries, delivery_count, digest);
+  finish_watermarks(deliveries, delivery_count, digest);
   if (digest != NULL) {
     digest_number(digest, read_time);
   }
-  release_marks(reads, read_count, digest);
+  finish_watermarks(reads, read_count, digest);
+  finish_members(members, member_count, digest);
   if (digest != NULL) {
-    digest_number(digest, member_count);
-    for (i = 0; i < member_count; ++i) {
-      digest_number(digest, members[i]->userId);
-      digest_number(digest, members[i]->available);
-      digest_text(digest, members[i]->name);
-    }
     digest_text(digest, title);
     digest_number(digest, ttl);
   }
-  for (i = 0; i < member_count; ++i) {
-    free(members[i]->name);
-    free(members[i]);
-  }
-  free(members);
   free(msg);
   free(title);
 }

@@ -24,7 +24,6 @@ import sys
 import measure
 
 ROOT = pathlib.Path(__file__).resolve().parent.parent
-PUBLISHED = ROOT / "docs" / "benchmark"
 PAGE = ROOT / "docs" / "performance.md"
 
 # The programs, and what they are called in the report.
@@ -45,7 +44,7 @@ CASE_NAMES = {
 }
 PRESETS = {"bench": "x86-64", "armhf": "ARM, hard float", "armel": "ARM, soft float"}
 ROUNDS, FEWEST_PUBLISHED = 21, 11
-SINGLE = ["echo_reply", "chat_request/100", "chat_request/40000", "chat_reply/1"]
+SINGLE = [case for case in measure.CASES if case not in measure.LISTS]
 
 # The bars: see docs/performance.md. Those of times were set on a machine whose kernel tells a thread id
 # in 72 ns, and where a stream takes 48 ns.
@@ -106,7 +105,6 @@ def in_turn(programs, number):
 def time_calls(build, rounds):
     """Of all programs in all cases, of growth too, and what the interface adds."""
     times = Rounds()
-    growth = [case for case in measure.GROWTH if case not in measure.CASES]
     for number in range(rounds):
         say(f"round {number + 1} of {rounds}")
         for case in measure.CASES:
@@ -114,7 +112,7 @@ def time_calls(build, rounds):
                 if program != "by_hand" or case in BY_HAND:
                     time = benchmark(build.program("time_calls", program), case)[case]
                     times.add((program, case), time)
-        for case in growth:
+        for case in measure.ALL_CASES[len(measure.CASES):]:
             for program in in_turn(["ours", "floor"], number):
                 times.add((program, case), benchmark(build.program("time_calls", program), case)[case])
         for case in ("chat_request/100", "chat_reply/1"):
@@ -133,7 +131,7 @@ def time_calls(build, rounds):
 def time_loading(build, rounds):
     libraries = {
         "plain": (build.folder / "bench" / "libplain-protosvc.so", {}),
-        "ours, plain runtime": (build.library, {"LD_LIBRARY_PATH": str(plain_runtime(build))}),
+        "ours, plain runtime": (build.library, {"LD_LIBRARY_PATH": build.setting("QEL_PLAIN_PROTOBUF_ROOT") + "/lib"}),
         "ours": (build.library, {}),
     }
     times = Rounds()
@@ -144,19 +142,11 @@ def time_loading(build, rounds):
     return times
 
 
-def plain_runtime(build):
-    cache = (build.folder / "CMakeCache.txt").read_text()
-    return pathlib.Path(re.search(r"^QEL_PLAIN_PROTOBUF_ROOT:\w+=(.+)$", cache, re.MULTILINE)[1]) / "lib"
-
-
 def size_of(build, scratch):
     """Bytes of the stripped library, and its relocations."""
-    cache = (build.folder / "CMakeCache.txt").read_text()
-    strip = re.search(r"^CMAKE_STRIP:\w+=(.+)$", cache, re.MULTILINE)[1]
     stripped = scratch / f"{build.folder.name}.so"
-    subprocess.run([strip, "-o", stripped, build.library], check=True)
-    listed = subprocess.run(["readelf", "-rW", build.library], check=True, stdout=subprocess.PIPE,
-                            text=True).stdout
+    build.run([build.setting("CMAKE_STRIP"), "-o", stripped, build.library])
+    listed = build.run(["readelf", "-rW", build.library]).stdout
     relocations = [line for line in listed.splitlines() if re.match(r"^[0-9a-f]{8,} ", line)]
     return {"bytes": stripped.stat().st_size, "relocations": len(relocations)}
 
@@ -176,7 +166,6 @@ def measure_all(build, arm_builds, rounds):
     scratch = build.folder / "bench" / "stripped"
     shutil.rmtree(scratch, ignore_errors=True)
     scratch.mkdir()
-    cases = [*measure.CASES, *(case for case in measure.GROWTH if case not in measure.CASES)]
     return {
         "date": datetime.date.today().isoformat(),
         "command": "./dev bench" + (f" --rounds {rounds}" if rounds != ROUNDS else ""),
@@ -184,9 +173,9 @@ def measure_all(build, arm_builds, rounds):
         "compilers": {each.folder.name: each.compiler for each in builds},
         "rounds": rounds,
         "time": {case: {program: times.median((program, case)) for program in TIMED
-                        if (program, case) in times.values} for case in cases},
+                        if (program, case) in times.values} for case in measure.ALL_CASES},
         "ratio": {case: {program: times.ratio((program, case), ("floor", case)) for program in TIMED
-                         if (program, case) in times.values} for case in cases},
+                         if (program, case) in times.values} for case in measure.ALL_CASES},
         "at_once": {case: {threads: times.median(("at_once", case, threads)) for threads in (1, 2)}
                     for case in ("chat_request/100", "chat_reply/1")},
         "parts": {name[1]: times.median(name) for name in times.values if name[0] == "part"},
@@ -223,7 +212,8 @@ class Bar:
     def row(self):
         form = ",.2f" if self.is_ratio else ",d"
         return [self.name, format(self.shown(self.measured), form),
-                ("exactly " if self.is_exact else "") + format(self.shown(self.at_most), form), "met" if self.is_met() else "**not met**"]
+                ("exactly " if self.is_exact else "") + format(self.shown(self.at_most), form),
+                "met" if self.is_met() else "**not met**"]
 
 
 def bars(results):
@@ -244,7 +234,7 @@ def bars(results):
                   time["ours_no_kernel"], time["floor"] + allowed)
     for case in measure.CASES:
         blocks = results["blocks"][case]
-        kept = 1 if measure.is_parser(case) else 0
+        kept = measure.kept_blocks(case)
         yield Bar(f"{CASE_NAMES[case]}: blocks allocated", blocks["ours"][0], blocks["floor"][0] + kept,
                   is_exact=True)
         yield Bar(f"{CASE_NAMES[case]}: blocks kept", blocks["ours"][1], kept, is_exact=True)
@@ -378,9 +368,9 @@ def main():
     arguments = argparse.ArgumentParser(usage=__doc__)
     arguments.add_argument("builds", nargs="+", type=pathlib.Path)
     arguments.add_argument("--rounds", type=int, default=ROUNDS)
-    arguments.add_argument("--to", type=pathlib.Path, default=PUBLISHED)
+    arguments.add_argument("--to", type=pathlib.Path, default=measure.PUBLISHED)
     given = arguments.parse_args()
-    if given.to == PUBLISHED:
+    if given.to == measure.PUBLISHED:
         if given.rounds < FEWEST_PUBLISHED:
             sys.exit(f"bench: not published with fewer than {FEWEST_PUBLISHED} rounds")
         for mark in EMBEDDED:  # they are there
@@ -392,7 +382,7 @@ def main():
     results = json.loads((given.to / "results.json").read_text(), object_hook=numbers_as_keys)
     (given.to / "README.md").write_text(report(results))
     plot(results, given.to)
-    if given.to == PUBLISHED:
+    if given.to == measure.PUBLISHED:
         for mark, table_of in EMBEDDED.items():
             embed(table_of(results), PAGE, mark)
     missed = [bar.name for bar in bars(results) if not bar.is_met()]

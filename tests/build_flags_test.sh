@@ -31,6 +31,11 @@ case $1 in
     compiled | awk -F '\t' '$1 ~ "/proto-lib/[^/]*$"' | without -U_FORTIFY_SOURCE -D_FORTIFY_SOURCE=2 |
       none
     ;;
+  library_is_compiled_for_speed)
+    flags=(-fno-semantic-interposition)
+    case $(readelf -h "$build/$library") in *X86-64*) flags+=(-fno-plt) ;; esac
+    compiled | awk -F '\t' '$1 ~ "/proto-lib/whole-library.cc$"' | without "${flags[@]}" | none
+    ;;
   library_is_not_linked_with_undefined_symbols)
     # Its own command, but without the log service.
     scratch=$(mktemp -d)

@@ -62,16 +62,8 @@ TEST_P(EverySerializer, WhenSucceeding_LogsEntryAndExit) {
 }
 
 TEST_P(EverySerializer, WhenItLogsItsExit_HasEncoded) {
-  std::string encoding_at_exit;
-  {
-    const support::LogObserver observer([&](const support::LogCall& call) {
-      if (call.format.find("%s: exit") != std::string::npos) {
-        encoding_at_exit = out_.bytes();
-      }
-    });
-    call();
-  }
-  EXPECT_EQ(to_hex(encoding_at_exit), to_hex(out_.bytes()));
+  const std::string encoding = support::encoding_at_exit(out_, [this] { call(); });
+  EXPECT_EQ(to_hex(encoding), to_hex(out_.bytes()));
 }
 
 TEST_P(EverySerializer, WhenSucceeding_AllocatesOneZeroedBufferOfTheLength) {

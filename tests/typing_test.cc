@@ -127,16 +127,8 @@ TEST_F(IsTypingRequestSerialize, WhenSucceeding_LogsEntryAndExit) {
 }
 
 TEST_F(IsTypingRequestSerialize, WhenItLogsItsExit_HasEncoded) {
-  std::string encoding_at_exit;
-  {
-    const support::LogObserver observer([&](const support::LogCall& call) {
-      if (call.format.find("%s: exit") != std::string::npos) {
-        encoding_at_exit = out_.bytes();
-      }
-    });
-    call_with_all();
-  }
-  EXPECT_EQ(to_hex(encoding_at_exit), "58 01 60 02 6a 02 6f 6e 70 01 78 ac 02");
+  const std::string encoding = support::encoding_at_exit(out_, [this] { call_with_all(); });
+  EXPECT_EQ(to_hex(encoding), "58 01 60 02 6a 02 6f 6e 70 01 78 ac 02");
 }
 
 TEST_F(IsTypingRequestSerialize, WhenSucceeding_AllocatesOneZeroedBufferOfTheLength) {

@@ -7,6 +7,7 @@
 
 #include <cstdint>
 #include <limits>
+#include <string>
 
 #include "support/log_capture.h"
 #include "support/received.h"
@@ -33,6 +34,19 @@ constexpr size_t kStreamSize = sizeof(google::protobuf::io::CodedInputStream);
 // The two error texts of a parse.
 inline const char kMergeError[] = "merge error : Could not parse the received data!";
 inline const char kStreamError[] = "ConsumedEntireMessage error :Could not parse the received data";
+
+// The encoding as it is when a serializer logs its exit.
+template <typename Call>
+std::string encoding_at_exit(const Encoded& out, Call call) {
+  std::string encoding;
+  const LogObserver observer([&](const LogCall& line) {
+    if (line.format.find("%s: exit") != std::string::npos) {
+      encoding = out.bytes();
+    }
+  });
+  call();
+  return encoding;
+}
 
 }  // namespace support
 

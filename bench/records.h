@@ -1,0 +1,24 @@
+/*
+ * The lists that the interface hands out, and the floor as it does: each function adds the list to
+ * the digest, unless that is NULL, and releases it.
+ */
+#ifndef BENCH_RECORDS_H
+#define BENCH_RECORDS_H
+
+#include "calls.h"
+#include "qel-message-serialize.h"
+
+#ifdef __cplusplus
+extern "C" {
+#endif
+
+void finish_processed(int64_t* ids, int64_t* times, int count, struct digest* digest);
+void finish_messages(qel_message_inboxentry_t** messages, int count, struct digest* digest);
+void finish_watermarks(qel_message_watermarkentry_t** marks, int count, struct digest* digest);
+void finish_members(qel_message_chatroommember_t** members, int count, struct digest* digest);
+
+#ifdef __cplusplus
+}
+#endif
+
+#endif
