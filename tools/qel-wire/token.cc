@@ -20,9 +20,11 @@ bool is_access_token(const Piece& piece) {
 }
 
 void hide_access_token(google::protobuf::Message* message) {
-  auto* request = dynamic_cast<ChannelAuthRequest*>(message);
-  if (request != nullptr && request->has_accesstoken()) {
-    request->set_accesstoken(kNotShown);
+  if (message->GetDescriptor() == ChannelAuthRequest::descriptor()) {
+    auto* request = static_cast<ChannelAuthRequest*>(message);
+    if (request->has_accesstoken()) {
+      request->set_accesstoken(kNotShown);
+    }
   }
   UnknownFieldSet* unknown = message->GetReflection()->MutableUnknownFields(message);
   for (int i = 0; i < unknown->field_count(); ++i) {

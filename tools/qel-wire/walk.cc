@@ -101,7 +101,7 @@ class Walk {
       case WireFormatLite::WIRETYPE_FIXED32:
         return fixed(piece, Piece::kFixed32, 4, end);
       case WireFormatLite::WIRETYPE_LENGTH_DELIMITED:
-        if (piece.is_known && piece.field->message_type() != nullptr) {
+        if (piece.is_known && piece.field != nullptr && piece.field->message_type() != nullptr) {
           return message(piece, end);
         }
         return text(piece, end);

@@ -1,0 +1,1 @@
+// Nothing: what the tests have in common are the headers that are compiled with it.
