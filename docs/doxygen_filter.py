@@ -1,0 +1,80 @@
+#!/usr/bin/env python3
+"""A Markdown page as Doxygen takes it, while viewers of Markdown have it as it is.
+
+usage: doxygen_filter.py PAGE
+
+Mermaid's sequence diagrams become PlantUML's, whose language is the same but for the participants.
+Headings get names, and links go to these; functions are links. A file that is not in the reference
+is named, not linked.
+"""
+
+import collections
+import os
+import re
+import sys
+
+IMAGE_OR_LINK = re.compile(r"(!?)\[((?:[^][]|\[[^][]*\])*)\]\(([^()\s]+)\)")
+
+
+def slug(heading):
+    """The anchor that viewers of Markdown give a heading, if it is the first of its kind."""
+    plain = IMAGE_OR_LINK.sub(r"\2", heading).lower()
+    return re.sub(r"[^\w\- ]", "", plain).replace(" ", "-")
+
+
+def name_of(page, anchor=""):
+    """The name of a page, or of a heading on it, among those of all pages."""
+    name = re.sub(r"\W", "_", os.path.splitext(page)[0])
+    name = "mainpage" if name == "README" else f"page_{name}"  # which is Doxygen's for the first
+    return f"{name}_{anchor}" if anchor else name
+
+
+def link(match, page):
+    image, text, target = match.groups()
+    if image or re.match(r"\w+:", target):
+        return match[0]
+    path, _, anchor = target.partition("#")
+    path = os.path.normpath(os.path.join(os.path.dirname(page), path)) if path else page
+    if path.endswith(".md"):
+        return f"[{text}](@ref {name_of(path, anchor)})"
+    if path == "proto-lib/qel-message-serialize.h":
+        return f"[{text}](@ref {os.path.basename(path)})"
+    return text
+
+
+def prose(line, page, slugs):
+    line = IMAGE_OR_LINK.sub(lambda match: link(match, page), line)
+    line = re.sub(r"(?<!\[)`(\w+_(?:de)?serialize)`", r"[`\1`](@ref \1)", line)
+    line = re.sub(r"`(::\w+)`", r"<code>\\\1</code>", line)  # or Doxygen looks for it
+    heading = re.fullmatch(r"(#+) (.*)", line)
+    if not heading:
+        return line
+    anchor = "" if heading[1] == "#" else slug(heading[2])
+    slugs[anchor] += 1
+    if slugs[anchor] > 1:
+        anchor += f"-{slugs[anchor] - 1}"
+    return f"{line} {{#{name_of(page, anchor)}}}"
+
+
+def diagram(line):
+    line = re.sub(r"^sequenceDiagram$", "@startuml", line)
+    return re.sub(r"participant (\w+) as (.+)", r'participant "\2" as \1', line)
+
+
+def main(page):
+    fence, slugs = "", collections.Counter()  # fence: the one that opens the block of this line
+    for line in open(page, encoding="utf-8"):
+        line = line.rstrip("\n")
+        if line.startswith("```"):
+            mermaid = "```mermaid" in (fence, line)
+            fence = "" if fence else line
+            if mermaid:
+                line = "" if fence else "@enduml"
+        elif fence == "```mermaid":
+            line = diagram(line)
+        elif not fence:
+            line = prose(line, page, slugs)
+        print(line)
+
+
+main(os.path.relpath(sys.argv[1]))
