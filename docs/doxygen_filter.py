@@ -33,18 +33,19 @@ def link(match, page):
     image, text, target = match.groups()
     if image or re.match(r"\w+:", target):
         return match[0]
+    plain = text.replace("`", "")  # which the text of a link to a name may not have
     path, _, anchor = target.partition("#")
     path = os.path.normpath(os.path.join(os.path.dirname(page), path)) if path else page
     if path.endswith(".md"):
-        return f"[{text}](@ref {name_of(path, anchor)})"
+        return f"[{plain}](@ref {name_of(path, anchor)})"
     if path == "proto-lib/qel-message-serialize.h":
-        return f"[{text}](@ref {os.path.basename(path)})"
+        return f"[{plain}](@ref {os.path.basename(path)})"
     return text
 
 
 def prose(line, page, slugs):
     line = IMAGE_OR_LINK.sub(lambda match: link(match, page), line)
-    line = re.sub(r"(?<!\[)`(\w+_(?:de)?serialize)`", r"[`\1`](@ref \1)", line)
+    line = re.sub(r"(?<!\[)`(\w+_(?:de)?serialize)`", r"[\1](@ref \1)", line)
     line = re.sub(r"`(::\w+)`", r"<code>\\\1</code>", line)  # or Doxygen looks for it
     heading = re.fullmatch(r"(#+) (.*)", line)
     if not heading:
