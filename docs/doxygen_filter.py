@@ -33,7 +33,7 @@ def link(match, page):
     image, text, target = match.groups()
     if image or re.match(r"\w+:", target):
         return match[0]
-    plain = text.replace("`", "")  # which the text of a link to a name may not have
+    plain = " ".join(text.replace("`", "").split())  # as Doxygen wants the text of a link to a name
     path, _, anchor = target.partition("#")
     path = os.path.normpath(os.path.join(os.path.dirname(page), path)) if path else page
     if path.endswith(".md"):
@@ -43,39 +43,36 @@ def link(match, page):
     return text
 
 
-def prose(line, page, slugs):
-    line = IMAGE_OR_LINK.sub(lambda match: link(match, page), line)
-    line = re.sub(r"(?<!\[)`(\w+_(?:de)?serialize)`", r"[\1](@ref \1)", line)
-    line = re.sub(r"`(::\w+)`", r"<code>\\\1</code>", line)  # or Doxygen looks for it
-    heading = re.fullmatch(r"(#+) (.*)", line)
-    if not heading:
-        return line
-    anchor = "" if heading[1] == "#" else slug(heading[2])
-    slugs[anchor] += 1
-    if slugs[anchor] > 1:
-        anchor += f"-{slugs[anchor] - 1}"
-    return f"{line} {{#{name_of(page, anchor)}}}"
+def prose(text, page, slugs):
+    def heading(match):
+        anchor = "" if match[1] == "#" else slug(match[2])
+        slugs[anchor] += 1
+        if slugs[anchor] > 1:
+            anchor += f"-{slugs[anchor] - 1}"
+        return f"{match[0]} {{#{name_of(page, anchor)}}}"
+
+    text = re.sub(r"^(#+) (.*)$", heading, text, flags=re.MULTILINE)
+    text = IMAGE_OR_LINK.sub(lambda match: link(match, page), text)
+    text = re.sub(r"(?<!\[)`(\w+_(?:de)?serialize)`", r"[\1](@ref \1)", text)
+    return re.sub(r"`(::\w+)`", r"<code>\\\1</code>", text)  # or Doxygen looks for it
 
 
-def diagram(line):
-    line = re.sub(r"^sequenceDiagram$", "@startuml", line)
-    return re.sub(r"participant (\w+) as (.+)", r'participant "\2" as \1', line)
+def diagram(block):
+    block = re.sub(r"^```mermaid\nsequenceDiagram$", "\n@startuml", block, flags=re.MULTILINE)
+    block = re.sub(r"^```$", "@enduml", block, flags=re.MULTILINE)
+    return re.sub(r"participant (\w+) as (.+)", r'participant "\2" as \1', block)
 
 
 def main(page):
-    fence, slugs = "", collections.Counter()  # fence: the one that opens the block of this line
-    for line in open(page, encoding="utf-8"):
-        line = line.rstrip("\n")
-        if line.startswith("```"):
-            mermaid = "```mermaid" in (fence, line)
-            fence = "" if fence else line
-            if mermaid:
-                line = "" if fence else "@enduml"
-        elif fence == "```mermaid":
-            line = diagram(line)
-        elif not fence:
-            line = prose(line, page, slugs)
-        print(line)
+    with open(page, encoding="utf-8") as file:
+        parts = re.split(r"^(```.*?^```$)", file.read(), flags=re.MULTILINE | re.DOTALL)
+    slugs = collections.Counter()
+    for i, part in enumerate(parts):
+        if i % 2 == 0:
+            part = prose(part, page, slugs)
+        elif part.startswith("```mermaid\n"):
+            part = diagram(part)
+        sys.stdout.write(part)
 
 
 main(os.path.relpath(sys.argv[1]))
