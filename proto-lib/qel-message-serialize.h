@@ -403,7 +403,7 @@ void get_all_unread_message_reply_deserialize(const unsigned char* data, int siz
  * ForwardOnlineMessageReply.
  *
  * @param requestId             that of the ForwardOnlineMessage which is acknowledged
- * @param chatroomId            the message's chatroom
+ * @param chatroomId            the chatroom
  * @param markAsRead            may be NULL
  * @param serialized_data,size  the encoded message
  * @return 0, or -1 after an error

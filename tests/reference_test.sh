@@ -35,11 +35,12 @@ case $1 in
         "$html/page_docs_interface.html") >&2
     ;;
   every_diagram_is_drawn)
-    in_pages=$(grep -cx '```mermaid' "$source/docs/interface.md")
-    drawn=$(grep -oE 'data="[^"]*umlgraph[^"]*\.svg"' "$html/page_docs_interface.html" | sed 's/data="//; s/"//' | sort -u)
-    [ "$(wc -l <<<"$drawn")" -eq "$in_pages" ]
+    in_pages=$(cd "$source" && find . -name '*.md' -not -path './build/*' -not -path './.*/*' -exec cat {} + |
+      grep -cx '```mermaid')
+    drawn=$(grep -ohE 'data="[^"]*umlgraph[^"]*\.svg"' "$html"/*.html | sed 's/data="//; s/"//' | sort -u)
+    [ "$(wc -l <<<"$drawn")" -eq "$in_pages" ] || { echo "$in_pages in the pages, drawn: $drawn" >&2 && exit 1; }
     while IFS= read -r file; do
-      grep -q '_serialize</text>' "$html/$file" || { echo "$file has no call" >&2 && exit 1; }
+      grep -q '</text>' "$html/$file" || { echo "$file is empty" >&2 && exit 1; }
     done <<<"$drawn"
     ;;
   links_lead_somewhere)
