@@ -1,68 +1,86 @@
-/*
- * qel-message-serialize.h - the wire protocol of the chat service, for the message plug-in.
+/**
+ * @file
+ * @brief The wire protocol of the chat service, for the message plug-in.
  *
  * For each exchange that the plug-in takes part in, a ..._serialize function turns arguments into
  * the bytes of one protocol message, and a ..._deserialize function turns received bytes into
  * outputs. What follows holds for all of them; the notes at each function say only what it adds or
  * does differently.
  *
- * Transport. The library opens no connection. How buffers travel, any framing around them, and
- * which reply belongs to which request (by requestId) are the caller's business.
+ * @par Transport
+ * The library opens no connection. How buffers travel, any framing around them, and which reply
+ * belongs to which request (by requestId) are the caller's business.
  *
- * Types. Identifiers and times are int64_t; 32-bit values, counts and lengths are int; received
- * bytes are data and size, their length in bytes. Text is NUL-terminated, UTF-8, and measured in
- * bytes; text that is not UTF-8 passes through unchanged, after a line of the protocol runtime on
- * standard error.
+ * @par Types
+ * Identifiers and times are int64_t; 32-bit values, counts and lengths are int; received bytes are
+ * data and size, their length in bytes. Text is NUL-terminated, UTF-8, and measured in bytes; text
+ * that is not UTF-8 passes through unchanged, after a line of the protocol runtime on standard
+ * error.
  *
- * Serializers. They return 0, or -1 after one error line in the log. The last two arguments
- * receive the encoded message: its first byte and its length. The buffer has exactly that length,
- * no terminating NUL and no length prefix; release it with free(). A failed check of an argument
- * leaves both outputs as they were. If the buffer cannot be allocated, *size holds the length and
- * *serialized_data is NULL. If the length is below 1, which no message of these functions is, *size
- * holds it and *serialized_data is as it was. Values passed by value are always put on the wire, 0
- * and "" included. A number or a bool that is passed by pointer is optional: NULL leaves the field
- * out. A text is required unless the function says that it may be NULL. userId and deviceId of a
- * message stay unset unless the function takes them.
+ * @par Serializers
+ * They return 0, or -1 after one error line in the log. The last two arguments receive the encoded
+ * message: its first byte and its length. The buffer has exactly that length, no terminating NUL
+ * and no length prefix; release it with free(). A failed check of an argument leaves both outputs
+ * as they were. If the buffer cannot be allocated, *size holds the length and *serialized_data is
+ * NULL. If the length is below 1, which no message of these functions is, *size holds it and
+ * *serialized_data is as it was.
  *
- * Deserializers. They return nothing. An output is written only after the bytes were parsed and
- * consumed whole; otherwise every output keeps what the caller left in it, and the log has the
- * reason. To tell the two apart, set an output before the call to a value that the service never
- * sends. Fields that are absent from the message read as 0 unless the function says otherwise;
- * empty input (size 0) is a valid message without fields, and so is one that was cut between two
- * fields: only the transport can tell that a message is whole. Input of more than 64 MiB (67108864
- * bytes) or of more than 100 nested levels fails. Strings, arrays and records that are written
- * belong to the caller; release each with free(). A string ends at the first NUL of the received
- * text. A string that cannot be allocated is NULL; an array or a record that cannot be is written
- * through all the same, and the call faults, unless the function says otherwise.
+ * @par
+ * Values passed by value are always put on the wire, 0 and "" included. A number or a bool that is
+ * passed by pointer is optional: NULL leaves the field out. A text is required unless the function
+ * says that it may be NULL. userId and deviceId of a message stay unset unless the function takes
+ * them.
  *
- * Lists. A list comes as an array and its count. The count is written even if it is 0; the array is
+ * @par Deserializers
+ * They return nothing. An output is written only after the bytes were parsed and consumed whole;
+ * otherwise every output keeps what the caller left in it, and the log has the reason. To tell the
+ * two apart, set an output before the call to a value that the service never sends. Fields that are
+ * absent from the message read as 0 unless the function says otherwise; empty input (size 0) is a
+ * valid message without fields, and so is one that was cut between two fields: only the transport
+ * can tell that a message is whole. Input of more than 64 MiB (67108864 bytes) or of more than 100
+ * nested levels fails.
+ *
+ * @par
+ * Strings, arrays and records that are written belong to the caller; release each with free(). A
+ * string ends at the first NUL of the received text. A string that cannot be allocated is NULL; an
+ * array or a record that cannot be is written through all the same, and the call faults, unless the
+ * function says otherwise.
+ *
+ * @par Lists
+ * A list comes as an array and its count. The count is written even if it is 0; the array is
  * written only if it has elements, so set it to NULL before the call.
  *
- * Results. A reply's outcome comes back as resultCode and resultMsg. Unless the function says
- * otherwise either pointer may be NULL, *resultCode is written only if the reply has a result, and
- * *resultMsg only if that result has a text: set both before the call.
+ * @par Results
+ * A reply's outcome comes back as resultCode and resultMsg. Unless the function says otherwise
+ * either pointer may be NULL, *resultCode is written only if the reply has a result, and *resultMsg
+ * only if that result has a text: set both before the call.
  *
- * Pointers. None may be NULL unless these notes say so, and none is tested: a NULL pointer faults
- * as soon as the call reads or writes through it.
+ * @par Pointers
+ * None may be NULL unless these notes say so, and none is tested: a NULL pointer faults as soon as
+ * the call reads or writes through it.
  *
- * Memory. Every deserializer keeps one small block (its input stream) allocated for good, except
- * where the function says that it is released.
+ * @par Memory
+ * Every deserializer keeps one small block (its input stream) allocated for good, except where the
+ * function says that it is released.
  *
- * Enumerations. A value outside the message's enumeration ends the process with an assertion
- * failure (SIGABRT), unless the function says that it checks the range. A number that the service
- * sends and that is outside the enumeration reads as if the field were absent.
+ * @par Enumerations
+ * A value outside the message's enumeration ends the process with an assertion failure (SIGABRT),
+ * unless the function says that it checks the range. A number that the service sends and that is
+ * outside the enumeration reads as if the field were absent.
+ * - ChatType: SINGLE 0, GROUP 1, BROADCAST 2, SECURE 3, MONOLOGUE 4
+ * - MsgType: TEXT 0, MEDIA 1, CUSTOM 2, RECALL 3, NOTI 4, READ_ACK 5, DELIVERY_ACK 6, UNSEAL 10,
+ *   VOIP_CALL_SETUP 30
+ * - IsTypingContentType: CONTENT_TEXT 0, CONTENT_IMAGE 1, CONTENT_VIDEO 2, CONTENT_AUDIO 3
  *
- *   ChatType             SINGLE 0, GROUP 1, BROADCAST 2, SECURE 3, MONOLOGUE 4
- *   MsgType              TEXT 0, MEDIA 1, CUSTOM 2, RECALL 3, NOTI 4, READ_ACK 5, DELIVERY_ACK 6,
- *                        UNSEAL 10, VOIP_CALL_SETUP 30
- *   IsTypingContentType  CONTENT_TEXT 0, CONTENT_IMAGE 1, CONTENT_VIDEO 2, CONTENT_AUDIO 3
+ * @par Exceptions
+ * C++ exceptions out of the protocol runtime, for example std::bad_alloc while a text is copied,
+ * are not caught: called from C, they end the process.
  *
- * Exceptions. C++ exceptions out of the protocol runtime, for example std::bad_alloc while a text
- * is copied, are not caught: called from C, they end the process.
+ * @par Threads
+ * Any thread may call any function at any time.
  *
- * Threads. Any thread may call any function at any time.
- *
- * Log. Each call logs its entry, its exit and its failures through __dlog_print, with the tag
+ * @par Log
+ * Each call logs its entry, its exit and its failures through __dlog_print, with the tag
  * MESSAGE_PLUGIN and the calling thread's id. Lines at error level are not always failures. The
  * access token is never logged.
  */
@@ -76,121 +94,165 @@
 extern "C" {
 #endif
 
-/* ---- Records ---- */
+/** @defgroup qel_records Records
+ *  @{ */
 
-/* Two users whose combination the service refuses. An id that it left out is 0. */
+/** Two users whose combination the service refuses. An id that it left out is 0. */
 typedef struct {
-  int64_t userA;
-  int64_t userB;
+  int64_t userA; /**< one of the two */
+  int64_t userB; /**< the other */
 } qel_message_didviolationuser_t;
 
-/* How far a member of a chatroom has acknowledged, as read or as delivered. */
+/** How far a member of a chatroom has acknowledged, as read or as delivered. */
 typedef struct {
-  int64_t userId;    /* the member */
-  int64_t msgId;     /* the last message that the member acknowledged */
-  int64_t timestamp; /* when */
+  int64_t userId;    /**< the member */
+  int64_t msgId;     /**< the last message that the member acknowledged */
+  int64_t timestamp; /**< when */
 } qel_message_watermarkentry_t;
 
-/* A member of a chatroom. */
+/** A member of a chatroom. */
 typedef struct {
-  int64_t userId;
-  int64_t available; /* 1 or 0 */
-  char* name;        /* as handed out: "" without a name */
+  int64_t userId;    /**< the member */
+  int64_t available; /**< 1 or 0 */
+  char* name;        /**< as handed out: "" without a name */
 } qel_message_chatroommember_t;
 
-/* A message in the inbox. */
+/** A message in the inbox. */
 typedef struct {
-  int64_t msgId;
-  int32_t msgType; /* a MsgType */
-  int64_t sender;
-  int64_t receiver;
-  int64_t sentTime;
-  char* chatMsg; /* as handed out: "" without a text */
-  int64_t chatroomId;
-  int32_t chatType; /* a ChatType */
-  int32_t msgTtl;   /* the message's lifetime */
+  int64_t msgId;      /**< the message */
+  int32_t msgType;    /**< a MsgType */
+  int64_t sender;     /**< who sent it */
+  int64_t receiver;   /**< whom it is for */
+  int64_t sentTime;   /**< when it was sent */
+  char* chatMsg;      /**< as handed out: "" without a text */
+  int64_t chatroomId; /**< the message's chatroom */
+  int32_t chatType;   /**< a ChatType */
+  int32_t msgTtl;     /**< the message's lifetime */
 } qel_message_inboxentry_t;
 
-/* A chat to end. */
+/** A chat to end. */
 typedef struct {
-  int64_t chatroomId;
-  bool denyInvitation; /* refuse further invitations into it */
+  int64_t chatroomId;  /**< the chatroom */
+  bool denyInvitation; /**< refuse further invitations into it */
 } qel_message_endchatentry_t;
 
-/* ---- Stored messages: placeholders ---- */
+/** @} */
 
-/* Do nothing at all: no message, no output, no log line. Any pointer may be NULL. */
+/** @defgroup qel_stored Stored messages: placeholders
+ *  @{ */
+
+/**
+ * Does nothing at all: no message, no output, no log line. Any pointer may be NULL.
+ *
+ * @param requestId,nextPaginationKey,maxCount,serialized_data,size  ignored
+ */
 void forward_stored_message_reply_serialize(int64_t requestId, const char** nextPaginationKey,
                                             const int* maxCount, unsigned char** serialized_data,
                                             int* size);
+
+/**
+ * Does nothing at all: no message, no output, no log line. Any pointer may be NULL.
+ *
+ * @param data,size,requestId,inboxEntries,count,nextPaginationKey  ignored
+ */
 void forward_stored_message_deserialize(const unsigned char* data, int size, int64_t* requestId,
                                         qel_message_inboxentry_t*** inboxEntries, int* count,
                                         char** nextPaginationKey);
 
-/* ---- Channel authentication ---- */
+/** @} */
 
-/*
+/** @defgroup qel_channel_auth Channel authentication
+ *  @{ */
+
+/**
  * ChannelAuthRequest: authenticates the channel after connecting.
  *
- * appId        the calling application
- * accessToken  the user's credential
+ * @param requestId             the request
+ * @param userId,deviceId       the user, and the user's device
+ * @param appId                 the calling application
+ * @param accessToken           the user's credential
+ * @param serialized_data,size  the encoded message
+ * @return 0, or -1 after an error
  */
 int channel_auth_request_serialize(int64_t requestId, int64_t userId, int64_t deviceId,
                                    const char* appId, const char* accessToken,
                                    unsigned char** serialized_data, int* size);
 
-/*
+/**
  * ChannelAuthReply. All three outputs are written on success, and none of the pointers may be
  * NULL: without a result *resultCode is 0, and without a text *resultMsg is NULL.
+ *
+ * @param data,size             the received bytes
+ * @param requestId             the request that is answered
+ * @param resultCode,resultMsg  the outcome
  *
  * Logs no exit line. The input stream is released on success and kept on failure.
  */
 void channel_auth_reply_deserialize(const unsigned char* data, int size, int64_t* requestId,
                                     int* resultCode, char** resultMsg);
 
-/* ---- Echo: the service probes, the client answers ---- */
+/** @} */
 
-/*
+/** @defgroup qel_echo Echo: the service probes, the client answers
+ *  @{ */
+
+/**
  * ClientEchoReply.
  *
- * requestId  that of the ClientEcho which is answered
+ * @param requestId             that of the ClientEcho which is answered
+ * @param serialized_data,size  the encoded message
+ * @return 0, or -1 after an error
  */
 int client_echo_reply_serialize(int64_t requestId, unsigned char** serialized_data, int* size);
 
-/* ClientEcho. The input stream is released on success and kept on failure. */
+/**
+ * ClientEcho. The input stream is released on success and kept on failure.
+ *
+ * @param data,size  the received bytes
+ * @param requestId  the probe, for the answer
+ */
 void client_echo_deserialize(const unsigned char* data, int size, int64_t* requestId);
 
-/* ---- Creating a chatroom ---- */
+/** @} */
 
-/*
+/** @defgroup qel_create_chatroom Creating a chatroom
+ *  @{ */
+
+/**
  * CreateChatroomRequest.
  *
- * chatType        a ChatType; any other value ends the process
- * receivers       whom to bring into it: receiversCount ids, in order. With NULL the call fails,
- *                 whatever the count.
- * receiversCount  0 or less sends no receivers
- * chatroomTitle   may be NULL: no title is sent
+ * @param requestId             the request
+ * @param chatType              a ChatType; any other value ends the process
+ * @param receivers             whom to bring into it: receiversCount ids, in order. With NULL the
+ *                              call fails, whatever the count.
+ * @param receiversCount        0 or less sends no receivers
+ * @param chatroomTitle         may be NULL: no title is sent
+ * @param serialized_data,size  the encoded message
+ * @return 0, or -1 after an error
  */
 int create_chatroom_request_serialize(int64_t requestId, int chatType, const int64_t* receivers,
                                       int receiversCount, const char* chatroomTitle,
                                       unsigned char** serialized_data, int* size);
 
-/*
+/**
  * CreateChatroomReply: the new chatroom, and the receivers whom the service refused.
  *
- * chatroomId  the new chatroom
- * msgTtl      the lifetime of its messages. Not written if the reply has none.
- * resultCode  must not be NULL if the result carries details of refused receivers: their gate reads
- *             the code back through this pointer.
+ * @param data,size             the received bytes
+ * @param requestId             the request that is answered
+ * @param chatroomId            the new chatroom
+ * @param msgTtl                the lifetime of its messages. Not written if the reply has none.
+ * @param resultCode,resultMsg  the outcome. resultCode must not be NULL if the result carries
+ *                              details of refused receivers: their gate reads the code back through
+ *                              this pointer.
  *
  * The details are four lists. They are written, counts included, only if the reply carries details
  * and its code is 1000, 1001 or 3009:
  *
- * invalidReceivers   ids that are no receivers. Under 1000 and 3009 their number alone is written,
- *                    and no array.
- * disabledReceivers  users who are disabled
- * didViolationUsers  pairs of users that are a DID violation
- * invitationDenied   users who deny invitations
+ * @param invalidReceivers,invalidReceiversCount    ids that are no receivers. Under 1000 and 3009
+ *                                                  their number alone is written, and no array.
+ * @param disabledReceivers,disabledReceiversCount  users who are disabled
+ * @param didViolationUsers,didViolationUsersCount  pairs of users that are a DID violation
+ * @param invitationDenied,invitationDeniedCount    users who deny invitations
  */
 void create_chatroom_reply_deserialize(const unsigned char* data, int size, int64_t* requestId,
                                        int64_t* chatroomId, int* msgTtl, int* resultCode,
@@ -201,31 +263,41 @@ void create_chatroom_reply_deserialize(const unsigned char* data, int size, int6
                                        int* didViolationUsersCount, int64_t** invitationDenied,
                                        int* invitationDeniedCount);
 
-/* ---- Sending chat messages ---- */
+/** @} */
 
-/*
+/** @defgroup qel_chat Sending chat messages
+ *  @{ */
+
+/**
  * ChatRequest: sends one message into a chatroom.
  *
- * msgId     the caller's id of the message; the reply confirms it by this id
- * msgType   a MsgType: 0 to 6, 10 or 30. Below 0 or above 30 the call fails; 7, 8, 9 and 11 to 29
- *           end the process.
- * chatMsg   at most 40000 bytes, or the call fails. May be empty. With NULL the call fails; msgType
- *           is looked at first.
- * msgTtl    the message's lifetime
- * reserved  ignored
+ * @param requestId             the request
+ * @param chatroomId            the chatroom
+ * @param msgId                 the caller's id of the message; the reply confirms it by this id
+ * @param msgType               a MsgType: 0 to 6, 10 or 30. Below 0 or above 30 the call fails; 7,
+ *                              8, 9 and 11 to 29 end the process.
+ * @param chatMsg               at most 40000 bytes, or the call fails. May be empty. With NULL the
+ *                              call fails; msgType is looked at first.
+ * @param msgTtl                the message's lifetime
+ * @param reserved              ignored
+ * @param serialized_data,size  the encoded message
+ * @return 0, or -1 after an error
  */
 int chat_request_serialize(int64_t requestId, int64_t chatroomId, int64_t msgId, int msgType,
                            const char* chatMsg, int msgTtl, int reserved,
                            unsigned char** serialized_data, int* size);
 
-/*
+/**
  * ChatReply: the service's verdict, and the messages that it processed.
  *
- * requestId, chatroomId  may be NULL
- * count                  the number of processed messages, 0 if there are none
- * msgIds, sentTimes      two arrays of *count elements, index by index about the same message: its
- *                        id, and the time at which the service recorded it (0 where absent). Not
- *                        written if there are none. Both are required as soon as there are any.
+ * @param data,size             the received bytes
+ * @param requestId,chatroomId  the request that is answered, and its chatroom; may be NULL
+ * @param resultCode,resultMsg  the outcome
+ * @param count                 the number of processed messages, 0 if there are none
+ * @param msgIds,sentTimes      two arrays of *count elements, index by index about the same
+ *                              message: its id, and the time at which the service recorded it (0
+ *                              where absent). Not written if there are none. Both are required as
+ *                              soon as there are any.
  *
  * If an array cannot be allocated *count is 0, the outputs before it have been written, and no exit
  * line is logged. One of the two arrays may have been allocated all the same: set both to NULL
@@ -235,20 +307,29 @@ void chat_reply_deserialize(const unsigned char* data, int size, int64_t* reques
                             int64_t* chatroomId, int* resultCode, char** resultMsg, int* count,
                             int64_t** msgIds, int64_t** sentTimes);
 
-/* ---- Entering a chatroom ---- */
+/** @} */
 
-/*
+/** @defgroup qel_allow_chat Entering a chatroom
+ *  @{ */
+
+/**
  * AllowChatRequest: enters a chatroom and asks for its state. No argument is refused.
  *
- * isAutoAllow                    may be NULL
- * maxCount                       how many entries at most: 1 to 500; any other number is sent as
- *                                500
- * needDeliveryAck                whether to send delivery marks, those that are newer than
- * lastDeliveryAckTimestamp       this time, which is sent only with needDeliveryAck
- * needReadAck                    the same for read marks
- * lastReadAckTimestamp
- * needOrderedChatroomMemberList  whether to send the members
- * needChatroomMeta               whether to send title and lifetime
+ * @param requestId                      the request
+ * @param chatroomId                     the chatroom
+ * @param isAutoAllow                    may be NULL
+ * @param maxCount                       how many entries at most: 1 to 500; any other number is
+ *                                       sent as 500
+ * @param needDeliveryAck                whether to send delivery marks
+ * @param lastDeliveryAckTimestamp       those that are newer than this, which is sent only with
+ *                                       needDeliveryAck
+ * @param needReadAck                    whether to send read marks
+ * @param lastReadAckTimestamp           those that are newer than this, which is sent only with
+ *                                       needReadAck
+ * @param needOrderedChatroomMemberList  whether to send the members
+ * @param needChatroomMeta               whether to send title and lifetime
+ * @param serialized_data,size           the encoded message
+ * @return 0, or -1 after an error
  */
 int allow_chat_request_serialize(int64_t requestId, int64_t chatroomId, const bool* isAutoAllow,
                                  int maxCount, bool needDeliveryAck,
@@ -256,16 +337,21 @@ int allow_chat_request_serialize(int64_t requestId, int64_t chatroomId, const bo
                                  int64_t lastReadAckTimestamp, bool needOrderedChatroomMemberList,
                                  bool needChatroomMeta, unsigned char** serialized_data, int* size);
 
-/*
+/**
  * AllowChatReply: the chatroom's state.
  *
- * resultCode                must not be NULL if the reply has a result
- * deliveryAckEntries        deliveryAckCount pointers to one record each
- * lastDeliveryAckTimestamp  not written if the reply has none
- * readAckEntries            readAckCount pointers to one record each
- * lastReadAckTimestamp      not written if the reply has none
- * members                   memberCount pointers to one record each, in the service's order
- * title, msgTtl             not written if the reply has none
+ * @param data,size                            the received bytes
+ * @param requestId                            the request that is answered
+ * @param chatroomId                           the chatroom
+ * @param resultCode,resultMsg                 the outcome. resultCode must not be NULL if the reply
+ *                                             has a result.
+ * @param deliveryAckEntries,deliveryAckCount  deliveryAckCount pointers to one record each
+ * @param lastDeliveryAckTimestamp             not written if the reply has none
+ * @param readAckEntries,readAckCount          readAckCount pointers to one record each
+ * @param lastReadAckTimestamp                 not written if the reply has none
+ * @param members,memberCount                  memberCount pointers to one record each, in the
+ *                                             service's order
+ * @param title,msgTtl                         not written if the reply has none
  *
  * Each of the three arrays, each record that it points to and each member's name is a block of its
  * own: release names, records and array, in this order.
@@ -279,46 +365,69 @@ void allow_chat_reply_deserialize(const unsigned char* data, int size, int64_t* 
                                   qel_message_chatroommember_t*** members, int* memberCount,
                                   char** title, int* msgTtl);
 
-/* ---- Fetching unread messages ---- */
+/** @} */
 
-/*
+/** @defgroup qel_unread Fetching unread messages
+ *  @{ */
+
+/**
  * GetAllUnreadMessageRequest: asks for the messages that were stored meanwhile; the service pushes
  * them as ForwardUnreadMessage.
  *
- * maxCount  messages in a page at most, may be NULL: 1 to 500; any other number is sent as 500
+ * @param requestId             the request
+ * @param maxCount              messages in a page at most, may be NULL: 1 to 500; any other number
+ *                              is sent as 500
+ * @param serialized_data,size  the encoded message
+ * @return 0, or -1 after an error
  */
 int get_all_unread_message_request_serialize(int64_t requestId, const int* maxCount,
                                              unsigned char** serialized_data, int* size);
 
-/* GetAllUnreadMessageReply. */
+/**
+ * GetAllUnreadMessageReply.
+ *
+ * @param data,size             the received bytes
+ * @param requestId             the request that is answered
+ * @param resultCode,resultMsg  the outcome
+ */
 void get_all_unread_message_reply_deserialize(const unsigned char* data, int size,
                                               int64_t* requestId, int* resultCode,
                                               char** resultMsg);
 
-/* ---- Push of one message, which the client acknowledges ---- */
+/** @} */
 
-/*
+/** @defgroup qel_online_push Push of one message, which the client acknowledges
+ *  @{ */
+
+/**
  * ForwardOnlineMessageReply.
  *
- * requestId   that of the ForwardOnlineMessage which is acknowledged
- * markAsRead  may be NULL
+ * @param requestId             that of the ForwardOnlineMessage which is acknowledged
+ * @param chatroomId            the chatroom
+ * @param markAsRead            may be NULL
+ * @param serialized_data,size  the encoded message
+ * @return 0, or -1 after an error
  */
 int forward_online_message_reply_serialize(int64_t requestId, int64_t chatroomId,
                                            const bool* markAsRead, unsigned char** serialized_data,
                                            int* size);
 
-/*
+/**
  * ForwardOnlineMessage.
  *
- * chatroomId, chatType  the message's chatroom
- * inboxEntry            *inboxEntry points to a record of the caller's, which is filled: msgId,
- *                       msgType, sentTime and chatMsg always, sender, receiver and msgTtl only if
- *                       the message has them, chatroomId and chatType never. What is not filled
- *                       keeps what the caller put there; a chatMsg that was there is overwritten,
- *                       not released. Release the new one.
- * skipReply             whether to leave out the acknowledgement; false if the message does not say
- * errorCode, errorMsg   written only if *inboxEntry is NULL: 18, and a text to release. requestId,
- *                       chatroomId, chatType and skipReply have been written all the same.
+ * @param data,size            the received bytes
+ * @param requestId            the push, for the acknowledgement
+ * @param chatroomId,chatType  the message's chatroom
+ * @param inboxEntry           *inboxEntry points to a record of the caller's, which is filled:
+ *                             msgId, msgType, sentTime and chatMsg always, sender, receiver and
+ *                             msgTtl only if the message has them, chatroomId and chatType never.
+ *                             What is not filled keeps what the caller put there; a chatMsg that
+ *                             was there is overwritten, not released. Release the new one.
+ * @param skipReply            whether to leave out the acknowledgement; false if the message does
+ *                             not say
+ * @param errorCode,errorMsg   written only if *inboxEntry is NULL: 18, and a text to release.
+ *                             requestId, chatroomId, chatType and skipReply have been written all
+ *                             the same.
  *
  * Logs values at error level too, in calls that succeed.
  */
@@ -327,27 +436,34 @@ void forward_online_message_get_deserialize(const unsigned char* data, int size,
                                             qel_message_inboxentry_t** inboxEntry, bool* skipReply,
                                             int* errorCode, char** errorMsg);
 
-/* ---- Push of a page of stored messages, which the client acknowledges ---- */
+/** @} */
 
-/*
+/** @defgroup qel_unread_push Push of a page of stored messages, which the client acknowledges
+ *  @{ */
+
+/**
  * ForwardUnreadMessageReply: acknowledges the page and asks for the next one.
  *
- * requestId          that of the ForwardUnreadMessage which is acknowledged
- * nextPaginationKey  points to the key that came with the page, or to NULL, or is NULL: no key is
- *                    sent then
- * maxCount           messages in a page at most, may be NULL: 1 to 500; any other number is sent as
- *                    500. Logged in both cases.
+ * @param requestId             that of the ForwardUnreadMessage which is acknowledged
+ * @param nextPaginationKey     points to the key that came with the page, or to NULL, or is NULL:
+ *                              no key is sent then
+ * @param maxCount              messages in a page at most, may be NULL: 1 to 500; any other number
+ *                              is sent as 500. Logged in both cases.
+ * @param serialized_data,size  the encoded message
+ * @return 0, or -1 after an error
  */
 int forward_unread_message_reply_serialize(int64_t requestId, const char** nextPaginationKey,
                                            const int* maxCount, unsigned char** serialized_data,
                                            int* size);
 
-/*
+/**
  * ForwardUnreadMessage.
  *
- * inboxEntries       count pointers to one record each; chatroomId, chatType and msgTtl of a record
- *                    are 0 where the message has none
- * nextPaginationKey  may be NULL. Not written if the service sent none.
+ * @param data,size           the received bytes
+ * @param requestId           the push, for the acknowledgement
+ * @param inboxEntries,count  count pointers to one record each; chatroomId, chatType and msgTtl of
+ *                            a record are 0 where the message has none
+ * @param nextPaginationKey   may be NULL. Not written if the service sent none.
  *
  * Each record's chatMsg, each record and the array is a block of its own. If the array cannot be
  * allocated *inboxEntries is NULL, *requestId and *count have been written, *nextPaginationKey has
@@ -357,67 +473,102 @@ void forward_unread_message_deserialize(const unsigned char* data, int size, int
                                         qel_message_inboxentry_t*** inboxEntries, int* count,
                                         char** nextPaginationKey);
 
-/* ---- Read receipt ---- */
+/** @} */
 
-/*
+/** @defgroup qel_read_message Read receipt
+ *  @{ */
+
+/**
  * ReadMessageRequest: tells that a message was read.
  *
- * inboxEntry  the message, may be NULL: none is named then. Its msgId, msgType, sender and sentTime
- *             are sent, nothing else. A msgType below 0 or above 30 makes the call fail; 7, 8, 9
- *             and 11 to 29 end the process.
+ * @param requestId             the request
+ * @param chatroomId            the chatroom
+ * @param inboxEntry            the message, may be NULL: none is named then. Its msgId, msgType,
+ *                              sender and sentTime are sent, nothing else. A msgType below 0 or
+ *                              above 30 makes the call fail; 7, 8, 9 and 11 to 29 end the process.
+ * @param serialized_data,size  the encoded message
+ * @return 0, or -1 after an error
  */
 int read_message_request_serialize(int64_t requestId, int64_t chatroomId,
                                    const qel_message_inboxentry_t* inboxEntry,
                                    unsigned char** serialized_data, int* size);
 
-/* ReadMessageReply. */
+/**
+ * ReadMessageReply.
+ *
+ * @param data,size             the received bytes
+ * @param requestId,chatroomId  the request that is answered, and its chatroom
+ * @param resultCode,resultMsg  the outcome
+ */
 void read_message_reply_deserialize(const unsigned char* data, int size, int64_t* requestId,
                                     int64_t* chatroomId, int* resultCode, char** resultMsg);
 
-/* ---- Ending chats ---- */
+/** @} */
 
-/*
+/** @defgroup qel_end_chat Ending chats
+ *  @{ */
+
+/**
  * EndChatRequest: leaves chatrooms.
  *
- * entries  count records, in order. May be NULL if there are none.
- * count    0 or less sends no entries
+ * @param requestId             the request
+ * @param entries               count records, in order. May be NULL if there are none.
+ * @param count                 0 or less sends no entries
+ * @param serialized_data,size  the encoded message
+ * @return 0, or -1 after an error
  */
 int end_chat_request_serialize(int64_t requestId, const qel_message_endchatentry_t* entries,
                                int count, unsigned char** serialized_data, int* size);
 
-/* EndChatReply. */
+/**
+ * EndChatReply.
+ *
+ * @param data,size             the received bytes
+ * @param requestId             the request that is answered
+ * @param resultCode,resultMsg  the outcome
+ */
 void end_chat_reply_deserialize(const unsigned char* data, int size, int64_t* requestId,
                                 int* resultCode, char** resultMsg);
 
-/* ---- Inviting members ---- */
+/** @} */
 
-/*
+/** @defgroup qel_invite Inviting members
+ *  @{ */
+
+/**
  * InviteRequest: invites further users into a chatroom.
  *
- * invitingMembers       the invited: *invitingMembersCount ids, in order. May be NULL if there are
- *                       none.
- * invitingMembersCount  may be NULL: nobody is sent then. So it is with 0 or less.
+ * @param requestId             the request
+ * @param chatroomId            the chatroom
+ * @param invitingMembers       the invited: *invitingMembersCount ids, in order. May be NULL if
+ *                              there are none.
+ * @param invitingMembersCount  may be NULL: nobody is sent then. So it is with 0 or less.
+ * @param serialized_data,size  the encoded message
+ * @return 0, or -1 after an error
  */
 int invite_chat_request_serialize(int64_t requestId, int64_t chatroomId,
                                   const int64_t* invitingMembers, const int* invitingMembersCount,
                                   unsigned char** serialized_data, int* size);
 
-/*
+/**
  * InviteReply: when the invitations were sent, and the users whom the service refused.
  *
- * sentTime    may be NULL. Not written if the reply has none.
- * resultCode  must not be NULL if the result carries details of refused users: their gate reads the
- *             code back through this pointer.
+ * @param data,size             the received bytes
+ * @param requestId,chatroomId  the request that is answered, and its chatroom
+ * @param sentTime              may be NULL. Not written if the reply has none.
+ * @param resultCode,resultMsg  the outcome. resultCode must not be NULL if the result carries
+ *                              details of refused users: their gate reads the code back through
+ *                              this pointer.
  *
  * The details are six lists. They are written, counts included, only if the reply carries details
  * and its code is 1000, 1001, 3003 or 3009:
  *
- * invalidReceivers      ids that are no receivers
- * interruptedReceivers  users who are interrupted
- * disabledReceivers     users who are disabled
- * existingChatmembers   users who are members already
- * didViolationUsers     pairs of users that are a DID violation
- * invitationDenied      users who deny invitations
+ * @param invalidReceivers,invalidReceiversCount          ids that are no receivers
+ * @param interruptedReceivers,interruptedReceiversCount  users who are interrupted
+ * @param disabledReceivers,disabledReceiversCount        users who are disabled
+ * @param existingChatmembers,existingChatmembersCount    users who are members already
+ * @param didViolationUsers,didViolationUsersCount        pairs of users that are a DID violation
+ * @param invitationDenied,invitationDeniedCount          users who deny invitations
  */
 void invite_reply_deserialize(
     const unsigned char* data, int size, int64_t* requestId, int64_t* chatroomId, int64_t* sentTime,
@@ -427,61 +578,107 @@ void invite_reply_deserialize(
     qel_message_didviolationuser_t** didViolationUsers, int* didViolationUsersCount,
     int64_t** invitationDenied, int* invitationDeniedCount);
 
-/* ---- The service's clock ---- */
+/** @} */
 
-/* CurrentTimeRequest. */
+/** @defgroup qel_current_time The service's clock
+ *  @{ */
+
+/**
+ * CurrentTimeRequest.
+ *
+ * @param requestId             the request
+ * @param serialized_data,size  the encoded message
+ * @return 0, or -1 after an error
+ */
 int current_time_request_serialize(int64_t requestId, unsigned char** serialized_data, int* size);
 
-/*
+/**
  * CurrentTimeReply.
  *
- * currentTimeMillis  the service's clock in milliseconds, -1 if the reply has none
+ * @param data,size             the received bytes
+ * @param requestId             the request that is answered
+ * @param currentTimeMillis     the service's clock in milliseconds, -1 if the reply has none
+ * @param resultCode,resultMsg  the outcome
  */
 void current_time_deserialize(const unsigned char* data, int size, int64_t* requestId,
                               int64_t* currentTimeMillis, int* resultCode, char** resultMsg);
 
-/* ---- Unsealing a message ---- */
+/** @} */
 
-/*
+/** @defgroup qel_unseal Unsealing a message
+ *  @{ */
+
+/**
  * UnsealMessageRequest: asks for a sealed message to be opened.
  *
- * sender, msgId  which message, and whose
- * msgDetail      may be NULL
+ * @param requestId             the request
+ * @param chatroomId            the chatroom
+ * @param sender,msgId          which message, and whose
+ * @param msgDetail             may be NULL
+ * @param serialized_data,size  the encoded message
+ * @return 0, or -1 after an error
  */
 int unseal_message_request_serialize(int64_t requestId, int64_t chatroomId, int64_t sender,
                                      int64_t msgId, const char* msgDetail,
                                      unsigned char** serialized_data, int* size);
 
-/* UnsealMessageReply. */
+/**
+ * UnsealMessageReply.
+ *
+ * @param data,size             the received bytes
+ * @param requestId,chatroomId  the request that is answered, and its chatroom
+ * @param resultCode,resultMsg  the outcome
+ */
 void unseal_message_reply_deserialize(const unsigned char* data, int size, int64_t* requestId,
                                       int64_t* chatroomId, int* resultCode, char** resultMsg);
 
-/* ---- Call log ---- */
+/** @} */
 
-/*
+/** @defgroup qel_call_log Call log
+ *  @{ */
+
+/**
  * SaveCallLogRequest: stores the record of a call in a chatroom.
  *
- * callId               the call
- * callLogType          what the two ends agreed to call its kind
- * conversationSeconds  its duration in seconds
+ * @param requestId             the request
+ * @param chatroomId            the chatroom
+ * @param callId                the call
+ * @param callLogType           what the two ends agreed to call its kind
+ * @param sender,receiver       who called, and whom
+ * @param conversationSeconds   its duration in seconds
+ * @param serialized_data,size  the encoded message
+ * @return 0, or -1 after an error
  */
 int save_call_log_request_serialize(int64_t requestId, int64_t chatroomId, const char* callId,
                                     const char* callLogType, int64_t sender, int64_t receiver,
                                     int conversationSeconds, unsigned char** serialized_data,
                                     int* size);
 
-/* SaveCallLogReply. */
+/**
+ * SaveCallLogReply.
+ *
+ * @param data,size             the received bytes
+ * @param requestId             the request that is answered
+ * @param resultCode,resultMsg  the outcome
+ */
 void save_call_log_reply_deserialize(const unsigned char* data, int size, int64_t* requestId,
                                      int* resultCode, char** resultMsg);
 
-/* ---- Typing status ---- */
+/** @} */
 
-/*
+/** @defgroup qel_typing Typing status
+ *  @{ */
+
+/**
  * IsTyping: tells that the user is typing. There is no reply.
  *
- * state        may be NULL; what the two ends agreed to call the state
- * contentType  may be NULL, else points to an IsTypingContentType; any other value ends the process
- * refresh      may be NULL
+ * @param requestId             the message
+ * @param chatroomId            the chatroom
+ * @param state                 may be NULL; what the two ends agreed to call the state
+ * @param contentType           may be NULL, else points to an IsTypingContentType; any other value
+ *                              ends the process
+ * @param refresh               may be NULL
+ * @param serialized_data,size  the encoded message
  *
  * Returns nothing: set *serialized_data to NULL before the call. If the buffer cannot be allocated,
  * *serialized_data is NULL, *size holds the length, and the log line is at debug level.
@@ -490,23 +687,33 @@ void is_typing_request_serialize(int64_t requestId, int64_t chatroomId, const ch
                                  const int* contentType, const int* refresh,
                                  unsigned char** serialized_data, int* size);
 
-/*
+/**
  * TypingUpdated: the service's push that another member is typing.
  *
- * sender, state, contentType, refresh  not written if the message has none
+ * @param data,size                         the received bytes
+ * @param requestId                         the push
+ * @param chatroomId                        the chatroom
+ * @param sender,state,contentType,refresh  not written if the message has none
  */
 void typing_updated_deserialize(const unsigned char* data, int size, int64_t* requestId,
                                 int64_t* chatroomId, int64_t* sender, char** state,
                                 int* contentType, int* refresh);
 
-/* ---- Changing a chatroom's title or lifetime ---- */
+/** @} */
 
-/*
+/** @defgroup qel_chatroom_meta Changing a chatroom's title or lifetime
+ *  @{ */
+
+/**
  * ChangeChatroomMetaRequest: changes one of the two.
  *
- * title   may be NULL or empty: no title then
- * msgTtl  the lifetime of the chatroom's messages. May be NULL or point to a negative number: no
- *         lifetime then.
+ * @param requestId             the request
+ * @param chatroomId            the chatroom
+ * @param title                 may be NULL or empty: no title then
+ * @param msgTtl                the lifetime of the chatroom's messages. May be NULL or point to a
+ *                              negative number: no lifetime then.
+ * @param serialized_data,size  the encoded message
+ * @return 0, or -1 after an error
  *
  * With both the title alone is sent, and a warning is logged. With neither the call fails.
  */
@@ -514,9 +721,17 @@ int change_chatroom_meta_request_serialize(int64_t requestId, int64_t chatroomId
                                            const int* msgTtl, unsigned char** serialized_data,
                                            int* size);
 
-/* ChangeChatroomMetaReply. */
+/**
+ * ChangeChatroomMetaReply.
+ *
+ * @param data,size             the received bytes
+ * @param requestId,chatroomId  the request that is answered, and its chatroom
+ * @param resultCode,resultMsg  the outcome
+ */
 void change_chatroom_meta_reply_deserialize(const unsigned char* data, int size, int64_t* requestId,
                                             int64_t* chatroomId, int* resultCode, char** resultMsg);
+
+/** @} */
 
 #ifdef __cplusplus
 }

@@ -1,0 +1,70 @@
+#!/usr/bin/env bash
+# reference_test.sh CASE SOURCE DOCS DOXYGEN: the API reference that was built in the folder DOCS.
+set -euo pipefail
+source=$2
+docs=$3
+doxygen=$4
+html=$docs/html
+header=$source/proto-lib/qel-message-serialize.h
+functions=$source/proto-lib/exported-functions.txt
+
+records() { sed -nE 's/^\} (qel_message_[a-z]+_t);/\1/p' "$header"; }
+
+# Targets of links and pictures, and of the tree beside the pages.
+targets() {
+  grep -ohE '(href|src|data)="[^"]+"' "$html"/*.html | sed -E 's/^[a-z]+="//; s/"$//' | grep -vE '^[a-z]+:'
+  grep -ohE '"[^" ]+\.html(#[^"]*)?"' "$html"/*.js | tr -d '"'
+}
+
+case $1 in
+  every_function_has_an_entry)
+    diff <(sort "$functions") \
+      <(grep -ohE '<td class="memname">(int|void) [a-z_]+' "$html"/group*.html | sed 's/.* //' | sort) >&2
+    ;;
+  every_function_has_a_man_page)
+    diff <(sort "$functions") <(find "$docs/man/man3" -name '*serialize.3' -printf '%f\n' | sed 's/\.3$//' | sort) >&2
+    ;;
+  every_record_has_an_entry)
+    [ "$(records | wc -l)" -eq 5 ]
+    diff <(records | sort) \
+      <(sed -nE 's/.*<title>.*: (.*) Struct Reference<.*/\1/p' "$html"/struct*.html | sort) >&2
+    ;;
+  every_function_is_in_the_table_of_owners)
+    diff "$functions" \
+      <(sed -nE 's/^<td class="markdownTableBody[A-Za-z]*"><a [^>]*>([a-z_]+serialize)<.*/\1/p' \
+        "$html/page_docs_interface.html") >&2
+    ;;
+  every_diagram_is_drawn)
+    in_pages=$(cd "$source" && find . -name '*.md' -not -path './build/*' -not -path './.*/*' -exec cat {} + |
+      grep -cx '```mermaid')
+    drawn=$(grep -ohE 'data="[^"]*umlgraph[^"]*\.svg"' "$html"/*.html | sed 's/data="//; s/"//' | sort -u)
+    [ "$(wc -l <<<"$drawn")" -eq "$in_pages" ] || { echo "$in_pages in the pages, drawn: $drawn" >&2 && exit 1; }
+    while IFS= read -r file; do
+      grep -q '</text>' "$html/$file" || { echo "$file is empty" >&2 && exit 1; }
+    done <<<"$drawn"
+    ;;
+  links_lead_somewhere)
+    missing=$(cd "$html" && targets | sed 's/[#?].*//' | sort -u | while IFS= read -r file; do
+      [ -z "$file" ] || [ -e "$file" ] || echo "$file"
+    done)
+    [ -z "$missing" ] || { echo "no such file: $missing" >&2 && exit 1; }
+    ;;
+  argument_without_comment_is_refused)
+    scratch=$(mktemp -d)
+    trap 'rm -rf "$scratch"' EXIT
+    mkdir "$scratch/proto-lib"
+    cp -r "$source/docs" "$scratch/docs"
+    sed '/@param callId /d' "$header" >"$scratch/proto-lib/${header##*/}"
+    cd "$scratch"
+    if QEL_VERSION='' QEL_PLANTUML='' QEL_DOCS_PAGES='' QEL_DOCS_FOLDER=$scratch "$doxygen" docs/Doxyfile 2>out; then
+      echo "accepted" >&2
+      exit 1
+    fi
+    cat out >&2
+    grep -A1 'of save_call_log_request_serialize' out | grep -q "parameter 'callId'"
+    ;;
+  *)
+    echo "no such case: $1" >&2
+    exit 1
+    ;;
+esac
