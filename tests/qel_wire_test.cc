@@ -181,6 +181,37 @@ TEST(Explain, OfControlCharacters_EscapesThem) {
       << text;
 }
 
+// Of each kind the first and the last: C0 and DEL, C1, marks of direction, separators of lines.
+TEST(Quoted, CharactersThatATerminalObeys_AreEscaped) {
+  for (const char* text :
+       {"\x01", "\x1f", "\x7f", "\xc2\x80", "\xc2\x9f", "\xd8\x9c", "\xe2\x80\x8e", "\xe2\x80\x8f",
+        "\xe2\x80\xa8", "\xe2\x80\xae", "\xe2\x81\xa6", "\xe2\x81\xa9", "\xef\xbb\xbf"}) {
+    EXPECT_EQ(qel_wire::in_quotes(text).find(text), std::string::npos) << support::to_hex(text);
+  }
+}
+
+// Their neighbours.
+TEST(Quoted, CharactersThatATerminalShows_StayAsTheyAre) {
+  for (const char* text :
+       {" ", "~", "\xc2\xa0", "\xd8\x9b", "\xe2\x80\x8d", "\xe2\x80\x90", "\xe2\x80\xa7",
+        "\xe2\x80\xaf", "\xe2\x81\xa5", "\xe2\x81\xaa", "\xef\xbb\xbe", "\xf0\x9f\x98\x80"}) {
+    EXPECT_EQ(qel_wire::in_quotes(text), "\"" + std::string(text) + "\"");
+  }
+}
+
+TEST(Utf8, AtItsBounds_IsToldFromWhatIsNone) {
+  for (const char* text : {"", "a", "\xc2\x80", "\xdf\xbf", "\xe0\xa0\x80", "\xed\x9f\xbf",
+                           "\xee\x80\x80", "\xf0\x90\x80\x80", "\xf4\x8f\xbf\xbf"}) {
+    EXPECT_TRUE(qel_wire::is_utf8(text)) << support::to_hex(text);
+  }
+  // Overlong, surrogates, too large, a lead or a continuation without the other.
+  for (const char* text :
+       {"\xc0\x80", "\xc1\xbf", "\xe0\x9f\xbf", "\xf0\x8f\xbf\xbf", "\xed\xa0\x80", "\xed\xbf\xbf",
+        "\xf4\x90\x80\x80", "\xf8\x88\x80\x80\x80", "\x80", "\xc2", "\xc2\x41", "\xe2\x80"}) {
+    EXPECT_FALSE(qel_wire::is_utf8(text)) << support::to_hex(text);
+  }
+}
+
 TEST(Explain, WithColours_ClosesEachThatItOpens) {
   ExplainOptions options;
   options.colours = qel_wire::Colours(true);
@@ -308,6 +339,13 @@ TEST(AccessToken, WhenExplainedAsAnotherMessage_IsNotShown) {
       "field\n"
       "000007  32 08                    6 ? length-delimited = (not shown), 8 bytes  ! unknown "
       "field\n");
+}
+
+// Its number has another meaning within an embedded message.
+TEST(AccessToken, OfAnEmbeddedMessage_IsNone) {
+  const std::string text =
+      explained("ChatReply", Wire().message(13, Wire().text(6, "no token")).bytes());
+  EXPECT_NE(text.find("\"no token\""), std::string::npos) << text;
 }
 
 TEST(AccessToken, WhenItIsCut_IsNotShown) {
