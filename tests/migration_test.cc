@@ -118,9 +118,11 @@ TEST_F(Migration, WhenTheBufferIsTakenForSuccess_ARefusedTextIsTheMessageBefore)
 }
 
 TEST_F(Migration, WhenTheStatusIsLookedAt_ARefusedTextIsNoMessage) {
-  Message message;
-  EXPECT_FALSE(chat_by_its_status(nullptr, &message.data, &message.size));
-  EXPECT_EQ(message.data, nullptr);
+  unsigned char before = 0;
+  unsigned char* data = &before;
+  int size = 0;
+  EXPECT_FALSE(chat_by_its_status(nullptr, &data, &size));
+  EXPECT_EQ(data, nullptr);
 }
 
 TEST_F(Migration, WhenTheStatusIsLookedAt_AFailedAllocationIsNoMessage) {
