@@ -2,6 +2,10 @@
 // it says. Compiled from the page.
 
 #include "migration_examples.h"
+
+#include <cstdlib>
+#include <vector>
+
 #include "support/exchange.h"
 #include "support/heap.h"
 #include "support/process_death.h"
