@@ -1,11 +1,10 @@
 // What docs/migration.md shows: its right functions do what it says of them, its wrong ones fail as
 // it says. Compiled from the page.
 
-#include "migration_examples.h"
-
 #include <cstdlib>
 #include <vector>
 
+#include "migration_examples.h"
 #include "support/exchange.h"
 #include "support/heap.h"
 #include "support/process_death.h"
