@@ -1,5 +1,6 @@
 # The commands of Markdown pages, a line each: those of shell blocks, without comments and with
-# continued lines joined, and those in backticks that call ./dev, cmake or ctest with an argument.
+# continued lines joined; in console blocks those behind a prompt; and those in backticks that call
+# ./dev, cmake or ctest with an argument.
 
 function command(text) {
   sub(/(^|[ \t])#.*/, "", text)
@@ -23,12 +24,13 @@ function end_of_paragraph(words, n, i) {
 FNR == 1 { end_of_paragraph(); fence = "" }
 /^[ \t]*```/ {
   end_of_paragraph()
-  fence = fence != "" ? "" : ($0 ~ /```(sh|bash|shell|console)$/ ? "shell" : "other")
+  fence = fence != "" ? "" : ($0 ~ /```(sh|bash|shell)$/ ? "shell" : $0 ~ /```console$/ ? "console" : "other")
   next
 }
 fence == "shell" && sub(/\\$/, "") { joined = joined $0; next }
 fence == "shell" { command(joined $0); joined = ""; next }
-fence == "other" { next }
+fence == "console" && sub(/^\$ /, "") { command($0) }
+fence == "console" || fence == "other" { next }
 /^[ \t]*$/ { end_of_paragraph(); next }
 { paragraph = paragraph " " $0 }
 END { end_of_paragraph() }

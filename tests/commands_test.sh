@@ -9,7 +9,7 @@ list=$source/tests/documented_commands.txt
 entries() { grep -v '^#' "$list" | grep .; }
 
 # field N: of each entry.
-field() { entries | awk -F ' [|] ' -v n="$1" '{ print $n }'; }
+field() { entries | awk -F ' => ' -v n="$1" '{ print $n }'; }
 
 documented() {
   (cd "$source" && find README.md CONTRIBUTING.md SECURITY.md docs fuzz/README.md -maxdepth 1 -name '*.md' \
@@ -36,7 +36,7 @@ case $1 in
   each_is_in_the_list)
     commands=$(documented)
     [ -n "$commands" ]
-    none_but "$(field 1)" "No line of $list says what runs these (COMMAND | WHOLE | BY)" <<<"$commands"
+    none_but "$(field 1)" "No line of $list says what runs these (COMMAND => WHOLE => BY)" <<<"$commands"
     ;;
   each_of_the_list_is_documented)
     none_but "$(documented)" "No page has these commands of $list any more" < <(field 1)
@@ -46,7 +46,8 @@ case $1 in
     [ -z "$twice" ] || { printf 'More than once in %s:\n%s\n' "$list" "$twice" >&2 && exit 1; }
     ;;
   entries_are_well_formed)
-    ! entries | grep -vE '^[^|]+ \| (whole|part: [^|]+) \| [^|, ][^|]*[^|, ]$' >&2 || exit 1
+    wrong=$(entries | awk -F ' => ' 'NF != 3 || $2 !~ /^(whole$|part: .)/ || $3 !~ /^[^, ].*[^, ]$/')
+    [ -z "$wrong" ] || { printf 'Not COMMAND => WHOLE => BY in %s:\n%s\n' "$list" "$wrong" >&2 && exit 1; }
     ;;
   named_stages_are_of_the_check)
     none_but "$(stages)" './dev check has no such line or step' < <(runners | sed -n 's/^check: //p')
