@@ -58,7 +58,8 @@ case $1 in
         -DCMAKE_C_COMPILER="$sdk/bin/device-gcc" -DCMAKE_CXX_COMPILER="$sdk/bin/device-g++" \
         -DQEL_PROTOBUF_ROOT="$sdk/sysroot/usr" -DQEL_PROTOC="$protoc" \
         -DBUILD_TESTING=OFF -DCMAKE_CXX_FLAGS_RELEASE=-O0 &&
-        cmake --build "$scratch/build" --target qel-message-protosvc
+        cmake --build "$scratch/build" --target qel-message-protosvc &&
+        ctest --test-dir "$scratch/build" -j 2 --output-on-failure
     ) >"$scratch/messages" 2>&1 || fail "$(cat "$scratch/messages")"
     grep -q "log service  *$sdk/sysroot/usr/lib/libdlog.so$" "$scratch/messages" ||
       fail "another dlog: $(cat "$scratch/messages")"
