@@ -49,7 +49,7 @@ set(CPACK_COMPONENT_TOOLS_DESCRIPTION "A command that shows and makes the protoc
 # Debian's last package of this runtime was libprotobuf9.
 set(CPACK_DEBIAN_WORKSTATION_PACKAGE_NAME ${PROJECT_NAME}-workstation)
 set(CPACK_DEBIAN_WORKSTATION_PACKAGE_SECTION libs)
-set(CPACK_DEBIAN_WORKSTATION_PACKAGE_DEPENDS "libc6 (>= 2.14), libgcc-s1 (>= 3.5), libstdc++6 (>= 11)")
+set(CPACK_DEBIAN_WORKSTATION_PACKAGE_DEPENDS "libc6 (>= 2.17), libgcc-s1 (>= 3.5), libstdc++6 (>= 11)")
 set(CPACK_DEBIAN_WORKSTATION_PACKAGE_CONTROL_EXTRA "${PROJECT_SOURCE_DIR}/packaging/triggers")
 set(CPACK_COMPONENT_WORKSTATION_DESCRIPTION
   "What the library needs and a workstation has not: the runtime of Protocol Buffers ${QEL_PROTOBUF_VERSION} and a
