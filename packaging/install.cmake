@@ -1,7 +1,7 @@
 # What 'cmake --install' puts where. Each component is a package of packages.cmake.
 
 # Debian's layout, so that what is installed in /usr serves as a package of any machine; but a device
-# SDK's sysroot has its own.
+# has its SDK's.
 if(CMAKE_LIBRARY_ARCHITECTURE AND NOT CMAKE_SYSROOT)
   set(CMAKE_INSTALL_LIBDIR "lib/${CMAKE_LIBRARY_ARCHITECTURE}" CACHE PATH "Folder of libraries in the prefix")
 endif()
@@ -52,10 +52,11 @@ if(TARGET dlog-standin)
   install(FILES "${QEL_PROTOBUF_PREFIX}/share/doc/protobuf/LICENSE"
     DESTINATION "${CMAKE_INSTALL_DATADIR}/doc/${PROJECT_NAME}-workstation"
     RENAME LICENSE.protobuf COMPONENT workstation OPTIONAL)
-  # As is done with targets.
-  install(CODE "
-    if(CMAKE_INSTALL_DO_STRIP)
-      file(GLOB runtime \"\$ENV{DESTDIR}\${CMAKE_INSTALL_PREFIX}/${CMAKE_INSTALL_LIBDIR}/libprotobuf.so.9.*\")
-      execute_process(COMMAND \"${CMAKE_STRIP}\" \${runtime} COMMAND_ERROR_IS_FATAL ANY)
-    endif()" COMPONENT workstation)
+  if(_runtime)
+    install(CODE "
+      if(CMAKE_INSTALL_DO_STRIP) # as is done with targets
+        file(GLOB runtime \"\$ENV{DESTDIR}\${CMAKE_INSTALL_PREFIX}/${CMAKE_INSTALL_LIBDIR}/libprotobuf.so.9.*\")
+        execute_process(COMMAND \"${CMAKE_STRIP}\" \${runtime} COMMAND_ERROR_IS_FATAL ANY)
+      endif()" COMPONENT workstation)
+  endif()
 endif()

@@ -5,9 +5,9 @@ set(CPACK_GENERATOR DEB TGZ)
 set(CPACK_PACKAGE_CONTACT "The maintainers <maintainers@example.invalid>") # a project has its own here
 set(CPACK_PACKAGE_DESCRIPTION_SUMMARY "${PROJECT_DESCRIPTION}")
 set(CPACK_PACKAGE_FILE_NAME "${PROJECT_NAME}-${PROJECT_VERSION}-${CMAKE_LIBRARY_ARCHITECTURE}")
-# Five sixths of the library are debug information, which takes a device's space and names the build's
-# folders. The build folder keeps it: a core dump is read with the library there, whose build id is the
-# same.
+# Five sixths of the library are debug information, which takes a device's space and names the
+# build's folders. The build folder keeps it: a core dump is read with the library there, which has the
+# same build id.
 set(CPACK_STRIP_FILES ON)
 set(CPACK_INSTALL_DEFAULT_DIRECTORY_PERMISSIONS # whatever the umask
   OWNER_READ OWNER_WRITE OWNER_EXECUTE GROUP_READ GROUP_EXECUTE WORLD_READ WORLD_EXECUTE)
@@ -37,8 +37,8 @@ set(CPACK_DEBIAN_DEVELOPMENT_PACKAGE_NAME libqel-message-protosvc-dev)
 set(CPACK_DEBIAN_DEVELOPMENT_PACKAGE_SECTION libdevel)
 set(CPACK_DEBIAN_DEVELOPMENT_PACKAGE_DEPENDS "${_library_package} (= ${PROJECT_VERSION})")
 set(CPACK_COMPONENT_DEVELOPMENT_DESCRIPTION
-  "Headers, schema, pkg-config files and CMake package for authors of plug-ins in C and of modules that
-use the exported classes.")
+  "Headers, schema, pkg-config files and CMake package, for authors of plug-ins in C and of modules
+that use the exported classes.")
 
 set(CPACK_DEBIAN_TOOLS_PACKAGE_NAME qel-wire)
 set(CPACK_DEBIAN_TOOLS_PACKAGE_SECTION utils)
@@ -52,8 +52,8 @@ set(CPACK_DEBIAN_WORKSTATION_PACKAGE_SECTION libs)
 set(CPACK_DEBIAN_WORKSTATION_PACKAGE_DEPENDS "libc6 (>= 2.17), libgcc-s1 (>= 3.5), libstdc++6 (>= 11)")
 set(CPACK_DEBIAN_WORKSTATION_PACKAGE_CONTROL_EXTRA "${PROJECT_SOURCE_DIR}/packaging/triggers")
 set(CPACK_COMPONENT_WORKSTATION_DESCRIPTION
-  "What the library needs and a workstation has not: the runtime of Protocol Buffers ${QEL_PROTOBUF_VERSION} and a
-stand-in for the device's log service.")
+  "What the library needs and a workstation has not: the runtime of Protocol Buffers
+${QEL_PROTOBUF_VERSION} and a stand-in for the device's log service.")
 if(TARGET dlog-standin)
   string(APPEND CPACK_DEBIAN_RUNTIME_PACKAGE_DEPENDS ", ${PROJECT_NAME}-workstation")
 endif()

@@ -1,7 +1,7 @@
 #!/usr/bin/env bash
 # install_test.sh CASE SOURCE BUILD VERSION LIBDIR PROTOBUF-ROOT CC CXX [TOOLCHAIN]: what 'cmake
 # --install' makes, and whether others can build with it. The case set_up goes before the others: it
-# installs into a folder, which is then moved. With TOOLCHAIN, a CMake file, it is for another machine.
+# installs into a folder, which is then moved. With TOOLCHAIN, CMake's, it is for another machine.
 set -euo pipefail
 export LC_ALL=C
 source=$2

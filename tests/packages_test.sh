@@ -1,7 +1,7 @@
 #!/usr/bin/env bash
 # packages_test.sh CASE SOURCE BUILD VERSION LIBDIR PROTOBUF-ROOT CC CXX [TOOLCHAIN]: what 'cpack'
 # makes, and whether it can be installed and used. The case set_up, which calls it, goes before the
-# others. With TOOLCHAIN, a CMake file, it is for another machine.
+# others. With TOOLCHAIN, CMake's, it is for another machine.
 set -euo pipefail
 export LC_ALL=C
 source=$2
