@@ -1,11 +1,13 @@
 // The program that stands under every target's name.
 
+#include <google/protobuf/descriptor.h>
 #include <google/protobuf/stubs/common.h>
 
 #include <cstdint>
 #include <cstdio>
 #include <cstdlib>
 
+#include "msgspec_frontend.pb.h"
 #include "target.h"
 
 namespace fuzz {
@@ -15,6 +17,7 @@ std::vector<Target> all_targets() {
   std::vector<Target> targets = deserializer_targets();
   targets.push_back({"serializers", check_serializers});
   targets.push_back({"round_trip", check_round_trip});
+  targets.push_back({"qel_wire", check_qel_wire});
   return targets;
 }
 
@@ -39,6 +42,13 @@ Target chosen;
 void fail(const std::string& finding) {
   std::fprintf(stderr, "\n%s: %s\n", chosen.name.c_str(), finding.c_str());
   std::abort();
+}
+
+std::unique_ptr<google::protobuf::Message> new_message(unsigned char choice) {
+  const auto* file = ConnectionStatus::descriptor()->file();
+  const auto* type = file->message_type(choice % file->message_type_count());
+  return std::unique_ptr<google::protobuf::Message>(
+      google::protobuf::MessageFactory::generated_factory()->GetPrototype(type)->New());
 }
 
 }  // namespace fuzz

@@ -99,11 +99,16 @@ reply typing_updated_deserialize TypingUpdated "requestId: 7 chatroomId: 8 sende
 reply change_chatroom_meta_reply_deserialize ChangeChatroomMetaReply "requestId: 7 chatroomId: 8 $result"
 
 # The first byte is the message's place in the schema.
-mkdir -p "$folder/round_trip"
+mkdir -p "$folder/round_trip" "$folder/qel_wire"
 place=0
 while read -r message; do
   # shellcheck disable=SC2059 # an escape that is put together
   { printf "\\x$(printf %02x $place)" && all_fields "$message" | encode "$message"; } >"$folder/round_trip/$message"
+  # What encoders do not write: a packed list or a number where a text is (field 11), unknown fields and
+  # groups, an enumeration's number that is no member, a length behind the end.
+  # shellcheck disable=SC2059
+  printf "\\x$(printf %02x $place)\\x5a\\x02\\x00\\x63\\x30\\x07\\xc3\\x3e\\x08\\x01\\xc4\\x3e\\x70\\x63\\x6a\\x03\\x08" \
+    >"$folder/qel_wire/$message"
   place=$((place + 1))
 done < <(sed -n 's/^message //p' "$table")
 

@@ -1,28 +1,18 @@
 // Any bytes into any of the schema's classes, which the first byte chooses: what is taken comes out
 // again and stays the same from then on, with all that the class does not know.
 
-#include <google/protobuf/descriptor.h>
 #include <google/protobuf/message.h>
 #include <google/protobuf/text_format.h>
 
 #include <memory>
 
-#include "msgspec_frontend.pb.h"
 #include "target.h"
 
 namespace fuzz {
 namespace {
 
-using google::protobuf::Descriptor;
 using google::protobuf::Message;
-using google::protobuf::MessageFactory;
 using google::protobuf::TextFormat;
-
-std::unique_ptr<Message> new_message(unsigned char choice) {
-  const auto* file = ConnectionStatus::descriptor()->file();
-  const Descriptor* type = file->message_type(choice % file->message_type_count());
-  return std::unique_ptr<Message>(MessageFactory::generated_factory()->GetPrototype(type)->New());
-}
 
 std::string encoded(const Message& message) {
   std::string bytes = message.SerializeAsString();

@@ -2,7 +2,10 @@
 #ifndef FUZZ_TARGET_H
 #define FUZZ_TARGET_H
 
+#include <google/protobuf/message.h>
+
 #include <functional>
+#include <memory>
 #include <string>
 #include <vector>
 
@@ -16,6 +19,10 @@ struct Target {
 std::vector<Target> deserializer_targets();  // each named after its function
 void check_serializers(const std::string& bytes);
 void check_round_trip(const std::string& bytes);
+void check_qel_wire(const std::string& bytes);
+
+// Of the schema's message that a byte of the input chooses.
+std::unique_ptr<google::protobuf::Message> new_message(unsigned char choice);
 
 // Ends the program, as a finding of libFuzzer's.
 [[noreturn]] void fail(const std::string& finding);

@@ -1,11 +1,5 @@
 # What 'cmake --install' puts where. Each component is a package of packages.cmake.
 
-# Debian's layout, so that what is installed in /usr serves as a package of any machine; but a device
-# has its SDK's.
-if(CMAKE_LIBRARY_ARCHITECTURE AND NOT CMAKE_SYSROOT)
-  set(CMAKE_INSTALL_LIBDIR "lib/${CMAKE_LIBRARY_ARCHITECTURE}" CACHE PATH "Folder of libraries in the prefix")
-endif()
-include(GNUInstallDirs)
 include(CMakePackageConfigHelpers)
 set(_made "${CMAKE_CURRENT_BINARY_DIR}/packaging")
 set(_headers "${CMAKE_INSTALL_INCLUDEDIR}/${PROJECT_NAME}")
@@ -45,6 +39,9 @@ install(
 # folder. On a device both are the system's.
 if(TARGET dlog-standin)
   set_target_properties(qel-message-protosvc PROPERTIES INSTALL_RPATH "$ORIGIN")
+  if(TARGET qel-wire)
+    set_target_properties(qel-wire PROPERTIES INSTALL_RPATH "$ORIGIN/../${CMAKE_INSTALL_LIBDIR}")
+  endif()
   install(TARGETS dlog-standin LIBRARY COMPONENT workstation)
   cmake_path(GET QEL_PROTOBUF_LIBRARY PARENT_PATH _folder)
   file(GLOB _runtime "${_folder}/libprotobuf.so.9*") # none where the runtime is laid out otherwise

@@ -21,14 +21,14 @@ elseif(CMAKE_LIBRARY_ARCHITECTURE STREQUAL "arm-linux-gnueabi")
   set(CPACK_DEBIAN_PACKAGE_ARCHITECTURE armel)
 endif() # else this machine's
 
-# The lowest versions that have what is linked with; a test compares.
-set(_compiled "libc6 (>= 2.14), libgcc-s1 (>= 3.5), libstdc++6 (>= 5.2)")
+# Of the base libraries the lowest versions that have what is linked with are asked for; tests compare.
 
 set(_library_package libqel-message-protosvc${PROJECT_VERSION_MAJOR})
 configure_file(packaging/shlibs.in packaging/shlibs @ONLY)
 set(CPACK_DEBIAN_RUNTIME_PACKAGE_NAME ${_library_package})
 set(CPACK_DEBIAN_RUNTIME_PACKAGE_SECTION libs)
-set(CPACK_DEBIAN_RUNTIME_PACKAGE_DEPENDS "${_compiled}, libprotobuf9 (>= 2.6)")
+set(CPACK_DEBIAN_RUNTIME_PACKAGE_DEPENDS
+  "libc6 (>= 2.14), libgcc-s1 (>= 3.5), libstdc++6 (>= 5.2), libprotobuf9 (>= 2.6)")
 set(CPACK_DEBIAN_RUNTIME_PACKAGE_CONTROL_EXTRA
   "${PROJECT_SOURCE_DIR}/packaging/triggers;${PROJECT_BINARY_DIR}/packaging/shlibs")
 set(CPACK_COMPONENT_RUNTIME_DESCRIPTION "The shared library that message plug-ins are linked with.")
@@ -43,7 +43,8 @@ that use the exported classes.")
 set(CPACK_DEBIAN_TOOLS_PACKAGE_NAME qel-wire)
 set(CPACK_DEBIAN_TOOLS_PACKAGE_SECTION utils)
 set(CPACK_DEBIAN_TOOLS_PACKAGE_DEPENDS
-  "${_compiled}, libprotobuf9 (>= 2.6), ${_library_package} (= ${PROJECT_VERSION})")
+  "libc6 (>= 2.34), libgcc-s1 (>= 3.5), libstdc++6 (>= 11), libprotobuf9 (>= 2.6), libnettle8, \
+${_library_package} (= ${PROJECT_VERSION})")
 set(CPACK_COMPONENT_TOOLS_DESCRIPTION "A command that shows and makes the protocol's messages.")
 
 # Debian's last package of this runtime was libprotobuf9.
@@ -61,6 +62,12 @@ if(_runtime) # is installed with it
   set(CPACK_DEBIAN_WORKSTATION_PACKAGE_PROVIDES "libprotobuf9 (= ${QEL_PROTOBUF_VERSION})")
   set(CPACK_DEBIAN_WORKSTATION_PACKAGE_CONFLICTS libprotobuf9)
   set(CPACK_DEBIAN_WORKSTATION_PACKAGE_REPLACES libprotobuf9)
+endif()
+
+# What they are made of, to be built.
+add_custom_target(packaged DEPENDS qel-message-protosvc)
+if(TARGET qel-wire)
+  add_dependencies(packaged qel-wire)
 endif()
 
 include(CPack)

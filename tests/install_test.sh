@@ -69,7 +69,7 @@ case $1 in
   no_file_names_the_build)
     # But for debug information, which is of the sources.
     cp -r "$moved" "$scratch/tree"
-    find "$scratch/tree/$libdir" -type f -name '*.so*' \
+    find "$scratch/tree" -type f '(' -name '*.so*' -o -path '*/bin/*' ')' \
       -exec "$("$cc" -print-prog-name=objcopy)" --strip-debug {} ';'
     ! grep -rlF -e "$source" -e "$build" -e "$protobuf" "$scratch/tree" >&2 || exit 1
     ;;
@@ -88,6 +88,7 @@ case $1 in
     compile_with_cmake "$tree" classes
     prints 'ClientEcho 7' "$tree" "$scratch/built/module"
     ;;
+  tool_runs) prints "qel-wire $version" "$tree" "$tree/bin/qel-wire" --version ;;
   classes_module_compiles_with_pkg_config)
     export PKG_CONFIG_PATH=$tree/$libdir/pkgconfig:$protobuf/lib/pkgconfig
     flags=$(pkg-config --cflags --libs qel-message-protosvc-classes)

@@ -64,15 +64,13 @@ compile_with_cmake() {
   } >"$scratch/messages" 2>&1 || fail "$(cat "$scratch/messages")"
 }
 
-# prints TEXT TREE PROGRAM: what the program prints.
+# prints TEXT TREE PROGRAM [ARGUMENT...]: what the program prints.
 prints() {
-  local printed
-  if [ -n "$toolchain" ]; then
-    printed=$(DLOG_STANDIN_PRIORITY=S qemu-arm -L "$(root_of "$2")" "$3")
-  else
-    printed=$(DLOG_STANDIN_PRIORITY=S "$3")
-  fi
-  [ "$printed" = "$1" ] || fail "expected '$1', printed '$printed'"
+  local text=$1 tree=$2 printed
+  shift 2
+  [ -z "$toolchain" ] || set -- qemu-arm -L "$(root_of "$tree")" "$@"
+  printed=$(DLOG_STANDIN_PRIORITY=S "$@")
+  [ "$printed" = "$text" ] || fail "expected '$text', printed '$printed'"
 }
 
 # c_plugin_runs TREE

@@ -31,8 +31,9 @@ case $1 in
       <(grep '^|' "$source/README.md" | grep -oE '`[a-z_]+serialize`' | tr -d '`' | sort) >&2
     ;;
   fuzz_targets_are_the_deserializers)
-    # Each target is named by its folder of seeds; two are for all functions and all messages.
-    diff <({ working | grep '_deserialize$' && printf '%s\n' round_trip serializers; } | sort) \
+    # Each target is named by its folder of seeds; three are for all functions, for all messages and for
+    # the tool.
+    diff <({ working | grep '_deserialize$' && printf '%s\n' qel_wire round_trip serializers; } | sort) \
       <(find "$source/fuzz/seeds" -mindepth 1 -maxdepth 1 -printf '%f\n' | sort) >&2
     ;;
   fuzzing_calls_each_serializer)

@@ -29,6 +29,7 @@ esac
 library=$packages/libqel-message-protosvc${first}_${version}_$architecture.deb
 development=$packages/libqel-message-protosvc-dev_${version}_$architecture.deb
 workstation=$packages/qel-message-protosvc-workstation_${version}_$architecture.deb
+tool=$packages/qel-wire_${version}_$architecture.deb
 archive=$packages/qel-message-protosvc-$version-$triple.tar.gz
 
 # declares PACKAGE: its control fields but for those that its contents make, as on standard input.
@@ -48,10 +49,10 @@ enough() {
   done
 }
 
-# symbol_versions PACKAGE PATTERN: those that its libraries are linked with.
+# symbol_versions PACKAGE PATTERN: those that its libraries and programs are linked with.
 symbol_versions() {
   dpkg-deb -x "$1" "$scratch/unpacked"
-  find "$scratch/unpacked" -name '*.so*' -type f -exec readelf -VW {} + |
+  find "$scratch/unpacked" -type f '(' -name '*.so*' -o -path '*/bin/*' ')' -exec readelf -VW {} + |
     sed -En "s/.*  Name: ($2[0-9.]+) .*/\1/p" | sort -u | grep .
 }
 
@@ -66,8 +67,8 @@ libstdcxx_is_new_enough() {
   join "$scratch/used" "$scratch/known" | enough "$1" libstdc++6
 }
 
-# make_root: $root, with dpkg's database, which knows the base libraries of this machine, or those of
-# the other one as its cross compiler brings them.
+# make_root [LIBRARY...]: $root, with dpkg's database, which knows the base libraries of this machine,
+# and those named, or the base libraries of the other one as its cross compiler brings them.
 make_root() {
   local name of=''
   root=$scratch/root
@@ -77,7 +78,7 @@ make_root() {
     printf '%s\n' "$native" "$architecture" >"$root/var/lib/dpkg/arch"
     of=-$architecture-cross
   fi
-  for name in libc6 libgcc-s1 libstdc++6; do
+  for name in libc6 libgcc-s1 libstdc++6 "$@"; do
     dpkg-query -W -f="Package: $name
 Status: install ok installed
 Maintainer: nobody
@@ -125,6 +126,12 @@ TXT
 ./$licence}
 TXT
     ;;
+  tool_has_program_and_completion)
+    has "$tool" <<TXT
+./usr/bin/qel-wire
+./usr/share/bash-completion/completions/qel-wire
+TXT
+    ;;
   library_declares_what_it_needs)
     declares "$library" <<TXT
 Architecture: $architecture
@@ -158,6 +165,16 @@ Section: libs
 Version: $version
 TXT
     ;;
+  tool_declares_what_it_needs)
+    declares "$tool" <<TXT
+Architecture: $architecture
+Depends: libc6 (>= 2.34), libgcc-s1 (>= 3.5), libstdc++6 (>= 11), libprotobuf9 (>= 2.6), libnettle8, libqel-message-protosvc$first (= $version)
+Package: qel-wire
+Priority: optional
+Section: utils
+Version: $version
+TXT
+    ;;
   library_renews_the_loader_cache)
     [ "$(dpkg-deb --info "$library" triggers)" = 'activate-noawait ldconfig' ]
     ;;
@@ -167,10 +184,13 @@ TXT
     ;;
   c_library_is_new_enough_for_the_library) libc_is_new_enough "$library" ;;
   c_library_is_new_enough_for_the_workstation) libc_is_new_enough "$workstation" ;;
+  c_library_is_new_enough_for_the_tool) libc_is_new_enough "$tool" ;;
   gcc_library_is_new_enough_for_the_library) libgcc_is_new_enough "$library" ;;
   gcc_library_is_new_enough_for_the_workstation) libgcc_is_new_enough "$workstation" ;;
+  gcc_library_is_new_enough_for_the_tool) libgcc_is_new_enough "$tool" ;;
   cxx_library_is_new_enough_for_the_library) libstdcxx_is_new_enough "$library" ;;
   cxx_library_is_new_enough_for_the_workstation) libstdcxx_is_new_enough "$workstation" ;;
+  cxx_library_is_new_enough_for_the_tool) libstdcxx_is_new_enough "$tool" ;;
   nothing_names_the_build)
     for package in "$packages"/*.deb; do
       dpkg-deb -R "$package" "$scratch/$(basename "$package")"
@@ -188,6 +208,11 @@ TXT
     make_root
     install_packages "$library" "$development" "$workstation" || fail "$(cat "$scratch/messages")"
     c_plugin_runs "$root/usr"
+    ;;
+  tool_runs_where_they_are_installed)
+    make_root libnettle8
+    install_packages "$library" "$workstation" "$tool" || fail "$(cat "$scratch/messages")"
+    prints "qel-wire $version" "$root/usr" "$root/usr/bin/qel-wire" --version
     ;;
   c_plugin_runs_where_the_archive_is_unpacked)
     mkdir "$scratch/root"

@@ -1,0 +1,235 @@
+#include "explain.h"
+
+#include <algorithm>
+#include <cstdio>
+#include <string>
+
+#include "token.h"
+#include "walk.h"
+
+namespace qel_wire {
+namespace {
+
+using google::protobuf::EnumValueDescriptor;
+using google::protobuf::FieldDescriptor;
+
+constexpr size_t kBytesInRow = 8;
+constexpr size_t kMostShown = 4 * kBytesInRow;  // of a field's bytes, and of a text's
+
+std::string printed(const char* format, uint64_t number) {
+  char text[32];
+  std::snprintf(text, sizeof text, format, static_cast<unsigned long long>(number));
+  return text;
+}
+
+// A value, and what is to be said against it.
+struct Reading {
+  std::string value;
+  std::string doubt;
+};
+
+Reading read_32_bits(uint64_t value) {
+  const auto kept = static_cast<int32_t>(static_cast<uint32_t>(value));
+  const bool fits = static_cast<int64_t>(value) == kept;
+  return {std::to_string(kept),
+          fits ? "" : "more than 32 bits: " + std::to_string(static_cast<int64_t>(value))};
+}
+
+Reading read_enum(const FieldDescriptor& field, uint64_t value) {
+  Reading reading = read_32_bits(value);
+  const EnumValueDescriptor* member =
+      field.enum_type()->FindValueByNumber(std::stoi(reading.value));
+  if (member != nullptr) {
+    reading.value = member->name() + " (" + reading.value + ")";
+  } else {
+    reading.doubt = "not in " + field.enum_type()->name() + ", reads as absent";
+  }
+  return reading;
+}
+
+Reading read_known_number(const FieldDescriptor& field, uint64_t value) {
+  switch (field.type()) {
+    case FieldDescriptor::TYPE_INT32:
+      return read_32_bits(value);
+    case FieldDescriptor::TYPE_ENUM:
+      return read_enum(field, value);
+    case FieldDescriptor::TYPE_BOOL:
+      return {value != 0 ? "true" : "false", value > 1 ? "neither 0 nor 1" : ""};
+    default:
+      return {std::to_string(static_cast<int64_t>(value)), ""};
+  }
+}
+
+const char* wire_type_name(Piece::Kind kind) {
+  switch (kind) {
+    case Piece::kVarint:
+      return "varint";
+    case Piece::kFixed64:
+      return "8 bytes";
+    case Piece::kFixed32:
+      return "4 bytes";
+    case Piece::kGroup:
+      return "group";
+    default:
+      return "length-delimited";
+  }
+}
+
+std::string type_name(const FieldDescriptor& field) {
+  if (field.message_type() != nullptr) {
+    return field.message_type()->name();
+  }
+  return field.enum_type() != nullptr ? field.enum_type()->name() : field.type_name();
+}
+
+class Explanation : public Visitor {
+ public:
+  Explanation(std::string_view bytes, const ExplainOptions& options, std::ostream* out)
+      : bytes_(bytes), options_(options), colours_(options.colours), out_(*out) {}
+
+  void begin(const Piece& piece) override {
+    const bool is_hidden = !options_.show_token && is_access_token(piece);
+    const bool contains = piece.kind == Piece::kMessage || piece.kind == Piece::kPacked ||
+                          piece.kind == Piece::kGroup;
+    const size_t end = contains || is_hidden ? piece.value_offset : piece.end;
+    row(piece.offset, end, piece.depth,
+        name_of(piece) + type_of(piece) + (is_hidden ? hidden(piece) : value_of(piece)) +
+            doubts_of(piece));
+  }
+
+  void end(const Piece& piece) override {
+    if (piece.kind == Piece::kGroup) {  // alone it has bytes there
+      row(piece.end_tag, piece.end, piece.depth, std::to_string(piece.number) + " end of group");
+    }
+  }
+
+  void problem(const Problem& problem) {
+    row(problem.begin, problem.end, problem.depth,
+        colours_.wrong + "broken at offset " + std::to_string(problem.offset) + ": " +
+            problem.reason + colours_.end);
+  }
+
+ private:
+  std::string doubt(const std::string& text) const {
+    return text.empty() ? "" : "  " + colours_.doubt + "! " + text + colours_.end;
+  }
+
+  std::string name_of(const Piece& piece) const {
+    const bool is_element = piece.offset == piece.value_offset;
+    const std::string name = piece.field != nullptr ? piece.field->name() : "?";
+    return is_element
+               ? ""
+               : std::to_string(piece.number) + " " + colours_.name + name + colours_.end + " ";
+  }
+
+  static std::string type_of(const Piece& piece) {
+    const bool is_packed = piece.kind == Piece::kPacked;
+    return (piece.is_known ? type_name(*piece.field) : wire_type_name(piece.kind)) +
+           std::string(is_packed ? ", packed" : "");
+  }
+
+  static std::string hidden(const Piece& piece) {
+    return " = " + std::string(kNotShown) + ", " + counted(piece.bytes.size(), "byte");
+  }
+
+  std::string coloured(const std::string& value) const {
+    return " = " + colours_.value + value + colours_.end;
+  }
+
+  std::string value_of(const Piece& piece) const {
+    switch (piece.kind) {
+      case Piece::kVarint:
+        return coloured(piece.is_known ? read_known_number(*piece.field, piece.value).value
+                                       : std::to_string(static_cast<int64_t>(piece.value)));
+      case Piece::kFixed64:
+        return coloured(printed("0x%016llx", piece.value));
+      case Piece::kFixed32:
+        return coloured(printed("0x%08llx", piece.value));
+      case Piece::kBytes: {
+        const size_t shown = options_.show_all ? piece.bytes.size() : kMostShown;
+        const bool is_cut = piece.bytes.size() > shown;
+        return coloured(in_quotes(piece.bytes.substr(0, whole_characters(piece.bytes, shown))) +
+                        (is_cut ? "..." : "")) +
+               ", " + counted(piece.bytes.size(), "byte");
+      }
+      case Piece::kGroup:
+        return "";
+      default:
+        return ", " + counted(piece.end - piece.value_offset, "byte");
+    }
+  }
+
+  // Not in the middle of a character.
+  static size_t whole_characters(std::string_view text, size_t size) {
+    if (size >= text.size()) {
+      return text.size();
+    }
+    size_t end = size;
+    while (end > 0 && size - end < 4 && (static_cast<unsigned char>(text[end]) & 0xc0U) == 0x80) {
+      --end;
+    }
+    return end;
+  }
+
+  std::string doubts_of(const Piece& piece) const {
+    if (piece.field == nullptr) {
+      return doubt("unknown field");
+    }
+    if (!piece.is_known) {
+      return doubt("unknown field: " + piece.field->name() + " is " + type_name(*piece.field));
+    }
+    switch (piece.kind) {
+      case Piece::kVarint:
+        return doubt(read_known_number(*piece.field, piece.value).doubt);
+      case Piece::kBytes: {
+        const bool is_text = piece.field->type() == FieldDescriptor::TYPE_STRING;
+        return doubt(is_text && !is_utf8(piece.bytes) ? "not UTF-8" : "");
+      }
+      default:
+        return doubt(piece.length > piece.end - piece.value_offset
+                         ? "its length is " + std::to_string(piece.length) + ", more than there is"
+                         : "");
+    }
+  }
+
+  void row(size_t offset, size_t end, int depth, const std::string& meaning) {
+    const size_t size = end - offset;
+    const size_t shown = options_.show_all ? size : std::min(size, kMostShown);
+    size_t at = 0;
+    do {
+      const size_t in_row = std::min(shown - at, kBytesInRow);
+      out_ << colours_.quiet << printed("%06llx", offset + at) << colours_.end << ' ';
+      for (size_t i = 0; i < in_row; ++i) {
+        out_ << printed(" %02llx", static_cast<unsigned char>(bytes_[offset + at + i]));
+      }
+      if (at == 0) {
+        out_ << std::string(3 * (kBytesInRow - in_row) + 2 + 2 * static_cast<size_t>(depth), ' ')
+             << meaning;
+      }
+      out_ << '\n';
+      at += in_row;
+    } while (at < shown);
+    if (shown < size) {
+      out_ << std::string(8, ' ') << "... " << counted(size - shown, "more byte") << '\n';
+    }
+  }
+
+  std::string_view bytes_;
+  const ExplainOptions& options_;
+  const Colours& colours_;
+  std::ostream& out_;
+};
+
+}  // namespace
+
+bool explain(std::string_view bytes, const google::protobuf::Descriptor& type,
+             const ExplainOptions& options, std::ostream* out) {
+  Explanation explanation(bytes, options, out);
+  const std::optional<Problem> problem = walk(bytes, type, &explanation);
+  if (problem.has_value()) {
+    explanation.problem(*problem);
+  }
+  return !problem.has_value();
+}
+
+}  // namespace qel_wire

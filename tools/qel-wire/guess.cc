@@ -1,0 +1,112 @@
+#include "guess.h"
+
+#include <algorithm>
+#include <set>
+#include <tuple>
+
+#include "msgspec_frontend.pb.h"
+#include "text.h"
+#include "walk.h"
+
+namespace qel_wire {
+namespace {
+
+using google::protobuf::Descriptor;
+using google::protobuf::FieldDescriptor;
+using google::protobuf::FileDescriptor;
+
+class Fitting : public Visitor {
+ public:
+  explicit Fitting(Fit* fit) : fit_(*fit) { levels_.emplace_back(); }
+
+  void begin(const Piece& piece) override {
+    const bool is_element = piece.offset == piece.value_offset;
+    if (!piece.is_known) {
+      ++fit_.unknown;
+    } else if (!is_element) {
+      ++fit_.known;
+      check_order(*piece.field);
+    }
+    if (piece.is_known && is_doubtful(piece)) {
+      ++fit_.doubtful;
+    }
+    if (piece.kind == Piece::kMessage || piece.kind == Piece::kGroup ||
+        piece.kind == Piece::kPacked) {
+      levels_.emplace_back();
+    }
+  }
+
+  void end(const Piece& /*piece*/) override { levels_.pop_back(); }
+
+  // Of the message itself: how many of its fields it had.
+  size_t different_fields() const { return levels_.front().size(); }
+
+ private:
+  // Encoders write fields in the order of their numbers.
+  void check_order(const FieldDescriptor& field) {
+    std::set<int>& seen = levels_.back();
+    const bool is_again = !seen.insert(field.number()).second && !field.is_repeated();
+    const bool is_late = *seen.rbegin() != field.number();
+    if (is_again || is_late) {
+      ++fit_.doubtful;
+    }
+  }
+
+  static bool is_doubtful(const Piece& piece) {
+    if (piece.kind == Piece::kPacked) {  // which is taken and never written
+      return true;
+    }
+    if (piece.kind == Piece::kBytes) {
+      return piece.field->type() == FieldDescriptor::TYPE_STRING && !is_utf8(piece.bytes);
+    }
+    if (piece.kind != Piece::kVarint) {
+      return false;
+    }
+    const auto narrow = static_cast<int32_t>(static_cast<uint32_t>(piece.value));
+    switch (piece.field->type()) {
+      case FieldDescriptor::TYPE_ENUM:
+        return piece.field->enum_type()->FindValueByNumber(narrow) == nullptr;
+      case FieldDescriptor::TYPE_INT32:
+        return static_cast<int64_t>(piece.value) != narrow;
+      case FieldDescriptor::TYPE_BOOL:
+        return piece.value > 1;
+      default:
+        return false;
+    }
+  }
+
+  Fit& fit_;
+  std::vector<std::set<int>> levels_;  // of nesting: the fields that came so far
+};
+
+Fit fit(std::string_view bytes, const Descriptor& type) {
+  Fit result;
+  result.type = &type;
+  Fitting fitting(&result);
+  result.is_broken = walk(bytes, type, &fitting).has_value();
+  result.absent = static_cast<size_t>(type.field_count()) - fitting.different_fields();
+  return result;
+}
+
+auto quality(const Fit& fit) {
+  return std::tuple(fit.is_broken, fit.unknown + fit.doubtful, fit.unknown, fit.absent);
+}
+
+}  // namespace
+
+std::vector<Fit> guess(std::string_view bytes) {
+  const FileDescriptor& schema = *ChannelAuthRequest::descriptor()->file();
+  std::vector<Fit> fits;
+  for (int i = 0; i < schema.message_type_count(); ++i) {
+    fits.push_back(fit(bytes, *schema.message_type(i)));
+  }
+  std::stable_sort(fits.begin(), fits.end(),
+                   [](const Fit& a, const Fit& b) { return quality(a) < quality(b); });
+  for (size_t i = 0; i < fits.size(); ++i) {
+    const bool is_equal = i > 0 && quality(fits[i]) == quality(fits[i - 1]);
+    fits[i].rank = is_equal ? fits[i - 1].rank : static_cast<int>(i) + 1;
+  }
+  return fits;
+}
+
+}  // namespace qel_wire

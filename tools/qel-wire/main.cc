@@ -1,0 +1,335 @@
+// qel-wire: a capture of the protocol, as people read it.
+
+#include <getopt.h>
+#include <google/protobuf/message.h>
+#include <google/protobuf/stubs/common.h>
+#include <unistd.h>
+
+#include <cerrno>
+#include <cstdio>
+#include <cstdlib>
+#include <cstring>
+#include <iomanip>
+#include <iostream>
+#include <memory>
+#include <optional>
+#include <string>
+#include <vector>
+
+#include "explain.h"
+#include "forms.h"
+#include "guess.h"
+#include "schema.h"
+#include "text.h"
+#include "token.h"
+#include "walk.h"
+
+namespace {
+
+using google::protobuf::Descriptor;
+using google::protobuf::Message;
+using google::protobuf::MessageFactory;
+using qel_wire::Notation;
+
+// What the program exits with.
+constexpr int kDone = 0;
+constexpr int kBroken = 1;
+constexpr int kWrongCall = 2;
+constexpr int kNoAccess = 3;
+
+constexpr char kUsage[] = R"(usage: qel-wire COMMAND [OPTION...] [ARGUMENT...]
+
+  decode MESSAGE [FILE]     the fields, in the text form of Protocol Buffers or as JSON
+  encode MESSAGE [FILE]     the bytes of a message that is given in the text form
+  explain MESSAGE [FILE]    each field with its offset and its bytes, and what is wrong with them
+  guess [FILE]              which messages the bytes fit best
+  schema [NAME]             the names of all messages and enumerations, or the definition of one
+
+FILE is standard input if it is left out or '-'. What is in it are the bytes themselves, unless
+
+  --hex[=BYTES]             it is hex, or these are, instead of a file
+  --base64[=BYTES]          the same in base64
+
+which for encode say how the bytes are written.
+
+  --json                    decode: as JSON
+  --all                     explain: all bytes of long fields; guess: all messages
+  --show-token              the access token, which is hidden otherwise
+  --color=WHEN              always, never, or auto: on a terminal, unless NO_COLOR is set
+  --help, --version
+
+Exits with 0, with 1 if the bytes or the text are broken (guess: if no message takes them), with 2 if
+it was called wrongly, and with 3 if a file cannot be read or the output not be written.
+)";
+
+// Ends the program with that status.
+struct Failure {
+  int status;
+  std::string reason;
+};
+
+struct Call {
+  std::string command;
+  std::vector<std::string> arguments;
+  Notation notation = Notation::kRaw;
+  std::optional<std::string> written;  // the bytes, in the call itself
+  bool json = false;
+  bool all = false;
+  bool show_token = false;
+  std::string colour = "auto";
+};
+
+enum Option { kHex = 256, kBase64, kJson, kAll, kShowToken, kColor, kHelp, kVersion };
+
+constexpr option kOptions[] = {
+    {"hex", optional_argument, nullptr, kHex},
+    {"base64", optional_argument, nullptr, kBase64},
+    {"json", no_argument, nullptr, kJson},
+    {"all", no_argument, nullptr, kAll},
+    {"show-token", no_argument, nullptr, kShowToken},
+    {"color", required_argument, nullptr, kColor},
+    {"help", no_argument, nullptr, kHelp},
+    {"version", no_argument, nullptr, kVersion},
+    {nullptr, 0, nullptr, 0},
+};
+
+void take_option(int option, const char* value, Call* call) {
+  switch (option) {
+    case kHex:
+    case kBase64:
+      call->notation = option == kHex ? Notation::kHex : Notation::kBase64;
+      call->written = value == nullptr ? std::nullopt : std::optional<std::string>(value);
+      break;
+    case kJson:
+      call->json = true;
+      break;
+    case kAll:
+      call->all = true;
+      break;
+    case kShowToken:
+      call->show_token = true;
+      break;
+    case kColor:
+      call->colour = value;
+      if (call->colour != "always" && call->colour != "never" && call->colour != "auto") {
+        throw Failure{kWrongCall, "--color is always, never or auto, not '" + call->colour + "'"};
+      }
+      break;
+    case kHelp:
+      call->command = "help";
+      break;
+    case kVersion:
+      call->command = "version";
+      break;
+    default:
+      throw Failure{kWrongCall, ""};  // getopt has said why
+  }
+}
+
+Call read_call(int argc, char** argv) {
+  Call call;
+  for (int option; (option = getopt_long(argc, argv, "", kOptions, nullptr)) != -1;) {
+    take_option(option, optarg, &call);
+  }
+  call.arguments.assign(argv + optind, argv + argc);
+  if (call.command.empty() && !call.arguments.empty()) {
+    call.command = call.arguments.front();
+    call.arguments.erase(call.arguments.begin());
+  }
+  return call;
+}
+
+std::string read_file(const std::string& name) {
+  const bool is_standard_input = name == "-";
+  const std::unique_ptr<std::FILE, int (*)(std::FILE*)> file(
+      is_standard_input ? stdin : std::fopen(name.c_str(), "rb"), std::fclose);
+  std::string content;
+  char block[65536];
+  size_t size = 0;
+  while (file != nullptr && (size = std::fread(block, 1, sizeof block, file.get())) > 0) {
+    content.append(block, size);
+  }
+  if (file == nullptr || std::ferror(file.get()) != 0) {
+    throw Failure{kNoAccess, "cannot read " + (is_standard_input ? "standard input" : name) + ": " +
+                                 std::strerror(errno)};
+  }
+  return content;
+}
+
+// The last argument, where there is one more than the command needs.
+std::string read_source(const Call& call, size_t needed) {
+  return read_file(call.arguments.size() > needed ? call.arguments[needed] : "-");
+}
+
+std::string read_bytes(const Call& call, size_t needed) {
+  const bool is_given = call.written.has_value();
+  const std::string source = is_given ? *call.written : read_source(call, needed);
+  const std::optional<std::string> bytes = qel_wire::from_notation(source, call.notation);
+  if (!bytes.has_value()) {
+    throw Failure{kBroken, std::string("the input is no ") +
+                               (call.notation == Notation::kHex ? "hex" : "base64")};
+  }
+  return *bytes;
+}
+
+const Descriptor& message_of(const Call& call) {
+  const Descriptor* type = qel_wire::message_named(call.arguments[0]);
+  if (type == nullptr) {
+    throw Failure{kWrongCall,
+                  "there is no message '" + call.arguments[0] + "'; 'qel-wire schema' lists them"};
+  }
+  return *type;
+}
+
+std::unique_ptr<Message> new_message(const Descriptor& type) {
+  return std::unique_ptr<Message>(MessageFactory::generated_factory()->GetPrototype(&type)->New());
+}
+
+bool is_coloured(const Call& call) {
+  if (call.colour != "auto") {
+    return call.colour == "always";
+  }
+  const char* no_colour = std::getenv("NO_COLOR");
+  return isatty(STDOUT_FILENO) == 1 && (no_colour == nullptr || *no_colour == '\0');
+}
+
+int decode(const Call& call) {
+  const Descriptor& type = message_of(call);
+  const std::string bytes = read_bytes(call, 1);
+  qel_wire::Visitor nobody;
+  if (const auto problem = qel_wire::walk(bytes, type, &nobody)) {
+    throw Failure{kBroken, "broken at offset " + std::to_string(problem->offset) + ": " +
+                               problem->reason + " ('qel-wire explain' shows what comes before)"};
+  }
+  const auto message = new_message(type);
+  message->ParseFromString(bytes);
+  if (!call.show_token) {
+    qel_wire::hide_access_token(message.get());
+  }
+  if (!call.json) {
+    std::cout << qel_wire::text_form(*message);
+    return kDone;
+  }
+  std::cout << qel_wire::json_form(*message);
+  if (const int unknown = qel_wire::unknown_fields(*message)) {
+    std::cerr << "qel-wire: without "
+              << qel_wire::counted(static_cast<size_t>(unknown), "unknown field")
+              << ", which JSON has no place for\n";
+  }
+  return kDone;
+}
+
+int encode(const Call& call) {
+  const auto message = new_message(message_of(call));
+  if (call.written.has_value()) {
+    throw Failure{kWrongCall, "encode takes a text: --hex and --base64 have no bytes there"};
+  }
+  if (const auto complaint = qel_wire::parse_text(read_source(call, 1), message.get())) {
+    throw Failure{kBroken, "the text is no " + call.arguments[0] + ": " + *complaint};
+  }
+  std::cout << qel_wire::to_notation(message->SerializeAsString(), call.notation);
+  if (call.notation != Notation::kRaw) {
+    std::cout << '\n';
+  }
+  return kDone;
+}
+
+int explain(const Call& call) {
+  const Descriptor& type = message_of(call);
+  qel_wire::ExplainOptions options;
+  options.colours = qel_wire::Colours(is_coloured(call));
+  options.show_token = call.show_token;
+  options.show_all = call.all;
+  return qel_wire::explain(read_bytes(call, 1), type, options, &std::cout) ? kDone : kBroken;
+}
+
+void print_fit(const qel_wire::Fit& fit, const qel_wire::Colours& colours) {
+  std::cout << std::setw(4) << fit.rank << "  " << colours.name << std::left << std::setw(30)
+            << fit.type->name() << colours.end << std::right << std::setw(5) << fit.known
+            << " known" << std::setw(4) << fit.absent << " absent" << std::setw(4) << fit.unknown
+            << " unknown" << std::setw(4) << fit.doubtful << " doubtful"
+            << (fit.is_broken ? "  " + colours.wrong + "broken" + colours.end : "") << '\n';
+}
+
+int guess(const Call& call) {
+  constexpr int kMostRanks = 10;
+  const qel_wire::Colours colours(is_coloured(call));
+  const std::vector<qel_wire::Fit> fits = qel_wire::guess(read_bytes(call, 0));
+  for (const qel_wire::Fit& fit : fits) {
+    if (call.all || fit.rank <= kMostRanks) {
+      print_fit(fit, colours);
+    }
+  }
+  return fits.front().is_broken ? kBroken : kDone;
+}
+
+int schema(const Call& call) {
+  if (call.arguments.empty()) {
+    std::cout << qel_wire::schema_names();
+    return kDone;
+  }
+  const std::string definition = qel_wire::schema_of(call.arguments[0]);
+  if (definition.empty()) {
+    throw Failure{kWrongCall, "there is no message and no enumeration '" + call.arguments[0] +
+                                  "'; 'qel-wire schema' lists them"};
+  }
+  std::cout << definition;
+  return kDone;
+}
+
+int help(const Call& /*call*/) {
+  std::cout << kUsage;
+  return kDone;
+}
+
+int version(const Call& /*call*/) {
+  std::cout << "qel-wire " QEL_WIRE_VERSION "\n";
+  return kDone;
+}
+
+constexpr struct {
+  const char* name;
+  size_t needed;   // arguments
+  size_t allowed;  // at most
+  int (*run)(const Call& call);
+} kCommands[] = {
+    {"decode", 1, 2, decode},   {"encode", 1, 2, encode}, {"explain", 1, 2, explain},
+    {"guess", 0, 1, guess},     {"schema", 0, 1, schema}, {"help", 0, 1, help},
+    {"version", 0, 1, version},
+};
+
+int run(const Call& call) {
+  for (const auto& command : kCommands) {
+    if (call.command != command.name) {
+      continue;
+    }
+    const size_t most = call.written.has_value() ? command.needed : command.allowed;
+    if (call.arguments.size() < command.needed || call.arguments.size() > most) {
+      throw Failure{kWrongCall, call.command + " takes other arguments ('qel-wire --help')"};
+    }
+    return command.run(call);
+  }
+  throw Failure{kWrongCall, call.command.empty()
+                                ? "a command is missing ('qel-wire --help')"
+                                : "there is no command '" + call.command + "' ('qel-wire --help')"};
+}
+
+}  // namespace
+
+int main(int argc, char** argv) {
+  google::protobuf::SetLogHandler(nullptr);  // the runtime's complaints: they are in our own words
+  int status = kDone;
+  try {
+    status = run(read_call(argc, argv));
+  } catch (const Failure& failure) {
+    if (!failure.reason.empty()) {
+      std::cerr << "qel-wire: " << failure.reason << '\n';
+    }
+    status = failure.status;
+  }
+  if (!std::cout.flush()) {
+    std::cerr << "qel-wire: the output cannot be written\n";
+    return kNoAccess;
+  }
+  return status;
+}

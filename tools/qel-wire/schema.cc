@@ -1,0 +1,60 @@
+#include "schema.h"
+
+#include <set>
+
+#include "msgspec_frontend.pb.h"
+
+namespace qel_wire {
+namespace {
+
+using google::protobuf::Descriptor;
+using google::protobuf::EnumDescriptor;
+using google::protobuf::FileDescriptor;
+
+const FileDescriptor& file() {
+  return *ChannelAuthRequest::descriptor()->file();
+}
+
+// With all that it contains, but for what was shown before.
+std::string definition(const Descriptor& message, std::set<std::string>* shown) {
+  std::string text = message.DebugString();
+  for (int i = 0; i < message.field_count(); ++i) {
+    const Descriptor* record = message.field(i)->message_type();
+    if (record != nullptr && shown->insert(record->name()).second) {
+      text += "\n" + definition(*record, shown);
+    }
+    const EnumDescriptor* enumeration = message.field(i)->enum_type();
+    if (enumeration != nullptr && shown->insert(enumeration->name()).second) {
+      text += "\n" + enumeration->DebugString();
+    }
+  }
+  return text;
+}
+
+}  // namespace
+
+const Descriptor* message_named(const std::string& name) {
+  return file().FindMessageTypeByName(name);
+}
+
+std::string schema_names() {
+  std::string names;
+  for (int i = 0; i < file().message_type_count(); ++i) {
+    names += file().message_type(i)->name() + "\n";
+  }
+  for (int i = 0; i < file().enum_type_count(); ++i) {
+    names += file().enum_type(i)->name() + "\n";
+  }
+  return names;
+}
+
+std::string schema_of(const std::string& name) {
+  std::set<std::string> shown{name};
+  if (const Descriptor* message = message_named(name)) {
+    return definition(*message, &shown);
+  }
+  const EnumDescriptor* enumeration = file().FindEnumTypeByName(name);
+  return enumeration != nullptr ? enumeration->DebugString() : "";
+}
+
+}  // namespace qel_wire

@@ -1,0 +1,111 @@
+#include "text.h"
+
+#include <cstdint>
+
+namespace qel_wire {
+namespace {
+
+struct Character {
+  uint32_t code = 0;
+  size_t size = 0;  // 0: no UTF-8
+};
+
+Character first_character(std::string_view text) {
+  const auto lead = static_cast<unsigned char>(text[0]);
+  if (lead < 0x80) {
+    return {lead, 1};
+  }
+  // Of so many bytes the first has these bits, and the code is at least that.
+  static constexpr struct {
+    unsigned char mask, lead;
+    uint32_t least;
+  } kLengths[] = {{0xe0, 0xc0, 0x80}, {0xf0, 0xe0, 0x800}, {0xf8, 0xf0, 0x10000}};
+  size_t size = 1;
+  for (const auto& length : kLengths) {
+    ++size;
+    if ((lead & length.mask) != length.lead) {
+      continue;
+    }
+    if (text.size() < size) {
+      return {};
+    }
+    uint32_t code = lead & static_cast<unsigned char>(~length.mask);
+    for (size_t i = 1; i < size; ++i) {
+      const auto byte = static_cast<unsigned char>(text[i]);
+      if ((byte & 0xc0U) != 0x80) {
+        return {};
+      }
+      code = code << 6U | (byte & 0x3fU);
+    }
+    const bool is_surrogate = code >= 0xd800 && code <= 0xdfff;
+    return code < length.least || code > 0x10ffff || is_surrogate ? Character{}
+                                                                  : Character{code, size};
+  }
+  return {};
+}
+
+// Control characters, and those that turn the direction of writing.
+bool is_obeyed(uint32_t code) {
+  return code < 0x20 || (code >= 0x7f && code < 0xa0) || code == 0x61c || code == 0x200e ||
+         code == 0x200f || (code >= 0x2028 && code <= 0x202e) ||
+         (code >= 0x2066 && code <= 0x2069) || code == 0xfeff;
+}
+
+void append_octal(std::string_view bytes, std::string* to) {
+  for (const char c : bytes) {
+    const auto byte = static_cast<unsigned char>(c);
+    *to += '\\';
+    *to += static_cast<char>('0' + (byte >> 6U));
+    *to += static_cast<char>('0' + (byte >> 3U & 7U));
+    *to += static_cast<char>('0' + (byte & 7U));
+  }
+}
+
+}  // namespace
+
+std::string in_quotes(std::string_view text) {
+  std::string result = "\"";
+  while (!text.empty()) {
+    const Character character = first_character(text);
+    const std::string_view bytes = text.substr(0, character.size == 0 ? 1 : character.size);
+    text.remove_prefix(bytes.size());
+    if (bytes == "\n") {
+      result += "\\n";
+    } else if (bytes == "\"" || bytes == "\\") {
+      result.append("\\").append(bytes);
+    } else if (character.size == 0 || is_obeyed(character.code)) {
+      append_octal(bytes, &result);
+    } else {
+      result += bytes;
+    }
+  }
+  return result + '"';
+}
+
+bool is_utf8(std::string_view text) {
+  while (!text.empty()) {
+    const size_t size = first_character(text).size;
+    if (size == 0) {
+      return false;
+    }
+    text.remove_prefix(size);
+  }
+  return true;
+}
+
+std::string counted(size_t count, const std::string& what) {
+  return std::to_string(count) + " " + what + (count == 1 ? "" : "s");
+}
+
+Colours::Colours(bool on) {
+  if (on) {
+    quiet = "\033[2m";
+    name = "\033[36m";
+    value = "\033[32m";
+    doubt = "\033[33m";
+    wrong = "\033[1;31m";
+    end = "\033[0m";
+  }
+}
+
+}  // namespace qel_wire

@@ -1,0 +1,32 @@
+// What people read: texts in quotes, amounts, colours.
+#ifndef QEL_WIRE_TEXT_H
+#define QEL_WIRE_TEXT_H
+
+#include <cstddef>
+#include <string>
+#include <string_view>
+
+namespace qel_wire {
+
+// In place of the access token.
+constexpr char kNotShown[] = "(not shown)";
+
+// In quotes, as the text form has it. What is no UTF-8, and characters that a terminal would obey
+// instead of showing them, stand as octal escapes.
+std::string in_quotes(std::string_view text);
+
+// Whether all of it is UTF-8.
+bool is_utf8(std::string_view text);
+
+// "1 byte", "2 bytes"
+std::string counted(size_t count, const std::string& what);
+
+// Escapes of a terminal's colours, or empty texts where there is none.
+struct Colours {
+  explicit Colours(bool on);
+  std::string quiet, name, value, doubt, wrong, end;
+};
+
+}  // namespace qel_wire
+
+#endif

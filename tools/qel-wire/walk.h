@@ -1,0 +1,72 @@
+// Reads the bytes of a message one field at a time, and takes exactly what the protocol runtime
+// takes, its leniencies included; so it can say where each field lies, and where and why the
+// runtime gives up.
+#ifndef QEL_WIRE_WALK_H
+#define QEL_WIRE_WALK_H
+
+#include <google/protobuf/descriptor.h>
+
+#include <cstddef>
+#include <cstdint>
+#include <optional>
+#include <string>
+#include <string_view>
+
+namespace qel_wire {
+
+// No call takes more.
+constexpr size_t kMostBytes = size_t{64} << 20;
+
+struct Piece {
+  enum Kind { kVarint, kFixed64, kFixed32, kBytes, kMessage, kGroup, kPacked };
+
+  Kind kind = kVarint;
+  int depth = 0;  // 0 for the message's own fields
+  uint32_t number = 0;
+  const google::protobuf::FieldDescriptor* field =
+      nullptr;  // null if the message has no such number
+  // Whether the wire type is the field's. Where it is not, or there is no such field, the runtime
+  // keeps the piece as an unknown field.
+  bool is_known = false;
+
+  // Tag and length, then the value. The elements of a packed field have no tag.
+  size_t offset = 0;
+  size_t value_offset = 0;
+  size_t end = 0;
+  size_t end_tag = 0;  // of kGroup, once it is over: the last bytes before its end
+
+  uint64_t value = 0;      // of a number, as it stands on the wire
+  std::string_view bytes;  // the value of kBytes
+  // The length that kMessage and kPacked give themselves. Where it reaches behind the end of what
+  // they lie in, the runtime takes what is there.
+  uint32_t length = 0;
+};
+
+// Where and why reading ended.
+struct Problem {
+  size_t offset = 0;  // of the tag, number, length, text or group that cannot be read
+  // The bytes that show it, from the field's tag on. A text's are never among them.
+  size_t begin = 0;
+  size_t end = 0;
+  int depth = 0;
+  std::string reason;
+};
+
+class Visitor {
+ public:
+  virtual ~Visitor() = default;
+  // Of kMessage, kGroup and kPacked before what they contain; their end is where they would end by
+  // their length, and of a group 0.
+  virtual void begin(const Piece& /*piece*/) {}
+  // Behind what a kMessage, kGroup or kPacked contains, with its true end.
+  virtual void end(const Piece& /*piece*/) {}
+};
+
+// Shows the visitor each field of the bytes as those of a message of the type. Nothing if they are
+// read whole.
+std::optional<Problem> walk(std::string_view bytes, const google::protobuf::Descriptor& type,
+                            Visitor* visitor);
+
+}  // namespace qel_wire
+
+#endif
