@@ -12,11 +12,8 @@ protoc=$7
 load_library=$8
 scratch=$(mktemp -d)
 trap 'rm -rf "$scratch"' EXIT
-
-fail() {
-  printf '%s\n' "$*" >&2
-  exit 1
-}
+# shellcheck source=SCRIPTDIR/installed.sh
+. "$(dirname "$0")/installed.sh"
 
 # has PATTERN OPTION: readelf says so about the library.
 has() {
@@ -40,12 +37,10 @@ case $1 in
   device_sdk_is_used)
     # An SDK of Debian's files, whose compilers have names of their own.
     sdk=$scratch/sdk
-    mkdir -p "$sdk/bin" "$sdk/sysroot/usr"
+    mkdir -p "$sdk/bin"
     ln -s "$(command -v "$triple-gcc")" "$sdk/bin/device-gcc"
     ln -s "$(command -v "$triple-g++")" "$sdk/bin/device-g++"
-    cp -rs "/usr/$triple/lib" "/usr/$triple/include" "$sdk/sysroot/usr"
-    ln -s usr/lib "$sdk/sysroot/lib"
-    ln -s "/usr/$triple" "$sdk/sysroot/usr/$triple" # by which libc.so names what it is made of
+    make_sysroot "$triple" "$sdk/sysroot"
     cp -r "$protobuf/lib" "$protobuf/include" "$sdk/sysroot/usr"
     "$sdk/bin/device-gcc" --sysroot="$sdk/sysroot" -shared -fPIC "$source/platform/dlog/dlog_standin.c" \
       -Wl,-soname,libdlog.so.0 -o "$sdk/sysroot/usr/lib/libdlog.so.0"
@@ -71,6 +66,12 @@ case $1 in
     has 'NEEDED.*\[libdlog\.so\.0\]' -d
     has 'NEEDED.*\[libprotobuf\.so\.9\]' -d
     qemu-arm -L "$sdk/sysroot" "$load_library" "$library"
+
+    # Installed, it leaves the search for them to the device, whose folder of libraries is its own.
+    cmake --install "$scratch/build" --prefix "$scratch/installed" --component runtime >"$scratch/messages"
+    library=$scratch/installed/lib/libqel-message-protosvc.so.1
+    has 'SONAME' -d
+    [[ $(readelf -dW "$library") != *PATH* ]] || fail 'it has a path to look for libraries'
     ;;
   *)
     fail "no such case: $1"

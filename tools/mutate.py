@@ -28,7 +28,7 @@ import mutants
 
 ROOT = pathlib.Path(__file__).resolve().parent.parent
 MODULE = "proto-lib/qel-message-serialize.cc"
-LIBRARY = "proto-lib/libqel-message-protosvc.so"
+LIBRARY = "proto-lib/libqel-message-protosvc.so"  # a link to the file that is linked
 SOURCES = ["log-line.h", "call-frame.h", "qel-message-serialize.cc"]
 EQUIVALENT = ROOT / "tools" / "equivalent_mutants.txt"
 SAMPLE = 1000  # what two idle cores do in less than twenty minutes
@@ -63,7 +63,9 @@ class Build:
         entry = next(e for e in entries if e["file"] == str(ROOT / MODULE))
         self.compile = shlex.split(entry["command"])
         self.object = self.compile[self.compile.index("-o") + 1]
-        self.link = self._output("ninja", "-C", folder, "-t", "commands", LIBRARY).splitlines()[-1]
+        self.library = str((folder / LIBRARY).resolve().relative_to(folder))
+        self.link = self._output("ninja", "-C", folder, "-t", "commands", self.library).splitlines()[-1]
+        self.soname = re.search(r"-Wl,-soname,(\S+)", self.link)[1]
         listed = json.loads(self._output("ctest", "--test-dir", folder, "--show-only=json-v1"))
         self.programs = sorted({t["command"][0] for t in listed["tests"]
                                 if any(a.startswith("--gtest") for a in t["command"])})
@@ -90,7 +92,7 @@ class Worker:
         self.compile = head + ["-include", prelude, "-o", folder / "module.o", "-c",
                                self.source / os.path.basename(MODULE)]
         self.link = build.link.replace("--coverage", "")
-        for path, own in [(build.object, "module.o"), (LIBRARY, os.path.basename(LIBRARY))]:
+        for path, own in [(build.object, "module.o"), (build.library, build.soname)]:
             self.link = self.link.replace(f" {path}", f" {folder / own}")
         self._precompile(head, prelude)
 

@@ -1,0 +1,59 @@
+# What 'cmake --install' puts where. Each component is a package of packages.cmake.
+
+include(CMakePackageConfigHelpers)
+set(_made "${CMAKE_CURRENT_BINARY_DIR}/packaging")
+set(_headers "${CMAKE_INSTALL_INCLUDEDIR}/${PROJECT_NAME}")
+set(_pkgconfig "${CMAKE_INSTALL_LIBDIR}/pkgconfig")
+set(_cmake_package "${CMAKE_INSTALL_LIBDIR}/cmake/${PROJECT_NAME}")
+
+install(TARGETS qel-message-protosvc
+  LIBRARY COMPONENT runtime NAMELINK_COMPONENT development)
+
+install(
+  FILES proto-lib/qel-message-serialize.h "${PROJECT_BINARY_DIR}/proto-lib/msgspec_frontend.pb.h"
+  DESTINATION "${_headers}" COMPONENT development)
+install(FILES proto-lib/msgspec_frontend.proto
+  DESTINATION "${CMAKE_INSTALL_DATADIR}/${PROJECT_NAME}" COMPONENT development)
+
+# From the .pc files back to the prefix, wherever that is.
+set(_prefix_from_pc "/prefix")
+cmake_path(RELATIVE_PATH _prefix_from_pc BASE_DIRECTORY "/prefix/${_pkgconfig}")
+foreach(_name ${PROJECT_NAME} ${PROJECT_NAME}-classes)
+  configure_file("packaging/${_name}.pc.in" "${_made}/${_name}.pc" @ONLY)
+  install(FILES "${_made}/${_name}.pc" DESTINATION "${_pkgconfig}" COMPONENT development)
+endforeach()
+
+# Written by hand, as an exported target would name the runtime and the log service, which are the
+# library's own matter.
+configure_package_config_file(packaging/${PROJECT_NAME}-config.cmake.in
+  "${_made}/${PROJECT_NAME}-config.cmake"
+  INSTALL_DESTINATION "${_cmake_package}"
+  PATH_VARS CMAKE_INSTALL_LIBDIR _headers)
+write_basic_package_version_file("${_made}/${PROJECT_NAME}-config-version.cmake"
+  COMPATIBILITY SameMajorVersion)
+install(
+  FILES "${_made}/${PROJECT_NAME}-config.cmake" "${_made}/${PROJECT_NAME}-config-version.cmake"
+  DESTINATION "${_cmake_package}" COMPONENT development)
+
+# What Debian has not, for machines without the device's log service: an installed tree runs in any
+# folder. On a device both are the system's.
+if(TARGET dlog-standin)
+  set_target_properties(qel-message-protosvc PROPERTIES INSTALL_RPATH "$ORIGIN")
+  if(TARGET qel-wire)
+    set_target_properties(qel-wire PROPERTIES INSTALL_RPATH "$ORIGIN/../${CMAKE_INSTALL_LIBDIR}")
+  endif()
+  install(TARGETS dlog-standin LIBRARY COMPONENT workstation)
+  cmake_path(GET QEL_PROTOBUF_LIBRARY PARENT_PATH _folder)
+  file(GLOB _runtime "${_folder}/libprotobuf.so.9*") # none where the runtime is laid out otherwise
+  install(FILES ${_runtime} DESTINATION "${CMAKE_INSTALL_LIBDIR}" COMPONENT workstation)
+  install(FILES "${QEL_PROTOBUF_PREFIX}/share/doc/protobuf/LICENSE"
+    DESTINATION "${CMAKE_INSTALL_DATADIR}/doc/${PROJECT_NAME}-workstation"
+    RENAME LICENSE.protobuf COMPONENT workstation OPTIONAL)
+  if(_runtime)
+    install(CODE "
+      if(CMAKE_INSTALL_DO_STRIP) # as is done with targets
+        file(GLOB runtime \"\$ENV{DESTDIR}\${CMAKE_INSTALL_PREFIX}/${CMAKE_INSTALL_LIBDIR}/libprotobuf.so.9.*\")
+        execute_process(COMMAND \"${CMAKE_STRIP}\" \${runtime} COMMAND_ERROR_IS_FATAL ANY)
+      endif()" COMPONENT workstation)
+  endif()
+endif()

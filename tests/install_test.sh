@@ -1,0 +1,141 @@
+#!/usr/bin/env bash
+# install_test.sh CASE SOURCE BUILD VERSION LIBDIR PROTOBUF-ROOT CC CXX [TOOLCHAIN]: what 'cmake
+# --install' makes, and whether others can build with it. The case set_up goes before the others: it
+# installs into a folder, which is then moved. With TOOLCHAIN, CMake's, it is for another machine.
+set -euo pipefail
+export LC_ALL=C
+source=$2
+build=$3
+version=$4
+libdir=$5
+protobuf=$6
+cc=$7
+cxx=$8
+toolchain=${9:-}
+first=${version%%.*}
+triple=${libdir##*/}
+moved=$build/install-test/moved
+tree=$moved
+[ -z "$toolchain" ] || tree=$build/install-test/sysroot/usr
+scratch=$(mktemp -d)
+trap 'rm -rf "$scratch"' EXIT
+# shellcheck source=SCRIPTDIR/installed.sh
+. "$(dirname "$0")/installed.sh"
+
+# install_component COMPONENT: into $scratch/tree, whose files and links go to $files.
+install_component() {
+  cmake --install "$build" --prefix "$scratch/tree" --component "$1" >"$scratch/messages"
+  files=$(cd "$scratch/tree" && find . ! -type d | sort)
+}
+
+# refused LINES OPTION...: CMake refuses a project of these lines; what it says goes to $messages.
+refused() {
+  printf '%s\n' 'cmake_minimum_required(VERSION 3.25)' 'project(consumer C)' "$1" >"$scratch/CMakeLists.txt"
+  shift
+  ! cmake -S "$scratch" -B "$scratch/built" -G Ninja "$@" >"$scratch/messages" 2>&1 ||
+    fail 'was not refused'
+  messages=$(tr -s ' \n' '  ' <"$scratch/messages")
+}
+
+expect() { [[ $messages == *"$1"* ]] || fail "expected: $1"$'\n'"said: $messages"; }
+
+case $1 in
+  set_up)
+    rm -rf "$build/install-test"
+    cmake --install "$build" --prefix "$build/install-test/made"
+    mv "$build/install-test/made" "$moved"
+    if [ -n "$toolchain" ]; then # with what the classes need of others
+      make_sysroot "$triple" "${tree%/usr}"
+      cp -r "$moved/." "$protobuf/include" "$tree"
+    fi
+    ;;
+  runtime_is_the_shared_object_alone)
+    install_component runtime
+    diff <(printf '%s\n' "./$libdir/libqel-message-protosvc.so.$first" \
+      "./$libdir/libqel-message-protosvc.so.$version") - <<<"$files" >&2
+    ;;
+  development_has_no_shared_object)
+    install_component development
+    ! grep -F '.so.' <<<"$files" >&2 || exit 1
+    ;;
+  soname_has_the_first_number)
+    dynamic=$(readelf -dW "$moved/$libdir/libqel-message-protosvc.so")
+    grep -q "SONAME.*\[libqel-message-protosvc\.so\.$first\]" <<<"$dynamic" || fail "$dynamic"
+    ;;
+  library_looks_for_others_beside_itself_alone)
+    dynamic=$(readelf -dW "$moved/$libdir/libqel-message-protosvc.so")
+    [ "$(sed -n 's/.*(R.*PATH).*\[\(.*\)\]/\1/p' <<<"$dynamic")" = "\$ORIGIN" ] || fail "$dynamic"
+    ;;
+  no_file_names_the_build)
+    # But for debug information, which is of the sources.
+    cp -r "$moved" "$scratch/tree"
+    find "$scratch/tree" -type f '(' -name '*.so*' -o -path '*/bin/*' ')' \
+      -exec "$("$cc" -print-prog-name=objcopy)" --strip-debug {} ';'
+    ! grep -rlF -e "$source" -e "$build" -e "$protobuf" "$scratch/tree" >&2 || exit 1
+    ;;
+  c_plugin_runs) c_plugin_runs "$tree" ;;
+  c_plugin_reads_one_header_of_the_tree)
+    # The compiler's and the C library's lie elsewhere.
+    read_files=$(compile_c "$tree" -M | tr -s ' \\\n' '\n' | grep -v ':$' | xargs realpath)
+    others=$(grep -Ev "^/usr/|^$source/tests/consumers/" <<<"$read_files")
+    [ "$others" = "$tree/include/qel-message-protosvc/qel-message-serialize.h" ] || fail "$others"
+    ;;
+  cxx_module_runs)
+    compile_with_cmake "$tree" cxx
+    prints 'probe 7, answer of 2 bytes' "$tree" "$scratch/built/module"
+    ;;
+  classes_module_runs)
+    compile_with_cmake "$tree" classes
+    prints 'ClientEcho 7' "$tree" "$scratch/built/module"
+    ;;
+  tool_runs) prints "qel-wire $version" "$tree" "$tree/bin/qel-wire" --version ;;
+  classes_module_compiles_with_pkg_config)
+    export PKG_CONFIG_PATH=$tree/$libdir/pkgconfig:$protobuf/lib/pkgconfig
+    flags=$(pkg-config --cflags --libs qel-message-protosvc-classes)
+    # shellcheck disable=SC2086 # a list of words
+    "$cxx" "$source/tests/consumers/classes/module.cc" $flags -Wl,-rpath,"$tree/$libdir" -o "$scratch/module"
+    prints 'ClientEcho 7' "$tree" "$scratch/module"
+    ;;
+  pkg_config_refuses_classes_of_another_series)
+    mkdir "$scratch/other"
+    sed 's/^Version:.*/Version: 3.21.12/' "$protobuf/lib/pkgconfig/protobuf.pc" >"$scratch/other/protobuf.pc"
+    export PKG_CONFIG_PATH=$tree/$libdir/pkgconfig:$scratch/other
+    ! messages=$(pkg-config --print-errors --exists qel-message-protosvc-classes 2>&1) ||
+      fail 'was not refused'
+    expect "'protobuf < 2.7'"
+    ;;
+  another_first_number_is_refused)
+    refused "find_package(qel-message-protosvc $((first + 1)).0 REQUIRED)" -DCMAKE_PREFIX_PATH="$tree"
+    expect "compatible with requested version \"$((first + 1)).0\""
+    expect "qel-message-protosvc-config.cmake, version: $version"
+    ;;
+  development_alone_is_refused)
+    install_component development
+    refused 'find_package(qel-message-protosvc REQUIRED)' -DCMAKE_PREFIX_PATH="$scratch/tree"
+    expect "No libqel-message-protosvc.so.$version in $scratch/tree/$libdir: install the library itself too."
+    ;;
+  classes_without_headers_are_refused)
+    refused "set(CMAKE_FIND_USE_CMAKE_SYSTEM_PATH OFF)
+      set(CMAKE_FIND_USE_SYSTEM_ENVIRONMENT_PATH OFF)
+      find_package(qel-message-protosvc REQUIRED COMPONENTS classes)" -DCMAKE_PREFIX_PATH="$tree"
+    expect "The component 'classes' needs Protocol Buffers 2.6, but CMake finds no headers of it: let CMAKE_PREFIX_PATH name an installation."
+    ;;
+  classes_of_another_series_are_refused)
+    mkdir -p "$scratch/other/include/google/protobuf/stubs"
+    echo '#define GOOGLE_PROTOBUF_VERSION 3021012' >"$scratch/other/include/google/protobuf/stubs/common.h"
+    refused 'find_package(qel-message-protosvc REQUIRED COMPONENTS classes)' \
+      -DCMAKE_PREFIX_PATH="$tree;$scratch/other"
+    expect "needs Protocol Buffers 2.6, but CMake finds headers of 3.21 in $scratch/other/include:"
+    ;;
+  classes_without_runtime_are_refused)
+    install_component development
+    install_component runtime
+    cp -r "$protobuf/include/google" "$scratch/tree/include"
+    refused 'find_package(qel-message-protosvc REQUIRED COMPONENTS classes)' \
+      -DCMAKE_PREFIX_PATH="$scratch/tree"
+    expect "needs Protocol Buffers 2.6, but CMake finds no libprotobuf.so.9:"
+    ;;
+  *)
+    fail "no such case: $1"
+    ;;
+esac
