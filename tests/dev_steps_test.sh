@@ -25,19 +25,20 @@ for argument in "$@"; do
 done
 printf '%s\n' "${0##*/}$said" >>"$STEPS"
 [ "${0##*/}" != make_seeds.sh ] || { mkdir -p "${1%/*}" && cp -r fuzz/seeds "$1"; }
+[ "${0##*/} $1" != 'cmake --preset' ] || echo '[]' >"build/$2/compile_commands.json"
 SH
     chmod +x "$path"
   done
 }
 
-for command in git dpkg-query apt-get sudo cmake ctest clang-format clang-tidy shellcheck; do
+for command in git dpkg-query apt-get sudo cmake ctest cpack clang-format clang-tidy shellcheck dot; do
   stand_in "$scratch/bin/$command"
 done
-for script in examples/run_demo.sh tools/coverage.py tools/mutate.py bench/report.py fuzz/run.sh \
-  fuzz/make_seeds.sh build/fuzz/fuzz/invite_reply_deserialize; do
+for script in examples/run_demo.sh tools/coverage.py tools/mutate.py tools/wire_format.py \
+  bench/report.py fuzz/run.sh fuzz/make_seeds.sh build/fuzz/fuzz/invite_reply_deserialize; do
   stand_in "$checkout/$script"
 done
-mkdir -p "$checkout/fuzz/seeds/invite_reply_deserialize" "$checkout/build/coverage"
+mkdir -p "$checkout/fuzz/seeds/invite_reply_deserialize" "$checkout/build/coverage" "$checkout/docs"
 echo "$checkout, CC=, CXX=" >"$checkout/build/fuzz/bound-to" # which keeps the target there
 
 # Every runtime is there.
@@ -184,6 +185,33 @@ cmake --build --preset fuzz
 run.sh build/fuzz/fuzz build/fuzz/corpus -max_total_time=600 invite_reply_deserialize
 TXT
     ;;
+  package)
+    mkdir -p "$checkout/build/packages/_CPack_Packages" # which cpack leaves
+    touch "$checkout/build/packages/of_another_version"
+    starts package <<TXT
+cmake --preset release
+cmake --build --preset release --target packaged
+cpack --preset release
+cmake --preset armhf
+cmake --build --preset armhf --target packaged
+cpack --preset armhf
+cmake --preset armel
+cmake --build --preset armel --target packaged
+cpack --preset armel
+TXT
+    [ ! -e "$checkout/build/packages/of_another_version" ]
+    ;;
+  docs)
+    starts docs <<TXT
+cmake --preset release
+cmake --build --preset release --target wire_format qel-wire
+dot -Tsvg docs/architecture.dot -o docs/architecture.svg
+wire_format.py build/release
+cmake --preset release
+cmake --build --preset release --target docs
+TXT
+    sets -DQEL_DOCS=ON
+    ;;
   format)
     starts format <<TXT
 clang-format -i proto-lib/source.c fuzz/source.c bench/source.c
@@ -192,8 +220,8 @@ TXT
   check_tests_every_preset)
     # That coverage stands for debug is its definition; fuzz has no tests.
     dev check
-    diff <(sed -n '/"testPresets"/,$s/.*"name": "\([a-z]*\)".*/\1/p' "$2/CMakePresets.json" |
-      grep -vx 'base\|debug' | sort) <(sed -n 's/^ctest --preset //p' "$scratch/steps" | sort -u) >&2
+    diff <(sed -n '/"testPresets"/,/^  \]/s/.*"name": "\([a-z]*\)".*/\1/p' "$2/CMakePresets.json" |
+      grep -vx 'base\|debug' | sort) <(sed -nE 's/^ctest --preset ([a-z]+).*/\1/p' "$scratch/steps" | sort -u) >&2
     ;;
   *)
     echo "no such case: $1" >&2
