@@ -54,7 +54,7 @@ def prose(text, page, slugs):
     text = re.sub(r"^(#+) (.*)$", heading, text, flags=re.MULTILINE)
     text = IMAGE_OR_LINK.sub(lambda match: link(match, page), text)
     text = re.sub(r"(?<!\[)`(\w+_(?:de)?serialize)`", r"[\1](@ref \1)", text)
-    return re.sub(r"`(::\w+)`", r"<code>\\\1</code>", text)  # or Doxygen looks for it
+    return re.sub(r"`([\w-]*)(::[\w-]+)`", r"<code>\1\\\2</code>", text)  # or Doxygen looks for it
 
 
 def diagram(block):
