@@ -175,6 +175,13 @@ case $1 in
     [ -s "$scratch/page" ] || fail 'no sessions'
     diff "$scratch/page" "$scratch/happens" >&2 || fail 'the page shows something else'
     ;;
+  command_of_the_readme_works)
+    mkdir -p "$scratch/build/release/tools/qel-wire"
+    ln -s "$tool" "$scratch/build/release/tools/qel-wire/qel-wire"
+    command=$(grep '^build/release/tools/qel-wire/qel-wire ' "$source/README.md")
+    (cd "$scratch" && bash -euc "$command") >"$scratch/out"
+    grep -q '^000000  08 07 .*requestId' "$scratch/out" || fail 'another message'
+    ;;
   page_has_every_option)
     diff <("$tool" --help | grep -oE -- '--[a-z0-9-]+' | grep -Evx -- '--(help|version)' | sort -u) \
       <(grep -oE -- '`--[a-z0-9-]+' "$source/docs/qel-wire.md" | tr -d '`' | sort -u) >&2
