@@ -13,6 +13,7 @@
 #include "forms.h"
 #include "guess.h"
 #include "target.h"
+#include "text.h"
 #include "walk.h"
 
 namespace fuzz {
@@ -24,6 +25,7 @@ using google::protobuf::FieldDescriptor;
 using google::protobuf::Message;
 using google::protobuf::Reflection;
 using google::protobuf::UnknownFieldSet;
+using qel_wire::Notation;
 using qel_wire::Piece;
 
 // Makes a message of the pieces that are found.
@@ -152,15 +154,29 @@ void expect_fit_for_terminals(const std::string& text) {
   }
 }
 
+// Bytes that are written so are read again, and anything else is refused or read.
+void check_notation(const std::string& input, Notation notation) {
+  if (qel_wire::from_notation(qel_wire::to_notation(input, notation), notation) != input) {
+    fail("hex or base64 is read as other bytes than those that were written");
+  }
+  qel_wire::from_notation(input, notation);
+}
+
 }  // namespace
 
 void check_qel_wire(const std::string& input) {
   if (input.empty()) {
     return;
   }
+  check_notation(input, Notation::kHex);
+  check_notation(input, Notation::kBase64);
   const auto read = new_message(static_cast<unsigned char>(input[0]));
   const Descriptor& type = *read->GetDescriptor();
   const std::string bytes = input.substr(1);
+  const std::unique_ptr<Message> from_text(read->New());
+  if (const auto complaint = qel_wire::parse_text(bytes, from_text.get())) {
+    expect_fit_for_terminals(qel_wire::readable(*complaint));
+  }
 
   std::ostringstream explanation;
   const bool is_read = qel_wire::explain(bytes, type, {}, &explanation);

@@ -199,6 +199,10 @@ TEST(Quoted, CharactersThatATerminalShows_StayAsTheyAre) {
   }
 }
 
+TEST(Readable, TextWithoutQuotes_HasTheSameEscapes) {
+  EXPECT_EQ(qel_wire::readable("a \"b\" \\ \033[2J\n"), "a \"b\" \\ \\033[2J\\012");
+}
+
 TEST(Utf8, AtItsBounds_IsToldFromWhatIsNone) {
   for (const char* text : {"", "a", "\xc2\x80", "\xdf\xbf", "\xe0\xa0\x80", "\xed\x9f\xbf",
                            "\xee\x80\x80", "\xf0\x90\x80\x80", "\xf4\x8f\xbf\xbf"}) {

@@ -98,6 +98,10 @@ case $1 in
     exits 1 encode ClientEcho "$scratch/text"
     says 'qel-wire: the text is no ClientEcho: 1:21: Message type "ClientEcho" has no field named "nothing".'
     ;;
+  complaints_have_nothing_that_terminals_obey)
+    exits 2 decode $'\033[2J'
+    says "qel-wire: there is no message '\\033[2J'; 'qel-wire schema' lists them"
+    ;;
   broken_hex)
     exits 1 decode ClientEcho --hex=080
     says 'qel-wire: the input is no hex'

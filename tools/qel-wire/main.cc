@@ -323,7 +323,7 @@ int main(int argc, char** argv) {
     status = run(read_call(argc, argv));
   } catch (const Failure& failure) {
     if (!failure.reason.empty()) {
-      std::cerr << "qel-wire: " << failure.reason << '\n';
+      std::cerr << "qel-wire: " << qel_wire::readable(failure.reason) << '\n';
     }
     status = failure.status;
   }

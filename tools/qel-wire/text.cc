@@ -61,22 +61,41 @@ void append_octal(std::string_view bytes, std::string* to) {
   }
 }
 
+// The text's first character, or byte if that is none, which is taken away from it.
+std::string take_readable(std::string_view* text) {
+  const Character character = first_character(*text);
+  const std::string_view bytes = text->substr(0, character.size == 0 ? 1 : character.size);
+  text->remove_prefix(bytes.size());
+  std::string result;
+  if (character.size == 0 || is_obeyed(character.code)) {
+    append_octal(bytes, &result);
+  } else {
+    result = bytes;
+  }
+  return result;
+}
+
 }  // namespace
+
+std::string readable(std::string_view text) {
+  std::string result;
+  while (!text.empty()) {
+    result += take_readable(&text);
+  }
+  return result;
+}
 
 std::string in_quotes(std::string_view text) {
   std::string result = "\"";
   while (!text.empty()) {
-    const Character character = first_character(text);
-    const std::string_view bytes = text.substr(0, character.size == 0 ? 1 : character.size);
-    text.remove_prefix(bytes.size());
-    if (bytes == "\n") {
+    const char first = text.front();
+    const std::string character = take_readable(&text);
+    if (first == '\n') {
       result += "\\n";
-    } else if (bytes == "\"" || bytes == "\\") {
-      result.append("\\").append(bytes);
-    } else if (character.size == 0 || is_obeyed(character.code)) {
-      append_octal(bytes, &result);
+    } else if (first == '"' || first == '\\') {
+      result.append("\\").append(character);
     } else {
-      result += bytes;
+      result += character;
     }
   }
   return result + '"';

@@ -11,8 +11,11 @@ namespace qel_wire {
 // In place of the access token.
 constexpr char kNotShown[] = "(not shown)";
 
-// In quotes, as the text form has it. What is no UTF-8, and characters that a terminal would obey
-// instead of showing them, stand as octal escapes.
+// With octal escapes for what is no UTF-8, and for characters that a terminal would obey instead of
+// showing them.
+std::string readable(std::string_view text);
+
+// The same in quotes, as the text form has it.
 std::string in_quotes(std::string_view text);
 
 // Whether all of it is UTF-8.
