@@ -36,6 +36,8 @@ set(CPACK_COMPONENT_RUNTIME_DESCRIPTION "The shared library that message plug-in
 set(CPACK_DEBIAN_DEVELOPMENT_PACKAGE_NAME libqel-message-protosvc-dev)
 set(CPACK_DEBIAN_DEVELOPMENT_PACKAGE_SECTION libdevel)
 set(CPACK_DEBIAN_DEVELOPMENT_PACKAGE_DEPENDS "${_library_package} (= ${PROJECT_VERSION})")
+# The runtime's headers, for users of the classes.
+set(CPACK_DEBIAN_DEVELOPMENT_PACKAGE_SUGGESTS "libprotobuf-dev (>= 2.6), libprotobuf-dev (<< 2.7)")
 set(CPACK_COMPONENT_DEVELOPMENT_DESCRIPTION
   "Headers, schema, pkg-config files and CMake package, for authors of plug-ins in C and of modules
 that use the exported classes.")
@@ -66,8 +68,10 @@ endif()
 
 # What they are made of, to be built.
 add_custom_target(packaged DEPENDS qel-message-protosvc)
-if(TARGET qel-wire)
-  add_dependencies(packaged qel-wire)
-endif()
+foreach(_target qel-wire docs)
+  if(TARGET ${_target})
+    add_dependencies(packaged ${_target})
+  endif()
+endforeach()
 
 include(CPack)

@@ -51,6 +51,13 @@ case $1 in
     refused -DQEL_PROTOBUF_ROOT="$protobuf" -DQEL_PROTOC="$scratch/nowhere"
     expect "The schema's compiler $scratch/nowhere does not run here: let QEL_PROTOC name a protoc 2.6 of this machine."
     ;;
+  folder_of_libraries_that_is_named)
+    configure -DQEL_PROTOBUF_ROOT="$protobuf" -DCMAKE_INSTALL_LIBDIR=lib
+    # shellcheck disable=SC2016 # pkg-config's variables
+    grep -qx 'prefix=${pcfiledir}/../..' "$scratch/build/packaging/qel-message-protosvc.pc"
+    # shellcheck disable=SC2016
+    grep -qx 'libdir=${prefix}/lib' "$scratch/build/packaging/qel-message-protosvc.pc"
+    ;;
   device_log_that_is_named)
     configure -DQEL_PROTOBUF_ROOT="$protobuf" -DQEL_DLOG_LIBRARY="$library"
     expect "log service $library "

@@ -121,6 +121,12 @@ case $1 in
     expect "compatible with requested version \"$((first + 1)).0\""
     expect "qel-message-protosvc-config.cmake, version: $version"
     ;;
+  projects_of_old_policies_find_it)
+    printf '%s\n' 'cmake_minimum_required(VERSION 2.8.12)' 'project(consumer C)' \
+      'find_package(qel-message-protosvc REQUIRED)' >"$scratch/CMakeLists.txt"
+    cmake -S "$scratch" -B "$scratch/built" -G Ninja -DCMAKE_PREFIX_PATH="$tree" >"$scratch/messages" 2>&1 ||
+      fail "$(cat "$scratch/messages")"
+    ;;
   development_alone_is_refused)
     install_component development
     refused 'find_package(qel-message-protosvc REQUIRED)' -DCMAKE_PREFIX_PATH="$scratch/tree"

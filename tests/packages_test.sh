@@ -35,8 +35,11 @@ archive=$packages/qel-message-protosvc-$version-$triple.tar.gz
 # declares PACKAGE: its control fields but for those that its contents make, as on standard input.
 declares() { diff - <(dpkg-deb -f "$1" | grep -Ev '^( |$|Description|Installed-Size|Maintainer)' | sort) >&2; }
 
-# has PACKAGE: its files and links, as on standard input.
-has() { diff <(sort) <(dpkg-deb --fsys-tarfile "$1" | tar -t | grep -v '/$' | sort) >&2; }
+# has PACKAGE: its files and links, as on standard input, but for the API reference.
+has() {
+  diff <(sort) <(dpkg-deb --fsys-tarfile "$1" | tar -t |
+    grep -Ev '/$|^\./usr/share/(doc/qel-message-protosvc/html|man/man3)/' | sort) >&2
+}
 
 # enough PACKAGE NAME: of the package NAME a version is declared that has the symbol versions which are
 # linked with, as on standard input, each with the version of NAME that brought it.
@@ -149,6 +152,7 @@ Depends: libqel-message-protosvc$first (= $version)
 Package: libqel-message-protosvc-dev
 Priority: optional
 Section: libdevel
+Suggests: libprotobuf-dev (>= 2.6), libprotobuf-dev (<< 2.7)
 Version: $version
 TXT
     ;;
@@ -208,6 +212,13 @@ TXT
     make_root
     install_packages "$library" "$development" "$workstation" || fail "$(cat "$scratch/messages")"
     c_plugin_runs "$root/usr"
+    ;;
+  classes_module_runs_where_they_are_installed)
+    make_root
+    install_packages "$library" "$development" "$workstation" || fail "$(cat "$scratch/messages")"
+    [ -z "$toolchain" ] || cp -r "$protobuf/include" "$root/usr" # as libprotobuf-dev would
+    compile_with_cmake "$root/usr" classes
+    prints 'ClientEcho 7' "$root/usr" "$scratch/built/module"
     ;;
   tool_runs_where_they_are_installed)
     make_root libnettle8
