@@ -146,10 +146,12 @@ class Assembly : public qel_wire::Visitor {
   std::vector<Level> levels_;
 };
 
+// Nothing that a terminal obeys or cannot show, but the ends of lines.
 void expect_fit_for_terminals(const std::string& text) {
-  for (const char c : text) {
-    if (static_cast<unsigned char>(c) < 0x20 && c != '\n') {
-      fail("a control character in what is printed: " + text);
+  std::istringstream lines(text);
+  for (std::string line; std::getline(lines, line);) {
+    if (qel_wire::readable(line) != line) {
+      fail("not fit for a terminal: " + qel_wire::readable(line));
     }
   }
 }
@@ -181,6 +183,12 @@ void check_qel_wire(const std::string& input) {
   std::ostringstream explanation;
   const bool is_read = qel_wire::explain(bytes, type, {}, &explanation);
   expect_fit_for_terminals(explanation.str());
+  qel_wire::ExplainOptions whole;
+  whole.show_token = true;
+  whole.show_all = true;
+  std::ostringstream whole_explanation;
+  qel_wire::explain(bytes, type, whole, &whole_explanation);
+  expect_fit_for_terminals(whole_explanation.str());
   if (is_read != read->ParseFromString(bytes)) {
     fail("the class takes it otherwise than:\n" + explanation.str());
   }
@@ -206,7 +214,7 @@ void check_qel_wire(const std::string& input) {
   expect_fit_for_terminals(qel_wire::json_form(*read));
   expect_fit_for_terminals(qel_wire::text_form(*read));
   read->DiscardUnknownFields();
-  const std::string text = qel_wire::text_form(*read);
+  const std::string text = qel_wire::text_form(*read, {qel_wire::Colours(false), true});
   const std::unique_ptr<Message> again(read->New());
   if (qel_wire::parse_text(text, again.get()).has_value() ||
       again->SerializeAsString() != read->SerializeAsString()) {

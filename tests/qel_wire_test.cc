@@ -17,7 +17,6 @@
 #include "schema.h"
 #include "support/peer.h"
 #include "support/wire.h"
-#include "token.h"
 #include "walk.h"
 
 namespace {
@@ -183,19 +182,19 @@ TEST(Explain, OfControlCharacters_EscapesThem) {
 
 // Of each kind the first and the last: C0 and DEL, C1, marks of direction, separators of lines.
 TEST(Quoted, CharactersThatATerminalObeys_AreEscaped) {
-  for (const char* text :
-       {"\x01", "\x1f", "\x7f", "\xc2\x80", "\xc2\x9f", "\xd8\x9c", "\xe2\x80\x8e", "\xe2\x80\x8f",
-        "\xe2\x80\xa8", "\xe2\x80\xae", "\xe2\x81\xa6", "\xe2\x81\xa9", "\xef\xbb\xbf"}) {
-    EXPECT_EQ(qel_wire::in_quotes(text).find(text), std::string::npos) << support::to_hex(text);
+  for (const char* bytes : {"01", "1f", "7f", "c2 80", "c2 9f", "d8 9c", "e2 80 8e", "e2 80 8f",
+                            "e2 80 a8", "e2 80 ae", "e2 81 a6", "e2 81 a9", "ef bb bf"}) {
+    const std::string text = hex(bytes);
+    EXPECT_EQ(qel_wire::in_quotes(text).find(text), std::string::npos) << bytes;
   }
 }
 
 // Their neighbours.
 TEST(Quoted, CharactersThatATerminalShows_StayAsTheyAre) {
-  for (const char* text :
-       {" ", "~", "\xc2\xa0", "\xd8\x9b", "\xe2\x80\x8d", "\xe2\x80\x90", "\xe2\x80\xa7",
-        "\xe2\x80\xaf", "\xe2\x81\xa5", "\xe2\x81\xaa", "\xef\xbb\xbe", "\xf0\x9f\x98\x80"}) {
-    EXPECT_EQ(qel_wire::in_quotes(text), "\"" + std::string(text) + "\"");
+  for (const char* bytes : {"20", "7e", "c2 a0", "d8 9b", "e2 80 8d", "e2 80 90", "e2 80 a7",
+                            "e2 80 af", "e2 81 a5", "e2 81 aa", "ef bb be", "f0 9f 98 80"}) {
+    const std::string text = hex(bytes);
+    EXPECT_EQ(qel_wire::in_quotes(text), "\"" + text + "\"") << bytes;
   }
 }
 
@@ -345,13 +344,6 @@ TEST(AccessToken, WhenExplainedAsAnotherMessage_IsNotShown) {
       "field\n");
 }
 
-// Its number has another meaning within an embedded message.
-TEST(AccessToken, OfAnEmbeddedMessage_IsNone) {
-  const std::string text =
-      explained("ChatReply", Wire().message(13, Wire().text(6, "no token")).bytes());
-  EXPECT_NE(text.find("\"no token\""), std::string::npos) << text;
-}
-
 TEST(AccessToken, WhenItIsCut_IsNotShown) {
   const std::string whole = auth_request();
   const std::string text = explained("ChannelAuthRequest", whole.substr(0, whole.size() - 1));
@@ -360,26 +352,53 @@ TEST(AccessToken, WhenItIsCut_IsNotShown) {
   EXPECT_EQ(text.find("61 2d"), std::string::npos) << text;
 }
 
-TEST(AccessToken, InTextAndJson_IsReplaced) {
-  const auto message = parsed("ChannelAuthRequest", auth_request());
-  qel_wire::hide_access_token(message.get());
-  EXPECT_EQ(qel_wire::text_form(*message),
+TEST(AccessToken, InText_IsReplaced) {
+  EXPECT_EQ(qel_wire::text_form(*parsed("ChannelAuthRequest", auth_request())),
             "requestId: 7\nappId: \"app\"\naccessToken: \"(not shown)\"\n");
 }
 
-TEST(AccessToken, AsAnUnknownField_IsReplaced) {
-  const auto message = parsed("ClientEcho", auth_request());
-  qel_wire::hide_access_token(message.get());
-  EXPECT_EQ(qel_wire::text_form(*message), "requestId: 7\n5: \"app\"\n6: \"(not shown)\"\n");
+TEST(AccessToken, InJson_IsReplaced) {
+  EXPECT_EQ(qel_wire::json_form(*parsed("ChannelAuthRequest", Wire().text(6, kToken).bytes())),
+            "{\n  \"accessToken\": \"(not shown)\"\n}\n");
 }
 
-TEST(AccessToken, WhenThereIsNone_NothingIsReplaced) {
-  const auto message = parsed("InboxEntry", Wire().text(6, "a text of number 6").bytes());
-  qel_wire::hide_access_token(message.get());
-  EXPECT_EQ(qel_wire::text_form(*message), "chatMsg: \"a text of number 6\"\n");
+TEST(AccessToken, AsAnUnknownFieldInText_IsReplaced) {
+  EXPECT_EQ(qel_wire::text_form(*parsed("ClientEcho", auth_request())),
+            "requestId: 7\n5: \"app\"\n6: \"(not shown)\"\n");
+}
+
+TEST(AccessToken, WhenAskedForInTextAndJson_IsShown) {
+  qel_wire::FormOptions options;
+  options.show_token = true;
+  const auto message = parsed("ChannelAuthRequest", auth_request());
+  EXPECT_NE(qel_wire::text_form(*message, options).find(kToken), std::string::npos);
+  EXPECT_NE(qel_wire::json_form(*message, options).find(kToken), std::string::npos);
+}
+
+TEST(AccessToken, OfAFieldWithTheSameNumberThatIsKnown_IsNone) {
+  EXPECT_EQ(
+      qel_wire::text_form(*parsed("InboxEntry", Wire().text(6, "a text of number 6").bytes())),
+      "chatMsg: \"a text of number 6\"\n");
+}
+
+// The capture begins with the bytes of a frame, so that the request is within a field of something
+// else.
+TEST(AccessToken, OfARequestInAFrame_IsNotShown) {
+  const std::string framed = Wire().text(1, auth_request()).bytes();
+  const std::string framed_twice = Wire().text(9, framed).bytes();
+  const std::string in_a_group = Wire().group(9, Wire().text(6, kToken)).bytes();
+  const std::string in_a_record = Wire().message(13, Wire().text(6, kToken)).bytes();
+  for (const std::string& bytes : {framed, framed_twice, in_a_group, in_a_record}) {
+    for (const char* name : {"ChannelAuthRequest", "ChatReply", "ClientEcho"}) {
+      EXPECT_EQ(explained(name, bytes).find(kToken), std::string::npos) << name;
+      EXPECT_EQ(qel_wire::text_form(*parsed(name, bytes)).find(kToken), std::string::npos) << name;
+    }
+  }
 }
 
 // ---- Text, JSON, hex, base64
+
+const qel_wire::FormOptions kWhole{qel_wire::Colours(false), true};
 
 TEST(TextForm, OfEveryMessage_IsThePeers) {
   std::vector<support::PeerItem> items;
@@ -389,14 +408,14 @@ TEST(TextForm, OfEveryMessage_IsThePeers) {
   ASSERT_EQ(items.size(), 81U);
   const auto texts = support::peer_decode_all(support::library_schema(), items);
   for (size_t i = 0; i < items.size(); ++i) {
-    EXPECT_EQ(qel_wire::text_form(*parsed(items[i].message, items[i].content)), texts[i]);
+    EXPECT_EQ(qel_wire::text_form(*parsed(items[i].message, items[i].content), kWhole), texts[i]);
   }
 }
 
 TEST(TextForm, OfEveryMessage_IsTakenBack) {
   for (const std::string& name : message_names()) {
     const auto message = parsed(name, whole_message(name));
-    const std::string text = qel_wire::text_form(*message);
+    const std::string text = qel_wire::text_form(*message, kWhole);
     message->Clear();
     EXPECT_EQ(qel_wire::parse_text(text, message.get()).value_or(""), "");
     EXPECT_EQ(message->SerializeAsString(), whole_message(name)) << name;
@@ -407,6 +426,42 @@ TEST(TextForm, OfAnotherLanguage_IsReadable) {
   EXPECT_EQ(
       qel_wire::text_form(*parsed("Result", Wire().text(2, "\xec\x95\x88\xeb\x85\x95").bytes())),
       "msg: \"\xec\x95\x88\xeb\x85\x95\"\n");
+}
+
+// As the runtime prints them, but that texts are not taken apart.
+TEST(TextForm, OfUnknownFields_HasThemByTheirNumbers) {
+  EXPECT_EQ(qel_wire::text_form(*parsed("ClientEcho", Wire()
+                                                          .number(2, -1)
+                                                          .fixed32(3, 7)
+                                                          .fixed64(4, 8)
+                                                          .group(5, Wire().number(1, 1))
+                                                          .text(7, hex("08 01"))
+                                                          .bytes())),
+            "2: 18446744073709551615\n3: 0x00000007\n4: 0x0000000000000008\n5 {\n  1: 1\n}\n"
+            "7: \"\\010\\001\"\n");
+}
+
+// Each level would be a line of its own, indented by all levels before.
+TEST(TextForm, OfAnUnknownTextThatNestsDeep_IsNotMuchLonger) {
+  std::string bytes = hex("08 01");
+  for (int level = 0; level < 10000; ++level) {
+    bytes = Wire().text(9, bytes).bytes();
+  }
+  EXPECT_LT(qel_wire::text_form(*parsed("ClientEcho", bytes)).size(), 5 * bytes.size());
+}
+
+TEST(TextForm, WithColours_HasThemOfNamesAndValues) {
+  qel_wire::FormOptions options;
+  options.colours = qel_wire::Colours(true);
+  EXPECT_EQ(qel_wire::text_form(*parsed("ClientEcho", hex("08 07")), options),
+            "\033[36mrequestId\033[0m: \033[32m7\033[0m\n");
+}
+
+TEST(JsonForm, WithColours_HasThemOfNames) {
+  qel_wire::FormOptions options;
+  options.colours = qel_wire::Colours(true);
+  EXPECT_EQ(qel_wire::json_form(*parsed("Result", Wire().text(2, "a\": b").bytes()), options),
+            "{\n  \033[36m\"msg\"\033[0m: \"a\\\": b\"\n}\n");
 }
 
 TEST(ParseText, OfAFieldThatIsNotThere_SaysWhere) {
@@ -442,14 +497,14 @@ TEST(UnknownFields, OnAllLevels_AreCounted) {
 
 TEST(Hex, WithSeparators_IsRead) {
   for (const char* text :
-       {"0a0B0c", "0a 0B\n0c", "0a:0b:0c", "0x0a, 0x0b, 0x0c", "\\x0a\\x0b\\x0c"}) {
+       {"0a0B0c", "0a 0B\n0c", "0a:0b:0c", "0x0a, 0x0b, 0x0c", "\\x0a\\x0b\\x0c", "0X0a0b0c"}) {
     EXPECT_EQ(qel_wire::from_notation(text, Notation::kHex).value_or("refused"), "\x0a\x0b\x0c")
         << text;
   }
 }
 
 TEST(Hex, ThatIsNone_IsRefused) {
-  for (const char* text : {"0", "0a0", "zz", "0a-0b"}) {
+  for (const char* text : {"0", "0a0", "zz", "0a-0b", "10x5"}) {
     EXPECT_FALSE(qel_wire::from_notation(text, Notation::kHex).has_value()) << text;
   }
 }
@@ -585,6 +640,11 @@ TEST(Schema, OfAMessage_HasWhatItContainsOnce) {
 
 TEST(Schema, OfAnEnumeration_HasItsMembers) {
   EXPECT_EQ(qel_wire::schema_of("ProxyOption"), "enum ProxyOption {\n  GATEWAY_MODE = 0;\n}\n");
+}
+
+TEST(Schema, WithColours_HasThemOfNames) {
+  EXPECT_EQ(qel_wire::schema_of("ProxyOption", qel_wire::Colours(true)),
+            "enum ProxyOption {\n  \033[36mGATEWAY_MODE\033[0m = 0;\n}\n");
 }
 
 TEST(Schema, OfNothing_IsEmpty) {

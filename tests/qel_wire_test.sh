@@ -25,7 +25,7 @@ exits() {
 
 says() { diff <(printf '%s\n' "$@") "$scratch/err" >&2 || fail 'another complaint'; }
 
-# completed WORD...: what the last word may become.
+# completed WORD...: what the last word may become. Bash makes "=" a word of its own.
 completed() {
   bash -c '
     PATH=$1:$PATH
@@ -99,6 +99,10 @@ case $1 in
     says 'qel-wire: the text is no ClientEcho: 1:21: Message type "ClientEcho" has no field named "nothing".'
     ;;
   complaints_have_nothing_that_terminals_obey)
+    exits 2 $'--\033[2J'
+    says "qel-wire: there is no option '--\\033[2J', or it takes another value ('qel-wire --help')"
+    exits 3 decode ClientEcho $'\033[2J'
+    says 'qel-wire: cannot read \033[2J: No such file or directory'
     exits 2 decode $'\033[2J'
     says "qel-wire: there is no message '\\033[2J'; 'qel-wire schema' lists them"
     ;;
@@ -117,6 +121,12 @@ case $1 in
     [ "$(tail -n 1 "$scratch/out" | awk '{print $1}')" -le 10 ] || fail 'more'
     exits 0 guess --all --hex=580760016a020801
     [ "$(wc -l <"$scratch/out")" -eq 81 ] || fail 'not all'
+    ;;
+  options_that_the_command_has_not)
+    exits 2 guess --json --hex=0807
+    says 'qel-wire: guess has no option --json'
+    exits 2 schema --all
+    says 'qel-wire: schema has no option --all'
     ;;
   wrong_calls)
     for call in '' nothing 'decode' 'explain' 'decode Nothing' 'schema Nothing' 'schema A B' \
@@ -142,6 +152,8 @@ case $1 in
   help_and_version)
     exits 0 --help
     grep -q '^usage: qel-wire COMMAND' "$scratch/out" || fail 'no usage'
+    exits 0 decode ClientEcho --help
+    grep -q '^usage: qel-wire COMMAND' "$scratch/out" || fail 'no usage in a call of something else'
     exits 0 --version
     grep -Eqx 'qel-wire [0-9]+\.[0-9]+\.[0-9]+' "$scratch/out" || fail 'no version'
     ;;
@@ -152,8 +164,12 @@ case $1 in
     grep -q $'\033\\[36mrequestId' "$scratch/terminal" || fail 'no colours on a terminal'
     NO_COLOR=1 script -qec "'$tool' explain ClientEcho --hex=0807" /dev/null >"$scratch/terminal" </dev/null
     ! grep -q $'\033' "$scratch/terminal" || fail 'colours in spite of NO_COLOR'
-    exits 0 explain --color=always ClientEcho --hex=0807
-    grep -q $'\033\\[36mrequestId' "$scratch/out" || fail 'no colours that were asked for'
+    for call in 'explain ClientEcho --hex=0807' 'decode ClientEcho --hex=0807' \
+      'decode ClientEcho --json --hex=0807' 'guess --hex=0807' 'schema ClientEcho'; do
+      # shellcheck disable=SC2086
+      exits 0 --color=always $call
+      grep -q $'\033\\[36m' "$scratch/out" || fail "no colours that were asked for: $call"
+    done
     ;;
   access_token_is_shown_if_asked_for)
     bytes=3208612d736563726574
@@ -198,6 +214,13 @@ case $1 in
     diff <(echo) <(completed decode MsgT) >&2
     diff <(echo) <(completed guess ChatR) >&2
     diff <(printf '%s\n' MsgType) <(completed schema MsgT) >&2
+    ;;
+  completion_goes_on_behind_values)
+    diff <(printf '%s\n' explain) <(completed --color = never exp) >&2
+    diff <(printf '%s\n' ChatRequest ChatReply) <(completed explain --hex = 0807 ChatR) >&2
+    diff <(printf '%s\n' always auto) <(completed --color = a) >&2
+    diff <(printf '%s\n' always never auto) <(completed --color =) >&2
+    diff <(echo) <(completed --hex = a) >&2
     ;;
   completion_knows_every_option)
     diff <(completed --) <("$tool" --help | grep -oE '^  --[a-z0-9-]+(, --version)?(=WHEN)?' |

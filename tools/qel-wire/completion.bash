@@ -1,12 +1,20 @@
 # Bash completion of qel-wire: commands, options, names of messages and enumerations, files.
 # shellcheck shell=bash
 _qel_wire() {
-  local word=${COMP_WORDS[COMP_CWORD]} before=() i choices
+  local word=${COMP_WORDS[COMP_CWORD]} before=() option='' i choices=''
+  # An option's value comes as "=" and a word.
   for ((i = 1; i < COMP_CWORD; ++i)); do
-    [[ ${COMP_WORDS[i]} == -* ]] || before+=("${COMP_WORDS[i]}")
+    case ${COMP_WORDS[i]} in
+      -*) option=${COMP_WORDS[i]} ;;
+      =) ((i + 1 == COMP_CWORD)) || { ((++i)) && option=''; } ;;
+      *) before+=("${COMP_WORDS[i]}") option='' ;;
+    esac
   done
+  [[ $word != = ]] || word=''
   COMPREPLY=()
-  if [[ $word == -* ]]; then
+  if [[ -n $option && (${COMP_WORDS[COMP_CWORD]} == = || ${COMP_WORDS[COMP_CWORD - 1]} == =) ]]; then
+    [[ $option != --color ]] || choices='always never auto'
+  elif [[ $word == -* ]]; then
     choices='--hex --base64 --json --all --show-token --color= --help --version'
   elif ((${#before[@]} == 0)); then
     choices='decode encode explain guess schema'

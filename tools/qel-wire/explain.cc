@@ -88,7 +88,9 @@ class Explanation : public Visitor {
       : bytes_(bytes), options_(options), colours_(options.colours), out_(*out) {}
 
   void begin(const Piece& piece) override {
-    const bool is_hidden = !options_.show_token && is_access_token(piece);
+    const bool is_hidden = !options_.show_token && piece.kind == Piece::kBytes &&
+                           (piece.is_known ? is_access_token(*piece.field)
+                                           : may_hold_access_token(piece.number, piece.bytes));
     const bool contains = piece.kind == Piece::kMessage || piece.kind == Piece::kPacked ||
                           piece.kind == Piece::kGroup;
     const size_t end = contains || is_hidden ? piece.value_offset : piece.end;

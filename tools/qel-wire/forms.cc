@@ -8,26 +8,28 @@
 #include <nettle/base64.h>
 
 #include <algorithm>
+#include <cctype>
+#include <iomanip>
 #include <nlohmann/json.hpp>
+#include <sstream>
 #include <stdexcept>
+#include <type_traits>
+#include <utility>
 #include <vector>
 
-#include "text.h"
+#include "token.h"
 
 namespace qel_wire {
 namespace {
 
+using google::protobuf::EnumValueDescriptor;
 using google::protobuf::FieldDescriptor;
 using google::protobuf::Message;
 using google::protobuf::Reflection;
 using google::protobuf::TextFormat;
+using google::protobuf::UnknownField;
+using google::protobuf::UnknownFieldSet;
 using Json = nlohmann::ordered_json;
-
-class ReadableTexts : public TextFormat::FieldValuePrinter {
- public:
-  std::string PrintString(const std::string& text) const override { return in_quotes(text); }
-  std::string PrintBytes(const std::string& bytes) const override { return in_quotes(bytes); }
-};
 
 // The first complaint.
 class Complaint : public google::protobuf::io::ErrorCollector {
@@ -46,64 +48,216 @@ class Complaint : public google::protobuf::io::ErrorCollector {
   std::optional<std::string> text_;
 };
 
-Json json_object(const Message& message);
-
-// The value of a field, or of one of its elements (index >= 0).
-Json json_value(const Message& message, const FieldDescriptor& field, int index) {
+// The value of a field, or of one of its elements (index >= 0), handed to take as a bool, a number,
+// a text, an EnumValueDescriptor or a Message.
+template <typename Take>
+void take_value(const Message& message, const FieldDescriptor& field, int index, Take take) {
   const Reflection& fields = *message.GetReflection();
   const bool is_element = index >= 0;
   switch (field.cpp_type()) {
     case FieldDescriptor::CPPTYPE_INT32:
-      return is_element ? fields.GetRepeatedInt32(message, &field, index)
-                        : fields.GetInt32(message, &field);
+      return take(is_element ? fields.GetRepeatedInt32(message, &field, index)
+                             : fields.GetInt32(message, &field));
     case FieldDescriptor::CPPTYPE_INT64:
-      return std::to_string(is_element ? fields.GetRepeatedInt64(message, &field, index)
-                                       : fields.GetInt64(message, &field));
+      return take(is_element ? fields.GetRepeatedInt64(message, &field, index)
+                             : fields.GetInt64(message, &field));
     case FieldDescriptor::CPPTYPE_BOOL:
-      return is_element ? fields.GetRepeatedBool(message, &field, index)
-                        : fields.GetBool(message, &field);
+      return take(is_element ? fields.GetRepeatedBool(message, &field, index)
+                             : fields.GetBool(message, &field));
     case FieldDescriptor::CPPTYPE_ENUM:
-      return (is_element ? fields.GetRepeatedEnum(message, &field, index)
-                         : fields.GetEnum(message, &field))
-          ->name();
-    case FieldDescriptor::CPPTYPE_STRING: {
-      const std::string text = is_element ? fields.GetRepeatedString(message, &field, index)
-                                          : fields.GetString(message, &field);
-      return field.type() == FieldDescriptor::TYPE_BYTES ? to_notation(text, Notation::kBase64)
-                                                         : text;
-    }
+      return take(*(is_element ? fields.GetRepeatedEnum(message, &field, index)
+                               : fields.GetEnum(message, &field)));
+    case FieldDescriptor::CPPTYPE_STRING:
+      return take(is_element ? fields.GetRepeatedString(message, &field, index)
+                             : fields.GetString(message, &field));
     case FieldDescriptor::CPPTYPE_MESSAGE:
-      return json_object(is_element ? fields.GetRepeatedMessage(message, &field, index)
-                                    : fields.GetMessage(message, &field));
+      return take(is_element ? fields.GetRepeatedMessage(message, &field, index)
+                             : fields.GetMessage(message, &field));
     default:
       throw std::logic_error(field.full_name() + " has a type that no other field has");
   }
 }
 
-// In the order of the numbers.
-Json json_object(const Message& message) {
+// Hands over each value that the message has, in the order of the numbers: take(field, index), with
+// the index as take_value() has it.
+template <typename Take>
+void for_each_value(const Message& message, Take take) {
   const Reflection& fields = *message.GetReflection();
   std::vector<const FieldDescriptor*> present;
   fields.ListFields(message, &present);
-  Json object = Json::object();
   for (const FieldDescriptor* field : present) {
-    Json& value = object[field->name()];
     if (!field->is_repeated()) {
-      value = json_value(message, *field, -1);
+      take(*field, -1);
       continue;
     }
     for (int i = 0; i < fields.FieldSize(message, field); ++i) {
-      value.push_back(json_value(message, *field, i));
+      take(*field, i);
     }
   }
+}
+
+// ---- Text
+
+class TextWriter {
+ public:
+  explicit TextWriter(const FormOptions& options) : options_(options) {}
+
+  void write(const Message& message) {
+    for_each_value(message, [&](const FieldDescriptor& field, int index) {
+      take_value(message, field, index, [&](const auto& value) { write_value(field, value); });
+    });
+    write_unknown(message.GetReflection()->GetUnknownFields(message));
+  }
+
+  std::string text() && { return std::move(text_); }
+
+ private:
+  template <typename Value>
+  void write_value(const FieldDescriptor& field, const Value& value) {
+    if constexpr (std::is_same_v<Value, Message>) {
+      open(field.name());
+      write(value);
+      close();
+    } else if constexpr (std::is_same_v<Value, EnumValueDescriptor>) {
+      line(field.name(), value.name());
+    } else if constexpr (std::is_same_v<Value, std::string>) {
+      const bool is_hidden = !options_.show_token && is_access_token(field);
+      line(field.name(), in_quotes(is_hidden ? kNotShown : value));
+    } else if constexpr (std::is_same_v<Value, bool>) {
+      line(field.name(), value ? "true" : "false");
+    } else {
+      line(field.name(), std::to_string(value));
+    }
+  }
+
+  void write_unknown(const UnknownFieldSet& fields) {
+    for (int i = 0; i < fields.field_count(); ++i) {
+      const UnknownField& field = fields.field(i);
+      const std::string name = std::to_string(field.number());
+      switch (field.type()) {
+        case UnknownField::TYPE_VARINT:
+          line(name, std::to_string(field.varint()));
+          break;
+        case UnknownField::TYPE_FIXED32:
+          line(name, "0x" + in_hex(field.fixed32(), 8));
+          break;
+        case UnknownField::TYPE_FIXED64:
+          line(name, "0x" + in_hex(field.fixed64(), 16));
+          break;
+        case UnknownField::TYPE_GROUP:
+          open(name);
+          write_unknown(field.group());
+          close();
+          break;
+        default: {
+          // Not taken apart: a text that is no message looks like one often enough.
+          const std::string& text = field.length_delimited();
+          const bool is_hidden = !options_.show_token &&
+                                 may_hold_access_token(static_cast<uint32_t>(field.number()), text);
+          line(name, in_quotes(is_hidden ? kNotShown : text));
+        }
+      }
+    }
+  }
+
+  static std::string in_hex(uint64_t number, int digits) {
+    std::ostringstream text;
+    text << std::hex << std::setfill('0') << std::setw(digits) << number;
+    return text.str();
+  }
+
+  void begin_line(const std::string& name) {
+    text_.append(2 * depth_, ' ').append(options_.colours.name).append(name);
+    text_ += options_.colours.end;
+  }
+
+  void line(const std::string& name, const std::string& value) {
+    begin_line(name);
+    text_.append(": ").append(options_.colours.value).append(value);
+    text_.append(options_.colours.end).append("\n");
+  }
+
+  void open(const std::string& name) {
+    begin_line(name);
+    text_ += " {\n";
+    ++depth_;
+  }
+
+  void close() {
+    --depth_;
+    text_.append(2 * depth_, ' ').append("}\n");
+  }
+
+  const FormOptions& options_;
+  size_t depth_ = 0;
+  std::string text_;
+};
+
+// ---- JSON
+
+Json json_object(const Message& message, bool show_token);
+
+template <typename Value>
+Json json_value(const FieldDescriptor& field, const Value& value, bool show_token) {
+  if constexpr (std::is_same_v<Value, Message>) {
+    return json_object(value, show_token);
+  } else if constexpr (std::is_same_v<Value, EnumValueDescriptor>) {
+    return value.name();
+  } else if constexpr (std::is_same_v<Value, std::string>) {
+    if (!show_token && is_access_token(field)) {
+      return kNotShown;
+    }
+    return field.type() == FieldDescriptor::TYPE_BYTES ? to_notation(value, Notation::kBase64)
+                                                       : value;
+  } else if constexpr (std::is_same_v<Value, google::protobuf::int64>) {
+    return std::to_string(value);
+  } else {
+    return value;
+  }
+}
+
+Json json_object(const Message& message, bool show_token) {
+  Json object = Json::object();
+  for_each_value(message, [&](const FieldDescriptor& field, int index) {
+    take_value(message, field, index, [&](const auto& value) {
+      Json& place = object[field.name()];
+      if (index >= 0) {
+        place.push_back(json_value(field, value, show_token));
+      } else {
+        place = json_value(field, value, show_token);
+      }
+    });
+  });
   return object;
+}
+
+// The names before the colons, a line each.
+std::string with_coloured_names(const std::string& json, const Colours& colours) {
+  std::string result;
+  std::istringstream lines(json);
+  for (std::string line; std::getline(lines, line);) {
+    const size_t begin = line.find_first_not_of(' ');
+    const size_t end = line.find("\": ");
+    if (begin != std::string::npos && line[begin] == '"' && end != std::string::npos) {
+      line.insert(end + 1, colours.end).insert(begin, colours.name);
+    }
+    result += line + "\n";
+  }
+  return result;
+}
+
+// ---- Hex and base64
+
+bool is_hex_digit(char c) {
+  return std::isxdigit(static_cast<unsigned char>(c)) != 0;
 }
 
 std::string without_separators(std::string_view hex) {
   std::string digits;
   for (size_t i = 0; i < hex.size(); ++i) {
     const std::string_view two = hex.substr(i, 2);
-    if (two == "0x" || two == "\\x") {
+    const bool is_within_digits = i > 0 && is_hex_digit(hex[i - 1]);
+    if (two == "\\x" || ((two == "0x" || two == "0X") && !is_within_digits)) {
       ++i;
     } else if (hex[i] != ':' && hex[i] != ',') {
       digits += hex[i];
@@ -149,37 +303,31 @@ std::optional<std::string> from_base64(std::string_view text) {
 
 }  // namespace
 
-std::string text_form(const Message& message) {
-  TextFormat::Printer printer;
-  printer.SetDefaultFieldValuePrinter(new ReadableTexts);  // which the printer owns
-  std::string text;
-  printer.PrintToString(message, &text);
-  return text;
+std::string text_form(const Message& message, const FormOptions& options) {
+  TextWriter writer(options);
+  writer.write(message);
+  return std::move(writer).text();
 }
 
-std::string json_form(const Message& message) {
+std::string json_form(const Message& message, const FormOptions& options) {
   // Characters outside ASCII are escaped, as most printers of JSON do; what is no UTF-8 is
   // replaced.
-  return json_object(message).dump(2, ' ', true, Json::error_handler_t::replace) + "\n";
+  const std::string json =
+      json_object(message, options.show_token).dump(2, ' ', true, Json::error_handler_t::replace);
+  return with_coloured_names(json, options.colours);
 }
 
 int unknown_fields(const Message& message) {
-  const Reflection& fields = *message.GetReflection();
-  int count = fields.GetUnknownFields(message).field_count();
-  std::vector<const FieldDescriptor*> present;
-  fields.ListFields(message, &present);
-  for (const FieldDescriptor* field : present) {
-    if (field->message_type() == nullptr) {
-      continue;
+  int count = message.GetReflection()->GetUnknownFields(message).field_count();
+  for_each_value(message, [&](const FieldDescriptor& field, int index) {
+    if (field.message_type() != nullptr) {
+      take_value(message, field, index, [&](const auto& value) {
+        if constexpr (std::is_base_of_v<Message, std::decay_t<decltype(value)>>) {
+          count += unknown_fields(value);
+        }
+      });
     }
-    if (!field->is_repeated()) {
-      count += unknown_fields(fields.GetMessage(message, field));
-      continue;
-    }
-    for (int i = 0; i < fields.FieldSize(message, field); ++i) {
-      count += unknown_fields(fields.GetRepeatedMessage(message, field, i));
-    }
-  }
+  });
   return count;
 }
 

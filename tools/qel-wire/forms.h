@@ -8,15 +8,22 @@
 #include <string>
 #include <string_view>
 
+#include "text.h"
+
 namespace qel_wire {
 
-// The text form of Protocol Buffers, which parse_text() takes back; unknown fields by their
-// numbers.
-std::string text_form(const google::protobuf::Message& message);
+struct FormOptions {
+  Colours colours{false};
+  bool show_token = false;
+};
+
+// The text form of Protocol Buffers, which parse_text() takes back but for unknown fields: these
+// stand behind the others, by their numbers.
+std::string text_form(const google::protobuf::Message& message, const FormOptions& options = {});
 
 // The JSON form of Protocol Buffers: names as in the schema, int64 and bytes (base64) as strings,
 // enumerations by name. It has no unknown fields.
-std::string json_form(const google::protobuf::Message& message);
+std::string json_form(const google::protobuf::Message& message, const FormOptions& options = {});
 
 // How many fields the message does not know, on all levels.
 int unknown_fields(const google::protobuf::Message& message);

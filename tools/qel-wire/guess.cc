@@ -1,7 +1,7 @@
 #include "guess.h"
 
 #include <algorithm>
-#include <set>
+#include <bitset>
 #include <tuple>
 
 #include "msgspec_frontend.pb.h"
@@ -39,17 +39,26 @@ class Fitting : public Visitor {
   void end(const Piece& /*piece*/) override { levels_.pop_back(); }
 
   // Of the message itself: how many of its fields it had.
-  size_t different_fields() const { return levels_.front().size(); }
+  size_t different_fields() const { return std::bitset<64>(levels_.front().seen).count(); }
 
  private:
+  // The fields that a message had so far. No message of the schema has 64.
+  struct Level {
+    uint64_t seen = 0;  // a bit each, by its index
+    int highest = 0;    // number
+  };
+
   // Encoders write fields in the order of their numbers.
   void check_order(const FieldDescriptor& field) {
-    std::set<int>& seen = levels_.back();
-    const bool is_again = !seen.insert(field.number()).second && !field.is_repeated();
-    const bool is_late = *seen.rbegin() != field.number();
+    Level& level = levels_.back();
+    const uint64_t bit = uint64_t{1} << static_cast<unsigned>(field.index());
+    const bool is_again = (level.seen & bit) != 0 && !field.is_repeated();
+    const bool is_late = field.number() < level.highest;
     if (is_again || is_late) {
       ++fit_.doubtful;
     }
+    level.seen |= bit;
+    level.highest = std::max(level.highest, field.number());
   }
 
   static bool is_doubtful(const Piece& piece) {
@@ -76,7 +85,7 @@ class Fitting : public Visitor {
   }
 
   Fit& fit_;
-  std::vector<std::set<int>> levels_;  // of nesting: the fields that came so far
+  std::vector<Level> levels_;  // of nesting
 };
 
 Fit fit(std::string_view bytes, const Descriptor& type) {

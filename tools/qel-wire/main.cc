@@ -5,6 +5,7 @@
 #include <google/protobuf/stubs/common.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <cerrno>
 #include <cstdio>
 #include <cstdlib>
@@ -12,7 +13,9 @@
 #include <iomanip>
 #include <iostream>
 #include <memory>
+#include <new>
 #include <optional>
+#include <stdexcept>
 #include <string>
 #include <vector>
 
@@ -21,7 +24,6 @@
 #include "guess.h"
 #include "schema.h"
 #include "text.h"
-#include "token.h"
 #include "walk.h"
 
 namespace {
@@ -59,7 +61,8 @@ which for encode say how the bytes are written.
   --help, --version
 
 Exits with 0, with 1 if the bytes or the text are broken (guess: if no message takes them), with 2 if
-it was called wrongly, and with 3 if a file cannot be read or the output not be written.
+it was called wrongly, and with 3 if a file cannot be read, the output not be written, or memory runs
+out.
 )";
 
 // Ends the program with that status.
@@ -73,6 +76,7 @@ struct Call {
   std::vector<std::string> arguments;
   Notation notation = Notation::kRaw;
   std::optional<std::string> written;  // the bytes, in the call itself
+  std::vector<int> options;            // all that were given
   bool json = false;
   bool all = false;
   bool show_token = false;
@@ -94,6 +98,7 @@ constexpr option kOptions[] = {
 };
 
 void take_option(int option, const char* value, Call* call) {
+  call->options.push_back(option);
   switch (option) {
     case kHex:
     case kBase64:
@@ -122,13 +127,18 @@ void take_option(int option, const char* value, Call* call) {
       call->command = "version";
       break;
     default:
-      throw Failure{kWrongCall, ""};  // getopt has said why
+      throw std::logic_error("an option that is not taken");
   }
 }
 
 Call read_call(int argc, char** argv) {
   Call call;
+  opterr = 0;  // the complaint is ours
   for (int option; (option = getopt_long(argc, argv, "", kOptions, nullptr)) != -1;) {
+    if (option == '?') {
+      throw Failure{kWrongCall, std::string("there is no option '") + argv[optind - 1] +
+                                    "', or it takes another value ('qel-wire --help')"};
+    }
     take_option(option, optarg, &call);
   }
   call.arguments.assign(argv + optind, argv + argc);
@@ -202,15 +212,15 @@ int decode(const Call& call) {
                                problem->reason + " ('qel-wire explain' shows what comes before)"};
   }
   const auto message = new_message(type);
-  message->ParseFromString(bytes);
-  if (!call.show_token) {
-    qel_wire::hide_access_token(message.get());
+  if (!message->ParseFromString(bytes)) {
+    throw std::logic_error("the message's class does not take what was read");
   }
+  const qel_wire::FormOptions options{qel_wire::Colours(is_coloured(call)), call.show_token};
   if (!call.json) {
-    std::cout << qel_wire::text_form(*message);
+    std::cout << qel_wire::text_form(*message, options);
     return kDone;
   }
-  std::cout << qel_wire::json_form(*message);
+  std::cout << qel_wire::json_form(*message, options);
   if (const int unknown = qel_wire::unknown_fields(*message)) {
     std::cerr << "qel-wire: without "
               << qel_wire::counted(static_cast<size_t>(unknown), "unknown field")
@@ -245,9 +255,9 @@ int explain(const Call& call) {
 
 void print_fit(const qel_wire::Fit& fit, const qel_wire::Colours& colours) {
   std::cout << std::setw(4) << fit.rank << "  " << colours.name << std::left << std::setw(30)
-            << fit.type->name() << colours.end << std::right << std::setw(5) << fit.known
-            << " known" << std::setw(4) << fit.absent << " absent" << std::setw(4) << fit.unknown
-            << " unknown" << std::setw(4) << fit.doubtful << " doubtful"
+            << fit.type->name() << colours.end << std::right << ' ' << std::setw(4) << fit.known
+            << " known " << std::setw(3) << fit.absent << " absent " << std::setw(3) << fit.unknown
+            << " unknown " << std::setw(3) << fit.doubtful << " doubtful"
             << (fit.is_broken ? "  " + colours.wrong + "broken" + colours.end : "") << '\n';
 }
 
@@ -268,7 +278,8 @@ int schema(const Call& call) {
     std::cout << qel_wire::schema_names();
     return kDone;
   }
-  const std::string definition = qel_wire::schema_of(call.arguments[0]);
+  const std::string definition =
+      qel_wire::schema_of(call.arguments[0], qel_wire::Colours(is_coloured(call)));
   if (definition.empty()) {
     throw Failure{kWrongCall, "there is no message and no enumeration '" + call.arguments[0] +
                                   "'; 'qel-wire schema' lists them"};
@@ -277,37 +288,51 @@ int schema(const Call& call) {
   return kDone;
 }
 
-int help(const Call& /*call*/) {
-  std::cout << kUsage;
-  return kDone;
-}
+// Of those that not every command takes.
+using Options = std::vector<int>;
 
-int version(const Call& /*call*/) {
-  std::cout << "qel-wire " QEL_WIRE_VERSION "\n";
-  return kDone;
-}
-
-constexpr struct {
+struct Command {
   const char* name;
   size_t needed;   // arguments
   size_t allowed;  // at most
+  Options options;
   int (*run)(const Call& call);
-} kCommands[] = {
-    {"decode", 1, 2, decode},   {"encode", 1, 2, encode}, {"explain", 1, 2, explain},
-    {"guess", 0, 1, guess},     {"schema", 0, 1, schema}, {"help", 0, 1, help},
-    {"version", 0, 1, version},
 };
 
+const std::vector<Command>& commands() {
+  static const std::vector<Command> all = {
+      {"decode", 1, 2, {kHex, kBase64, kJson, kShowToken}, decode},
+      {"encode", 1, 2, {kHex, kBase64}, encode},
+      {"explain", 1, 2, {kHex, kBase64, kAll, kShowToken}, explain},
+      {"guess", 0, 1, {kHex, kBase64, kAll}, guess},
+      {"schema", 0, 1, {}, schema},
+  };
+  return all;
+}
+
+void check_call(const Call& call, const Command& command) {
+  for (const int option : call.options) {
+    if (option != kColor &&
+        std::count(command.options.begin(), command.options.end(), option) == 0) {
+      throw Failure{kWrongCall, call.command + " has no option --" + kOptions[option - kHex].name};
+    }
+  }
+  const size_t most = call.written.has_value() ? command.needed : command.allowed;
+  if (call.arguments.size() < command.needed || call.arguments.size() > most) {
+    throw Failure{kWrongCall, call.command + " takes other arguments ('qel-wire --help')"};
+  }
+}
+
 int run(const Call& call) {
-  for (const auto& command : kCommands) {
-    if (call.command != command.name) {
-      continue;
+  if (call.command == "help" || call.command == "version") {
+    std::cout << (call.command == "help" ? kUsage : "qel-wire " QEL_WIRE_VERSION "\n");
+    return kDone;
+  }
+  for (const Command& command : commands()) {
+    if (call.command == command.name) {
+      check_call(call, command);
+      return command.run(call);
     }
-    const size_t most = call.written.has_value() ? command.needed : command.allowed;
-    if (call.arguments.size() < command.needed || call.arguments.size() > most) {
-      throw Failure{kWrongCall, call.command + " takes other arguments ('qel-wire --help')"};
-    }
-    return command.run(call);
   }
   throw Failure{kWrongCall, call.command.empty()
                                 ? "a command is missing ('qel-wire --help')"
@@ -322,10 +347,11 @@ int main(int argc, char** argv) {
   try {
     status = run(read_call(argc, argv));
   } catch (const Failure& failure) {
-    if (!failure.reason.empty()) {
-      std::cerr << "qel-wire: " << qel_wire::readable(failure.reason) << '\n';
-    }
+    std::cerr << "qel-wire: " << qel_wire::readable(failure.reason) << '\n';
     status = failure.status;
+  } catch (const std::bad_alloc&) {
+    std::cerr << "qel-wire: there is not enough memory\n";
+    status = kNoAccess;
   }
   if (!std::cout.flush()) {
     std::cerr << "qel-wire: the output cannot be written\n";

@@ -1,6 +1,7 @@
 #include "schema.h"
 
 #include <set>
+#include <sstream>
 
 #include "msgspec_frontend.pb.h"
 
@@ -31,6 +32,20 @@ std::string definition(const Descriptor& message, std::set<std::string>* shown) 
   return text;
 }
 
+// The names before the numbers, a line each.
+std::string with_coloured_names(const std::string& definition, const Colours& colours) {
+  std::string result;
+  std::istringstream lines(definition);
+  for (std::string line; std::getline(lines, line);) {
+    const size_t end = line.find(" = ");
+    if (end != std::string::npos) {
+      line.insert(end, colours.end).insert(line.rfind(' ', end - 1) + 1, colours.name);
+    }
+    result += line + "\n";
+  }
+  return result;
+}
+
 }  // namespace
 
 const Descriptor* message_named(const std::string& name) {
@@ -48,13 +63,13 @@ std::string schema_names() {
   return names;
 }
 
-std::string schema_of(const std::string& name) {
+std::string schema_of(const std::string& name, const Colours& colours) {
   std::set<std::string> shown{name};
   if (const Descriptor* message = message_named(name)) {
-    return definition(*message, &shown);
+    return with_coloured_names(definition(*message, &shown), colours);
   }
   const EnumDescriptor* enumeration = file().FindEnumTypeByName(name);
-  return enumeration != nullptr ? enumeration->DebugString() : "";
+  return enumeration != nullptr ? with_coloured_names(enumeration->DebugString(), colours) : "";
 }
 
 }  // namespace qel_wire

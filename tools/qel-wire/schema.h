@@ -5,6 +5,8 @@
 
 #include <string>
 
+#include "text.h"
+
 namespace qel_wire {
 
 // Null if there is none.
@@ -15,7 +17,7 @@ std::string schema_names();
 
 // The definition of the message or the enumeration, and of all that a message contains; empty if
 // there is none of that name.
-std::string schema_of(const std::string& name);
+std::string schema_of(const std::string& name, const Colours& colours = Colours(false));
 
 }  // namespace qel_wire
 

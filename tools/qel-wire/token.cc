@@ -1,39 +1,52 @@
 #include "token.h"
 
-#include <google/protobuf/descriptor.h>
-#include <google/protobuf/unknown_field_set.h>
-
 #include "msgspec_frontend.pb.h"
-#include "text.h"
+#include "walk.h"
 
 namespace qel_wire {
+namespace {
 
-using google::protobuf::UnknownField;
-using google::protobuf::UnknownFieldSet;
+constexpr int kDeepestSearch = 4;
 
-bool is_access_token(const Piece& piece) {
-  if (piece.depth != 0 || piece.kind != Piece::kBytes ||
-      piece.number != ChannelAuthRequest::kAccessTokenFieldNumber) {
+bool holds_access_token(std::string_view text, int depth);
+
+class Search : public Visitor {
+ public:
+  explicit Search(int depth) : depth_(depth) {}
+
+  void begin(const Piece& piece) override {
+    if (piece.kind != Piece::kBytes) {
+      return;
+    }
+    const bool is_token = piece.number == ChannelAuthRequest::kAccessTokenFieldNumber;
+    found_ = found_ || is_token || (!piece.is_known && holds_access_token(piece.bytes, depth_ + 1));
+  }
+
+  bool found() const { return found_; }
+
+ private:
+  int depth_;
+  bool found_ = false;
+};
+
+bool holds_access_token(std::string_view text, int depth) {
+  if (depth > kDeepestSearch) {
     return false;
   }
-  return !piece.is_known || piece.field->containing_type() == ChannelAuthRequest::descriptor();
+  Search search(depth);
+  const bool is_message = !walk(text, *ChannelAuthRequest::descriptor(), &search).has_value();
+  return is_message && search.found();
 }
 
-void hide_access_token(google::protobuf::Message* message) {
-  if (message->GetDescriptor() == ChannelAuthRequest::descriptor()) {
-    auto* request = static_cast<ChannelAuthRequest*>(message);
-    if (request->has_accesstoken()) {
-      request->set_accesstoken(kNotShown);
-    }
-  }
-  UnknownFieldSet* unknown = message->GetReflection()->MutableUnknownFields(message);
-  for (int i = 0; i < unknown->field_count(); ++i) {
-    UnknownField* field = unknown->mutable_field(i);
-    if (field->number() == ChannelAuthRequest::kAccessTokenFieldNumber &&
-        field->type() == UnknownField::TYPE_LENGTH_DELIMITED) {
-      *field->mutable_length_delimited() = kNotShown;
-    }
-  }
+}  // namespace
+
+bool is_access_token(const google::protobuf::FieldDescriptor& field) {
+  return field.number() == ChannelAuthRequest::kAccessTokenFieldNumber &&
+         field.containing_type() == ChannelAuthRequest::descriptor();
+}
+
+bool may_hold_access_token(uint32_t number, std::string_view text) {
+  return number == ChannelAuthRequest::kAccessTokenFieldNumber || holds_access_token(text, 0);
 }
 
 }  // namespace qel_wire

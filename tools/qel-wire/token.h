@@ -2,18 +2,19 @@
 #ifndef QEL_WIRE_TOKEN_H
 #define QEL_WIRE_TOKEN_H
 
-#include <google/protobuf/message.h>
+#include <google/protobuf/descriptor.h>
 
-#include "walk.h"
+#include <cstdint>
+#include <string_view>
 
 namespace qel_wire {
 
-// Also what may be one, because the bytes are read as another message: an unknown text of the same
-// number.
-bool is_access_token(const Piece& piece);
+bool is_access_token(const google::protobuf::FieldDescriptor& field);
 
-// Puts kNotShown in its place.
-void hide_access_token(google::protobuf::Message* message);
+// Whether a text that no field is known for may be one or hold one, because the bytes are read as
+// another message or begin elsewhere: it has the token's number, or is a ChannelAuthRequest with a
+// token, or has a field in which one is.
+bool may_hold_access_token(uint32_t number, std::string_view text);
 
 }  // namespace qel_wire
 
