@@ -20,8 +20,9 @@ static void send_message(unsigned char* message, int size) {
 }
 
 /* ---- Connection ----
- * The channel is authenticated before anything else. The access token is neither logged nor shown
- * by the tool. These messages have numbers of their own: in all others requestId is 11.
+ * The channel is authenticated before anything else. The access token is not logged, and the tool
+ * shows it only if asked to. In these two messages requestId has the number 1; in most others it
+ * has 11.
  */
 
 /* ChannelAuthRequest */

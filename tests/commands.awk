@@ -1,6 +1,6 @@
 # The commands of Markdown pages, a line each: those of shell blocks, without comments and with
 # continued lines joined; in console blocks those behind a prompt; and those in backticks that call
-# ./dev, cmake or ctest with an argument.
+# ./dev, cmake, ctest, cpack or pkg-config with an argument.
 
 function command(text) {
   sub(/(^|[ \t])#.*/, "", text)
@@ -14,7 +14,7 @@ function command(text) {
 function end_of_paragraph(words, n, i) {
   n = split(paragraph, words, "`")
   for (i = 2; i <= n; i += 2) {
-    if (words[i] ~ /^([A-Z_]+=[^ ]+ )*(\.\/dev|cmake|ctest) /) {
+    if (words[i] ~ /^([A-Z_]+=[^ ]+ )*(\.\/dev|cmake|ctest|cpack|pkg-config) /) {
       command(words[i])
     }
   }

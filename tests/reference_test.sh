@@ -1,6 +1,8 @@
 #!/usr/bin/env bash
 # reference_test.sh CASE SOURCE DOCS DOXYGEN: the API reference that was built in the folder DOCS.
 set -euo pipefail
+scratch=$(mktemp -d)
+trap 'rm -rf "$scratch"' EXIT
 source=$2
 docs=$3
 doxygen=$4
@@ -16,7 +18,23 @@ targets() {
   grep -ohE '"[^" ]+\.html(#[^"]*)?"' "$html"/*.js | tr -d '"'
 }
 
+# complete FOLDER: there are its pages.
+complete() {
+  [ -s "$1/share/doc/qel-message-protosvc/html/index.html" ]
+  [ -s "$1/share/man/man3/chat_request_serialize.3" ]
+}
+
 case $1 in
+  is_installed)
+    cmake --install "${docs%/docs}" --prefix "$scratch" --component development >/dev/null
+    complete "$scratch"
+    ;;
+  is_packaged)
+    cpack --config "${docs%/docs}/CPackConfig.cmake" -G DEB -D CPACK_COMPONENTS_ALL=development \
+      -B "$scratch" >"$scratch/messages"
+    dpkg-deb -x "$scratch"/libqel-message-protosvc-dev_*.deb "$scratch"
+    complete "$scratch/usr"
+    ;;
   every_function_has_an_entry)
     diff <(sort "$functions") \
       <(grep -ohE '<td class="memname">(int|void) [a-z_]+' "$html"/group*.html | sed 's/.* //' | sort) >&2
@@ -50,8 +68,6 @@ case $1 in
     [ -z "$missing" ] || { echo "no such file: $missing" >&2 && exit 1; }
     ;;
   argument_without_comment_is_refused)
-    scratch=$(mktemp -d)
-    trap 'rm -rf "$scratch"' EXIT
     mkdir "$scratch/proto-lib"
     cp -r "$source/docs" "$scratch/docs"
     sed '/@param callId /d' "$header" >"$scratch/proto-lib/${header##*/}"
