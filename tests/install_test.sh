@@ -4,23 +4,11 @@
 # installs into a folder, which is then moved. With TOOLCHAIN, CMake's, it is for another machine.
 set -euo pipefail
 export LC_ALL=C
-source=$2
-build=$3
-version=$4
-libdir=$5
-protobuf=$6
-cc=$7
-cxx=$8
-toolchain=${9:-}
-first=${version%%.*}
-triple=${libdir##*/}
+# shellcheck source=SCRIPTDIR/installed.sh
+. "$(dirname "$0")/installed.sh"
 moved=$build/install-test/moved
 tree=$moved
 [ -z "$toolchain" ] || tree=$build/install-test/sysroot/usr
-scratch=$(mktemp -d)
-trap 'rm -rf "$scratch"' EXIT
-# shellcheck source=SCRIPTDIR/installed.sh
-. "$(dirname "$0")/installed.sh"
 
 # install_component COMPONENT: into $scratch/tree, whose files and links go to $files.
 install_component() {

@@ -1,11 +1,18 @@
-# To be sourced: what the tests of installed trees and of packages share. The functions take
-#   $source       this checkout
-#   $protobuf     an installation of Protocol Buffers 2.6
-#   $libdir       folder of libraries in a prefix: lib/TRIPLE
-#   $cc, $cxx     the compilers
-#   $toolchain    CMake's toolchain file for another machine; empty for this one
-#   $scratch      where consumers are built
-# shellcheck shell=bash disable=SC2154
+# To be sourced by the tests of installed trees and of packages, whose arguments it names:
+#   CASE SOURCE BUILD VERSION LIBDIR PROTOBUF-ROOT CC CXX [TOOLCHAIN]
+# shellcheck shell=bash disable=SC2034 # they are used there
+source=$2
+build=$3
+version=$4
+first=${version%%.*} # the SONAME's number
+libdir=$5            # folder of libraries in a prefix: lib/TRIPLE
+triple=${libdir##*/}
+protobuf=$6 # an installation of Protocol Buffers 2.6
+cc=$7
+cxx=$8
+toolchain=${9:-} # CMake's for another machine; empty for this one
+scratch=$(mktemp -d)
+trap 'rm -rf "$scratch"' EXIT
 
 fail() {
   printf '%s\n' "$*" >&2

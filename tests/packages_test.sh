@@ -4,21 +4,9 @@
 # others. With TOOLCHAIN, CMake's, it is for another machine.
 set -euo pipefail
 export LC_ALL=C
-source=$2
-build=$3
-version=$4
-libdir=$5
-protobuf=$6
-cc=$7
-cxx=$8
-toolchain=${9:-}
-triple=${libdir##*/}
-first=${version%%.*}
-packages=$build/package-test
-scratch=$(mktemp -d)
-trap 'rm -rf "$scratch"' EXIT
 # shellcheck source=SCRIPTDIR/installed.sh
 . "$(dirname "$0")/installed.sh"
+packages=$build/package-test
 
 native=$(dpkg --print-architecture)
 case $triple in

@@ -140,6 +140,8 @@ case $1 in
   unreadable_input)
     exits 3 decode ClientEcho "$scratch/nothing"
     says "qel-wire: cannot read $scratch/nothing: No such file or directory"
+    exits 3 decode ClientEcho --hex 0807
+    says "qel-wire: there is no file '0807'; bytes in the call itself are written --hex=BYTES, --base64=BYTES"
     exits 3 decode ClientEcho "$scratch"
     says "qel-wire: cannot read $scratch: Is a directory"
     ;;

@@ -173,6 +173,12 @@ std::string read_source(const Call& call, size_t needed) {
 
 std::string read_bytes(const Call& call, size_t needed) {
   const bool is_given = call.written.has_value();
+  if (!is_given && call.notation != Notation::kRaw && call.arguments.size() > needed &&
+      call.arguments[needed] != "-" && access(call.arguments[needed].c_str(), F_OK) != 0) {
+    throw Failure{kNoAccess,
+                  "there is no file '" + call.arguments[needed] +
+                      "'; bytes in the call itself are written --hex=BYTES, --base64=BYTES"};
+  }
   const std::string source = is_given ? *call.written : read_source(call, needed);
   const std::optional<std::string> bytes = qel_wire::from_notation(source, call.notation);
   if (!bytes.has_value()) {
