@@ -91,9 +91,7 @@ class Explanation : public Visitor {
     const bool is_hidden = !options_.show_token && piece.kind == Piece::kBytes &&
                            (piece.is_known ? is_access_token(*piece.field)
                                            : may_hold_access_token(piece.number, piece.bytes));
-    const bool contains = piece.kind == Piece::kMessage || piece.kind == Piece::kPacked ||
-                          piece.kind == Piece::kGroup;
-    const size_t end = contains || is_hidden ? piece.value_offset : piece.end;
+    const size_t end = piece.is_container() || is_hidden ? piece.value_offset : piece.end;
     row(piece.offset, end, piece.depth,
         name_of(piece) + type_of(piece) + (is_hidden ? hidden(piece) : value_of(piece)) +
             doubts_of(piece));
@@ -117,9 +115,8 @@ class Explanation : public Visitor {
   }
 
   std::string name_of(const Piece& piece) const {
-    const bool is_element = piece.offset == piece.value_offset;
     const std::string name = piece.field != nullptr ? piece.field->name() : "?";
-    return is_element
+    return piece.is_element()
                ? ""
                : std::to_string(piece.number) + " " + colours_.name + name + colours_.end + " ";
   }

@@ -20,18 +20,16 @@ class Fitting : public Visitor {
   explicit Fitting(Fit* fit) : fit_(*fit) { levels_.emplace_back(); }
 
   void begin(const Piece& piece) override {
-    const bool is_element = piece.offset == piece.value_offset;
     if (!piece.is_known) {
       ++fit_.unknown;
-    } else if (!is_element) {
+    } else if (!piece.is_element()) {
       ++fit_.known;
       check_order(*piece.field);
     }
     if (piece.is_known && is_doubtful(piece)) {
       ++fit_.doubtful;
     }
-    if (piece.kind == Piece::kMessage || piece.kind == Piece::kGroup ||
-        piece.kind == Piece::kPacked) {
+    if (piece.is_container()) {
       levels_.emplace_back();
     }
   }

@@ -23,8 +23,8 @@ struct Piece {
   Kind kind = kVarint;
   int depth = 0;  // 0 for the message's own fields
   uint32_t number = 0;
-  const google::protobuf::FieldDescriptor* field =
-      nullptr;  // null if the message has no such number
+  // Null if the message has no such number.
+  const google::protobuf::FieldDescriptor* field = nullptr;
   // Whether the wire type is the field's. Where it is not, or there is no such field, the runtime
   // keeps the piece as an unknown field.
   bool is_known = false;
@@ -40,6 +40,11 @@ struct Piece {
   // The length that kMessage and kPacked give themselves. Where it reaches behind the end of what
   // they lie in, the runtime takes what is there.
   uint32_t length = 0;
+
+  // Whether other pieces lie in it.
+  bool is_container() const { return kind == kMessage || kind == kGroup || kind == kPacked; }
+  // Of a packed list: it has no tag.
+  bool is_element() const { return offset == value_offset; }
 };
 
 // Where and why reading ended.
@@ -55,10 +60,9 @@ struct Problem {
 class Visitor {
  public:
   virtual ~Visitor() = default;
-  // Of kMessage, kGroup and kPacked before what they contain; their end is where they would end by
-  // their length, and of a group 0.
+  // Of a container before what it contains; the end of a group is not known yet, and 0.
   virtual void begin(const Piece& /*piece*/) {}
-  // Behind what a kMessage, kGroup or kPacked contains, with its true end.
+  // Of a container, behind what it contains.
   virtual void end(const Piece& /*piece*/) {}
 };
 
