@@ -231,19 +231,13 @@ Json json_object(const Message& message, bool show_token) {
   return object;
 }
 
-// The names before the colons, a line each.
-std::string with_coloured_names(const std::string& json, const Colours& colours) {
-  std::string result;
-  std::istringstream lines(json);
-  for (std::string line; std::getline(lines, line);) {
-    const size_t begin = line.find_first_not_of(' ');
-    const size_t end = line.find("\": ");
-    if (begin != std::string::npos && line[begin] == '"' && end != std::string::npos) {
-      line.insert(end + 1, colours.end).insert(begin, colours.name);
-    }
-    result += line + "\n";
-  }
-  return result;
+// The key that a line of JSON begins with.
+std::pair<size_t, size_t> find_key(const std::string& line) {
+  const size_t begin = line.find_first_not_of(' ');
+  const size_t colon = line.find("\": ");
+  const bool has_key =
+      begin != std::string::npos && line[begin] == '"' && colon != std::string::npos;
+  return has_key ? std::pair(begin, colon + 1) : std::pair<size_t, size_t>(0, 0);
 }
 
 // ---- Hex and base64
@@ -314,7 +308,7 @@ std::string json_form(const Message& message, const FormOptions& options) {
   // replaced.
   const std::string json =
       json_object(message, options.show_token).dump(2, ' ', true, Json::error_handler_t::replace);
-  return with_coloured_names(json, options.colours);
+  return with_coloured_names(json, options.colours, find_key);
 }
 
 int unknown_fields(const Message& message) {

@@ -1,7 +1,7 @@
 #include "schema.h"
 
 #include <set>
-#include <sstream>
+#include <utility>
 
 #include "msgspec_frontend.pb.h"
 
@@ -32,18 +32,11 @@ std::string definition(const Descriptor& message, std::set<std::string>* shown) 
   return text;
 }
 
-// The names before the numbers, a line each.
-std::string with_coloured_names(const std::string& definition, const Colours& colours) {
-  std::string result;
-  std::istringstream lines(definition);
-  for (std::string line; std::getline(lines, line);) {
-    const size_t end = line.find(" = ");
-    if (end != std::string::npos) {
-      line.insert(end, colours.end).insert(line.rfind(' ', end - 1) + 1, colours.name);
-    }
-    result += line + "\n";
-  }
-  return result;
+// The name before the number of a field or a member.
+std::pair<size_t, size_t> find_name(const std::string& line) {
+  const size_t end = line.find(" = ");
+  return end != std::string::npos ? std::pair(line.rfind(' ', end - 1) + 1, end)
+                                  : std::pair<size_t, size_t>(0, 0);
 }
 
 }  // namespace
@@ -66,10 +59,12 @@ std::string schema_names() {
 std::string schema_of(const std::string& name, const Colours& colours) {
   std::set<std::string> shown{name};
   if (const Descriptor* message = message_named(name)) {
-    return with_coloured_names(definition(*message, &shown), colours);
+    return with_coloured_names(definition(*message, &shown), colours, find_name);
   }
   const EnumDescriptor* enumeration = file().FindEnumTypeByName(name);
-  return enumeration != nullptr ? with_coloured_names(enumeration->DebugString(), colours) : "";
+  return enumeration != nullptr
+             ? with_coloured_names(enumeration->DebugString(), colours, find_name)
+             : "";
 }
 
 }  // namespace qel_wire

@@ -1,6 +1,7 @@
 #include "text.h"
 
 #include <cstdint>
+#include <sstream>
 
 namespace qel_wire {
 namespace {
@@ -125,6 +126,20 @@ Colours::Colours(bool on) {
     wrong = "\033[1;31m";
     end = "\033[0m";
   }
+}
+
+std::string with_coloured_names(const std::string& text, const Colours& colours,
+                                std::pair<size_t, size_t> (*find_name)(const std::string& line)) {
+  std::string result;
+  std::istringstream lines(text);
+  for (std::string line; std::getline(lines, line);) {
+    const auto [begin, end] = find_name(line);
+    if (begin < end) {
+      line.insert(end, colours.end).insert(begin, colours.name);
+    }
+    result += line + "\n";
+  }
+  return result;
 }
 
 }  // namespace qel_wire

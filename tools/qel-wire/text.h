@@ -5,6 +5,7 @@
 #include <cstddef>
 #include <string>
 #include <string_view>
+#include <utility>
 
 namespace qel_wire {
 
@@ -29,6 +30,11 @@ struct Colours {
   explicit Colours(bool on);
   std::string quiet, name, value, doubt, wrong, end;
 };
+
+// The text with a name coloured in each line: find_name says from where to where it stands there,
+// which is nowhere if both are the same.
+std::string with_coloured_names(const std::string& text, const Colours& colours,
+                                std::pair<size_t, size_t> (*find_name)(const std::string& line));
 
 }  // namespace qel_wire
 
