@@ -6,6 +6,7 @@ set -euo pipefail
 export LC_ALL=C
 # shellcheck source=SCRIPTDIR/installed.sh
 . "$(dirname "$0")/installed.sh"
+name_arguments "$@"
 moved=$build/install-test/moved
 tree=$moved
 [ -z "$toolchain" ] || tree=$build/install-test/sysroot/usr

@@ -1,18 +1,22 @@
-# To be sourced by the tests of installed trees and of packages, whose arguments it names:
-#   CASE SOURCE BUILD VERSION LIBDIR PROTOBUF-ROOT CC CXX [TOOLCHAIN]
+# To be sourced: what the tests of installed trees, of packages and of a device SDK share. The functions
+# take the variables that name_arguments sets, or a caller's own of the same names.
 # shellcheck shell=bash disable=SC2034 # they are used there
-source=$2
-build=$3
-version=$4
-first=${version%%.*} # the SONAME's number
-libdir=$5            # folder of libraries in a prefix: lib/TRIPLE
-triple=${libdir##*/}
-protobuf=$6 # an installation of Protocol Buffers 2.6
-cc=$7
-cxx=$8
-toolchain=${9:-} # CMake's for another machine; empty for this one
-scratch=$(mktemp -d)
-trap 'rm -rf "$scratch"' EXIT
+
+# name_arguments CASE SOURCE BUILD VERSION LIBDIR PROTOBUF-ROOT CC CXX [TOOLCHAIN]
+name_arguments() {
+  source=$2
+  build=$3
+  version=$4
+  first=${version%%.*} # the SONAME's number
+  libdir=$5            # folder of libraries in a prefix: lib/TRIPLE
+  triple=${libdir##*/}
+  protobuf=$6 # an installation of Protocol Buffers 2.6
+  cc=$7
+  cxx=$8
+  toolchain=${9:-} # CMake's for another machine; empty for this one
+  scratch=$(mktemp -d)
+  trap 'rm -rf "$scratch"' EXIT
+}
 
 fail() {
   printf '%s\n' "$*" >&2

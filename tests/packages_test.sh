@@ -6,6 +6,7 @@ set -euo pipefail
 export LC_ALL=C
 # shellcheck source=SCRIPTDIR/installed.sh
 . "$(dirname "$0")/installed.sh"
+name_arguments "$@"
 packages=$build/package-test
 
 native=$(dpkg --print-architecture)
