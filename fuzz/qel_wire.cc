@@ -31,9 +31,7 @@ using qel_wire::Piece;
 // Makes a message of the pieces that are found.
 class Assembly : public qel_wire::Visitor {
  public:
-  explicit Assembly(Message* message) {
-    levels_.push_back({message, message->GetReflection()->MutableUnknownFields(message)});
-  }
+  explicit Assembly(Message* message) { enter(message); }
 
   void begin(const Piece& piece) override {
     if (!piece.is_known) {
@@ -113,7 +111,7 @@ class Assembly : public qel_wire::Visitor {
     const FieldDescriptor* field = piece.field;
     const Reflection& fields = *message->GetReflection();
     const auto wide = static_cast<int64_t>(piece.value);
-    const auto narrow = static_cast<int32_t>(static_cast<uint32_t>(piece.value));
+    const int32_t narrow = piece.low_32_bits();
     const bool repeated = field->is_repeated();
     switch (field->cpp_type()) {
       case FieldDescriptor::CPPTYPE_INT64:

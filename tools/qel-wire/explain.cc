@@ -22,41 +22,34 @@ std::string printed(const char* format, uint64_t number) {
   return text;
 }
 
-// A value, and what is to be said against it.
-struct Reading {
-  std::string value;
-  std::string doubt;
-};
-
-Reading read_32_bits(uint64_t value) {
-  const auto kept = static_cast<int32_t>(static_cast<uint32_t>(value));
-  const bool fits = static_cast<int64_t>(value) == kept;
-  return {std::to_string(kept),
-          fits ? "" : "more than 32 bits: " + std::to_string(static_cast<int64_t>(value))};
-}
-
-Reading read_enum(const FieldDescriptor& field, uint64_t value) {
-  Reading reading = read_32_bits(value);
-  const EnumValueDescriptor* member =
-      field.enum_type()->FindValueByNumber(std::stoi(reading.value));
-  if (member != nullptr) {
-    reading.value = member->name() + " (" + reading.value + ")";
-  } else {
-    reading.doubt = "not in " + field.enum_type()->name() + ", reads as absent";
-  }
-  return reading;
-}
-
-Reading read_known_number(const FieldDescriptor& field, uint64_t value) {
-  switch (field.type()) {
+std::string known_number(const Piece& piece) {
+  switch (piece.field->type()) {
     case FieldDescriptor::TYPE_INT32:
-      return read_32_bits(value);
-    case FieldDescriptor::TYPE_ENUM:
-      return read_enum(field, value);
+      return std::to_string(piece.low_32_bits());
+    case FieldDescriptor::TYPE_ENUM: {
+      const int number = piece.low_32_bits();
+      const EnumValueDescriptor* member = piece.field->enum_type()->FindValueByNumber(number);
+      return member != nullptr ? member->name() + " (" + std::to_string(number) + ")"
+                               : std::to_string(number);
+    }
     case FieldDescriptor::TYPE_BOOL:
-      return {value != 0 ? "true" : "false", value > 1 ? "neither 0 nor 1" : ""};
+      return piece.value != 0 ? "true" : "false";
     default:
-      return {std::to_string(static_cast<int64_t>(value)), ""};
+      return std::to_string(static_cast<int64_t>(piece.value));
+  }
+}
+
+// What is to be said against a piece that is doubtful.
+std::string doubt_about(const Piece& piece) {
+  switch (piece.field->type()) {
+    case FieldDescriptor::TYPE_INT32:
+      return "more than 32 bits: " + std::to_string(static_cast<int64_t>(piece.value));
+    case FieldDescriptor::TYPE_ENUM:
+      return "not in " + piece.field->enum_type()->name() + ", reads as absent";
+    case FieldDescriptor::TYPE_BOOL:
+      return "neither 0 nor 1";
+    default:
+      return "not UTF-8";
   }
 }
 
@@ -138,7 +131,7 @@ class Explanation : public Visitor {
   std::string value_of(const Piece& piece) const {
     switch (piece.kind) {
       case Piece::kVarint:
-        return coloured(piece.is_known ? read_known_number(*piece.field, piece.value).value
+        return coloured(piece.is_known ? known_number(piece)
                                        : std::to_string(static_cast<int64_t>(piece.value)));
       case Piece::kFixed64:
         return coloured(printed("0x%016llx", piece.value));
@@ -177,18 +170,12 @@ class Explanation : public Visitor {
     if (!piece.is_known) {
       return doubt("unknown field: " + piece.field->name() + " is " + type_name(*piece.field));
     }
-    switch (piece.kind) {
-      case Piece::kVarint:
-        return doubt(read_known_number(*piece.field, piece.value).doubt);
-      case Piece::kBytes: {
-        const bool is_text = piece.field->type() == FieldDescriptor::TYPE_STRING;
-        return doubt(is_text && !is_utf8(piece.bytes) ? "not UTF-8" : "");
-      }
-      default:
-        return doubt(piece.length > piece.end - piece.value_offset
-                         ? "its length is " + std::to_string(piece.length) + ", more than there is"
-                         : "");
+    if (piece.is_doubtful()) {
+      return doubt(doubt_about(piece));
     }
+    const bool is_short = piece.is_container() && piece.length > piece.end - piece.value_offset;
+    return doubt(is_short ? "its length is " + std::to_string(piece.length) + ", more than there is"
+                          : "");
   }
 
   void row(size_t offset, size_t end, int depth, const std::string& meaning) {

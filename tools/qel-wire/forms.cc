@@ -260,17 +260,28 @@ std::string without_separators(std::string_view hex) {
   return digits;
 }
 
-std::optional<std::string> from_hex(std::string_view text) {
-  const std::string digits = without_separators(text);
-  std::vector<uint8_t> bytes(BASE16_DECODE_LENGTH(digits.size()) + 1);
+// By one of Nettle's decoders.
+template <typename Context>
+std::optional<std::string> decoded(const std::string& digits, size_t most,
+                                   void (*init)(Context* context),
+                                   int (*update)(Context* context, size_t* size, uint8_t* bytes,
+                                                 size_t digit_count, const char* digits),
+                                   int (*finish)(Context* context)) {
+  std::vector<uint8_t> bytes(most);
   size_t size = bytes.size();
-  base16_decode_ctx context;
-  base16_decode_init(&context);
-  if (base16_decode_update(&context, &size, bytes.data(), digits.size(), digits.data()) != 1 ||
-      base16_decode_final(&context) != 1) {
+  Context context;
+  init(&context);
+  if (update(&context, &size, bytes.data(), digits.size(), digits.data()) != 1 ||
+      finish(&context) != 1) {
     return std::nullopt;
   }
   return std::string(bytes.begin(), bytes.begin() + static_cast<std::ptrdiff_t>(size));
+}
+
+std::optional<std::string> from_hex(std::string_view text) {
+  const std::string digits = without_separators(text);
+  return decoded(digits, BASE16_DECODE_LENGTH(digits.size()) + 1, base16_decode_init,
+                 base16_decode_update, base16_decode_final);
 }
 
 std::optional<std::string> from_base64(std::string_view text) {
@@ -284,15 +295,8 @@ std::optional<std::string> from_base64(std::string_view text) {
     return std::nullopt;
   }
   digits.append((4 - digits.size() % 4) % 4, '=');
-  std::vector<uint8_t> bytes(BASE64_DECODE_LENGTH(digits.size()));
-  size_t size = bytes.size();
-  base64_decode_ctx context;
-  base64_decode_init(&context);
-  if (base64_decode_update(&context, &size, bytes.data(), digits.size(), digits.data()) != 1 ||
-      base64_decode_final(&context) != 1) {
-    return std::nullopt;
-  }
-  return std::string(bytes.begin(), bytes.begin() + static_cast<std::ptrdiff_t>(size));
+  return decoded(digits, BASE64_DECODE_LENGTH(digits.size()), base64_decode_init,
+                 base64_decode_update, base64_decode_final);
 }
 
 }  // namespace

@@ -5,7 +5,6 @@
 #include <tuple>
 
 #include "msgspec_frontend.pb.h"
-#include "text.h"
 #include "walk.h"
 
 namespace qel_wire {
@@ -26,7 +25,8 @@ class Fitting : public Visitor {
       ++fit_.known;
       check_order(*piece.field);
     }
-    if (piece.is_known && is_doubtful(piece)) {
+    // Packed lists are taken and never written.
+    if (piece.kind == Piece::kPacked || piece.is_doubtful()) {
       ++fit_.doubtful;
     }
     if (piece.is_container()) {
@@ -57,29 +57,6 @@ class Fitting : public Visitor {
     }
     level.seen |= bit;
     level.highest = std::max(level.highest, field.number());
-  }
-
-  static bool is_doubtful(const Piece& piece) {
-    if (piece.kind == Piece::kPacked) {  // which is taken and never written
-      return true;
-    }
-    if (piece.kind == Piece::kBytes) {
-      return piece.field->type() == FieldDescriptor::TYPE_STRING && !is_utf8(piece.bytes);
-    }
-    if (piece.kind != Piece::kVarint) {
-      return false;
-    }
-    const auto narrow = static_cast<int32_t>(static_cast<uint32_t>(piece.value));
-    switch (piece.field->type()) {
-      case FieldDescriptor::TYPE_ENUM:
-        return piece.field->enum_type()->FindValueByNumber(narrow) == nullptr;
-      case FieldDescriptor::TYPE_INT32:
-        return static_cast<int64_t>(piece.value) != narrow;
-      case FieldDescriptor::TYPE_BOOL:
-        return piece.value > 1;
-      default:
-        return false;
-    }
   }
 
   Fit& fit_;

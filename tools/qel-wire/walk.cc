@@ -271,6 +271,24 @@ class Walk {
 
 }  // namespace
 
+bool Piece::is_doubtful() const {
+  if (!is_known || (kind != kVarint && kind != kBytes)) {
+    return false;
+  }
+  switch (field->type()) {
+    case FieldDescriptor::TYPE_STRING:
+      return !is_utf8(bytes);
+    case FieldDescriptor::TYPE_ENUM:
+      return field->enum_type()->FindValueByNumber(low_32_bits()) == nullptr;
+    case FieldDescriptor::TYPE_INT32:
+      return static_cast<int64_t>(value) != low_32_bits();
+    case FieldDescriptor::TYPE_BOOL:
+      return value > 1;
+    default:
+      return false;
+  }
+}
+
 std::optional<Problem> walk(std::string_view bytes, const Descriptor& type, Visitor* visitor) {
   if (bytes.size() > kMostBytes) {
     return Problem{kMostBytes, kMostBytes, kMostBytes, 0, "more than 64 MiB, which no call takes"};
