@@ -9,6 +9,7 @@
 #include <sstream>
 #include <vector>
 
+#include "decode.h"
 #include "explain.h"
 #include "forms.h"
 #include "guess.h"
@@ -209,10 +210,13 @@ void check_qel_wire(const std::string& input) {
     fail("the pieces make:\n" + assembled->DebugString() + "instead of:\n" + read->DebugString());
   }
 
-  expect_fit_for_terminals(qel_wire::json_form(*read));
-  expect_fit_for_terminals(qel_wire::text_form(*read));
+  for (const bool as_json : {false, true}) {
+    qel_wire::DecodeOptions options;
+    options.as_json = as_json;
+    expect_fit_for_terminals(qel_wire::decode(bytes, type, options).text);
+  }
   read->DiscardUnknownFields();
-  const std::string text = qel_wire::text_form(*read, {qel_wire::Colours(false), true});
+  const std::string text = qel_wire::text_form(*read);
   const std::unique_ptr<Message> again(read->New());
   if (qel_wire::parse_text(text, again.get()).has_value() ||
       again->SerializeAsString() != read->SerializeAsString()) {

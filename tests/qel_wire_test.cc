@@ -137,6 +137,32 @@ TEST(Explain, OfAPackedList_ShowsEachElement) {
             "000003  ac 02                      int64 = 300\n");
 }
 
+TEST(Explain, OfTwoMessagesInOne_MarksWhatIsReplacedAndMerged) {
+  EXPECT_EQ(explained("ChatReply", hex("58 07 6a 02 08 01 58 08 6a 02 08 02")),
+            "000000  58 07                    11 requestId int64 = 7\n"
+            "000002  6a 02                    13 result Result, 2 bytes\n"
+            "000004  08 01                      1 code int32 = 1\n"
+            "000006  58 08                    11 requestId int64 = 8  ! again, replaces that at "
+            "offset 0\n"
+            "000008  6a 02                    13 result Result, 2 bytes  ! again, merged with that "
+            "at offset 2\n"
+            "00000a  08 02                      1 code int32 = 2\n");
+}
+
+TEST(Explain, OfAFieldOutOfOrder_MarksIt) {
+  EXPECT_EQ(explained("ChatReply", hex("60 2a 58 07")),
+            "000000  60 2a                    12 chatroomId int64 = 42\n"
+            "000002  58 07                    11 requestId int64 = 7  ! behind a field with a "
+            "higher number\n");
+}
+
+TEST(Explain, OfAFieldThatIsDoubtfulAndThereAgain_SaysBoth) {
+  EXPECT_EQ(explained("ConnectionStatus", hex("10 01 10 02")),
+            "000000  10 01                    2 connected bool = true\n"
+            "000002  10 02                    2 connected bool = true  ! neither 0 nor 1; again, "
+            "replaces that at offset 0\n");
+}
+
 // The runtime takes it, because the input ends between two fields.
 TEST(Explain, OfAnEmbeddedMessageThatWasCutBetweenFields_SaysThatItIsShort) {
   EXPECT_EQ(explained("ChatReply", hex("6a 07 08 00")),
@@ -312,93 +338,7 @@ TEST(Walk, OfMoreThan64MiB_IsBroken) {
   EXPECT_EQ(problem->reason, "more than 64 MiB, which no call takes");
 }
 
-// ---- The access token
-
-constexpr char kToken[] = "a-secret";
-
-std::string auth_request() {
-  return Wire().number(1, 7).text(5, "app").text(6, kToken).bytes();
-}
-
-TEST(AccessToken, WhenExplained_IsNotShown) {
-  EXPECT_EQ(explained("ChannelAuthRequest", auth_request()),
-            "000000  08 07                    1 requestId int64 = 7\n"
-            "000002  2a 03 61 70 70           5 appId string = \"app\", 3 bytes\n"
-            "000007  32 08                    6 accessToken string = (not shown), 8 bytes\n");
-}
-
-TEST(AccessToken, WhenAskedFor_IsShown) {
-  ExplainOptions options;
-  options.show_token = true;
-  EXPECT_NE(explained("ChannelAuthRequest", auth_request(), options).find(kToken),
-            std::string::npos);
-}
-
-TEST(AccessToken, WhenExplainedAsAnotherMessage_IsNotShown) {
-  EXPECT_EQ(
-      explained("ClientEcho", auth_request()),
-      "000000  08 07                    1 requestId int64 = 7\n"
-      "000002  2a 03 61 70 70           5 ? length-delimited = \"app\", 3 bytes  ! unknown "
-      "field\n"
-      "000007  32 08                    6 ? length-delimited = (not shown), 8 bytes  ! unknown "
-      "field\n");
-}
-
-TEST(AccessToken, WhenItIsCut_IsNotShown) {
-  const std::string whole = auth_request();
-  const std::string text = explained("ChannelAuthRequest", whole.substr(0, whole.size() - 1));
-  EXPECT_NE(text.find("000007  32 08                    broken at offset 9"), std::string::npos)
-      << text;
-  EXPECT_EQ(text.find("61 2d"), std::string::npos) << text;
-}
-
-TEST(AccessToken, InText_IsReplaced) {
-  EXPECT_EQ(qel_wire::text_form(*parsed("ChannelAuthRequest", auth_request())),
-            "requestId: 7\nappId: \"app\"\naccessToken: \"(not shown)\"\n");
-}
-
-TEST(AccessToken, InJson_IsReplaced) {
-  EXPECT_EQ(qel_wire::json_form(*parsed("ChannelAuthRequest", Wire().text(6, kToken).bytes())),
-            "{\n  \"accessToken\": \"(not shown)\"\n}\n");
-}
-
-TEST(AccessToken, AsAnUnknownFieldInText_IsReplaced) {
-  EXPECT_EQ(qel_wire::text_form(*parsed("ClientEcho", auth_request())),
-            "requestId: 7\n5: \"app\"\n6: \"(not shown)\"\n");
-}
-
-TEST(AccessToken, WhenAskedForInTextAndJson_IsShown) {
-  qel_wire::FormOptions options;
-  options.show_token = true;
-  const auto message = parsed("ChannelAuthRequest", auth_request());
-  EXPECT_NE(qel_wire::text_form(*message, options).find(kToken), std::string::npos);
-  EXPECT_NE(qel_wire::json_form(*message, options).find(kToken), std::string::npos);
-}
-
-TEST(AccessToken, OfAFieldWithTheSameNumberThatIsKnown_IsNone) {
-  EXPECT_EQ(
-      qel_wire::text_form(*parsed("InboxEntry", Wire().text(6, "a text of number 6").bytes())),
-      "chatMsg: \"a text of number 6\"\n");
-}
-
-// The capture begins with the bytes of a frame, so that the request is within a field of something
-// else.
-TEST(AccessToken, OfARequestInAFrame_IsNotShown) {
-  const std::string framed = Wire().text(1, auth_request()).bytes();
-  const std::string framed_twice = Wire().text(9, framed).bytes();
-  const std::string in_a_group = Wire().group(9, Wire().text(6, kToken)).bytes();
-  const std::string in_a_record = Wire().message(13, Wire().text(6, kToken)).bytes();
-  for (const std::string& bytes : {framed, framed_twice, in_a_group, in_a_record}) {
-    for (const char* name : {"ChannelAuthRequest", "ChatReply", "ClientEcho"}) {
-      EXPECT_EQ(explained(name, bytes).find(kToken), std::string::npos) << name;
-      EXPECT_EQ(qel_wire::text_form(*parsed(name, bytes)).find(kToken), std::string::npos) << name;
-    }
-  }
-}
-
 // ---- Text, JSON, hex, base64
-
-const qel_wire::FormOptions kWhole{qel_wire::Colours(false), true};
 
 TEST(TextForm, OfEveryMessage_IsThePeers) {
   std::vector<support::PeerItem> items;
@@ -408,14 +348,14 @@ TEST(TextForm, OfEveryMessage_IsThePeers) {
   ASSERT_EQ(items.size(), 81U);
   const auto texts = support::peer_decode_all(support::library_schema(), items);
   for (size_t i = 0; i < items.size(); ++i) {
-    EXPECT_EQ(qel_wire::text_form(*parsed(items[i].message, items[i].content), kWhole), texts[i]);
+    EXPECT_EQ(qel_wire::text_form(*parsed(items[i].message, items[i].content)), texts[i]);
   }
 }
 
 TEST(TextForm, OfEveryMessage_IsTakenBack) {
   for (const std::string& name : message_names()) {
     const auto message = parsed(name, whole_message(name));
-    const std::string text = qel_wire::text_form(*message, kWhole);
+    const std::string text = qel_wire::text_form(*message);
     message->Clear();
     EXPECT_EQ(qel_wire::parse_text(text, message.get()).value_or(""), "");
     EXPECT_EQ(message->SerializeAsString(), whole_message(name)) << name;
@@ -451,16 +391,13 @@ TEST(TextForm, OfAnUnknownTextThatNestsDeep_IsNotMuchLonger) {
 }
 
 TEST(TextForm, WithColours_HasThemOfNamesAndValues) {
-  qel_wire::FormOptions options;
-  options.colours = qel_wire::Colours(true);
-  EXPECT_EQ(qel_wire::text_form(*parsed("ClientEcho", hex("08 07")), options),
+  EXPECT_EQ(qel_wire::text_form(*parsed("ClientEcho", hex("08 07")), qel_wire::Colours(true)),
             "\033[36mrequestId\033[0m: \033[32m7\033[0m\n");
 }
 
 TEST(JsonForm, WithColours_HasThemOfNames) {
-  qel_wire::FormOptions options;
-  options.colours = qel_wire::Colours(true);
-  EXPECT_EQ(qel_wire::json_form(*parsed("Result", Wire().text(2, "a\": b").bytes()), options),
+  EXPECT_EQ(qel_wire::json_form(*parsed("Result", Wire().text(2, "a\": b").bytes()),
+                                qel_wire::Colours(true)),
             "{\n  \033[36m\"msg\"\033[0m: \"a\\\": b\"\n}\n");
 }
 

@@ -86,6 +86,10 @@ case $1 in
     exits 0 decode ClientEcho --json --hex=08071001
     says 'qel-wire: without 1 unknown field, which JSON has no place for'
     ;;
+  two_messages_in_one)
+    exits 0 decode ClientEcho --hex=08070808
+    says "qel-wire: 1 field again or out of order, the first at offset 2: these may be two messages, of which the later one's values are kept ('qel-wire explain' marks them)"
+    ;;
   broken_bytes)
     exits 1 decode ClientEcho --hex=080750
     says "qel-wire: broken at offset 3: the input ends within the number of field 10 ('qel-wire explain' shows what comes before)"
@@ -137,11 +141,24 @@ case $1 in
       [ ! -s "$scratch/out" ] || fail "output: $call"
     done
     ;;
+  input_without_end)
+    for call in 'decode ClientEcho' 'explain ClientEcho' guess 'encode ClientEcho' 'decode ClientEcho --hex'; do
+      # shellcheck disable=SC2086
+      exits 1 $call /dev/zero
+      says 'qel-wire: the input has more than 64 MiB, which no call takes'
+    done
+    ;;
+  without_memory)
+    head -c 60000000 /dev/zero >"$scratch/zeros"
+    (ulimit -v 100000 && exits 3 decode ClientEcho "$scratch/zeros")
+    says 'qel-wire: there is not enough memory'
+    rm "$scratch/zeros"
+    ;;
   unreadable_input)
     exits 3 decode ClientEcho "$scratch/nothing"
     says "qel-wire: cannot read $scratch/nothing: No such file or directory"
     exits 3 decode ClientEcho --hex 0807
-    says "qel-wire: there is no file '0807'; bytes in the call itself are written --hex=BYTES, --base64=BYTES"
+    says 'qel-wire: there is no such file; bytes in the call itself are written --hex=BYTES, --base64=BYTES'
     exits 3 decode ClientEcho "$scratch"
     says "qel-wire: cannot read $scratch: Is a directory"
     ;;
@@ -176,7 +193,7 @@ case $1 in
   access_token_is_shown_if_asked_for)
     bytes=3208612d736563726574
     for command in 'decode ChannelAuthRequest' 'decode ChannelAuthRequest --json' \
-      'explain ChannelAuthRequest' 'explain ClientEcho' 'decode ClientEcho' guess; do
+      'explain ChannelAuthRequest' guess; do
       # shellcheck disable=SC2086
       exits 0 $command --hex=$bytes
       ! grep -Eq 'a-secret|61 2d 73' "$scratch/out" "$scratch/err" || fail "$command"
@@ -185,6 +202,13 @@ case $1 in
       exits 0 $command --show-token --hex=$bytes
       grep -q a-secret "$scratch/out" || fail "$command --show-token"
     done
+    ;;
+  access_token_that_is_hidden_is_not_encoded)
+    exits 0 decode ChannelAuthRequest --hex=3208612d736563726574
+    mv "$scratch/out" "$scratch/text"
+    exits 1 encode ChannelAuthRequest "$scratch/text"
+    says 'qel-wire: the text has (not shown) for what was hidden: decode the bytes with --show-token'
+    [ ! -s "$scratch/out" ] || fail 'encoded all the same'
     ;;
   page_shows_what_happens)
     # The sessions of the page, one after the other.

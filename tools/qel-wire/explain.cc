@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <cstdio>
 #include <string>
+#include <utility>
 
 #include "token.h"
 #include "walk.h"
@@ -77,29 +78,43 @@ std::string type_name(const FieldDescriptor& field) {
 
 class Explanation : public Visitor {
  public:
-  Explanation(std::string_view bytes, const ExplainOptions& options, std::ostream* out)
-      : bytes_(bytes), options_(options), colours_(options.colours), out_(*out) {}
+  Explanation(std::string_view bytes, const Hidden& hidden, const ExplainOptions& options,
+              std::ostream* out)
+      : bytes_(bytes), hidden_(hidden), options_(options), colours_(options.colours), out_(*out) {}
 
   void begin(const Piece& piece) override {
-    const bool is_hidden = !options_.show_token && piece.kind == Piece::kBytes &&
-                           (piece.is_known ? is_access_token(*piece.field)
-                                           : may_hold_access_token(piece.number, piece.bytes));
-    const size_t end = piece.is_container() || is_hidden ? piece.value_offset : piece.end;
+    const bool is_text = piece.kind == Piece::kBytes;
+    const bool is_hidden_text = is_text && hidden_.any(piece.value_offset, piece.end);
+    const size_t end = piece.is_container() || is_hidden_text ? piece.value_offset : piece.end;
+    if (!is_text && hidden_.any(piece.offset, end)) {
+      leave_out(piece.offset, end, piece.depth);
+      return;
+    }
     row(piece.offset, end, piece.depth,
-        name_of(piece) + type_of(piece) + (is_hidden ? hidden(piece) : value_of(piece)) +
-            doubts_of(piece));
+        name_of(piece) + type_of(piece) +
+            (is_hidden_text ? not_shown(piece.bytes.size()) : value_of(piece)) + doubts_of(piece));
   }
 
   void end(const Piece& piece) override {
-    if (piece.kind == Piece::kGroup) {  // alone it has bytes there
+    if (piece.kind != Piece::kGroup) {
+      return;
+    }
+    // Alone it has bytes there.
+    if (hidden_.any(piece.end_tag, piece.end)) {
+      leave_out(piece.end_tag, piece.end, piece.depth);
+    } else {
       row(piece.end_tag, piece.end, piece.depth, std::to_string(piece.number) + " end of group");
     }
   }
 
-  void problem(const Problem& problem) {
-    row(problem.begin, problem.end, problem.depth,
-        colours_.wrong + "broken at offset " + std::to_string(problem.offset) + ": " +
-            problem.reason + colours_.end);
+  // What is left to be written, behind all pieces.
+  void finish(const std::optional<Problem>& problem) {
+    write_left_out();
+    if (problem.has_value()) {
+      row(problem->begin, problem->end, problem->depth,
+          colours_.wrong + "broken at offset " + std::to_string(problem->offset) + ": " +
+              problem->reason + colours_.end);
+    }
   }
 
  private:
@@ -120,8 +135,8 @@ class Explanation : public Visitor {
            std::string(is_packed ? ", packed" : "");
   }
 
-  static std::string hidden(const Piece& piece) {
-    return " = " + std::string(kNotShown) + ", " + counted(piece.bytes.size(), "byte");
+  static std::string not_shown(size_t size) {
+    return " = " + std::string(kNotShown) + ", " + counted(size, "byte");
   }
 
   std::string coloured(const std::string& value) const {
@@ -164,21 +179,54 @@ class Explanation : public Visitor {
   }
 
   std::string doubts_of(const Piece& piece) const {
+    const std::string value = doubt_about_value(piece);
+    const std::string place = doubt_about_place(piece);
+    return doubt(value + (value.empty() || place.empty() ? "" : "; ") + place);
+  }
+
+  static std::string doubt_about_value(const Piece& piece) {
     if (piece.field == nullptr) {
-      return doubt("unknown field");
+      return "unknown field";
     }
     if (!piece.is_known) {
-      return doubt("unknown field: " + piece.field->name() + " is " + type_name(*piece.field));
+      return "unknown field: " + piece.field->name() + " is " + type_name(*piece.field);
     }
-    if (piece.is_doubtful()) {
-      return doubt(doubt_about(piece));
+    if (piece.is_short()) {
+      return "its length is " + std::to_string(piece.length) + ", more than there is";
     }
-    const bool is_short = piece.is_container() && piece.length > piece.end - piece.value_offset;
-    return doubt(is_short ? "its length is " + std::to_string(piece.length) + ", more than there is"
-                          : "");
+    return piece.is_doubtful() ? doubt_about(piece) : "";
+  }
+
+  static std::string doubt_about_place(const Piece& piece) {
+    if (piece.earlier.has_value()) {
+      return (piece.kind == Piece::kMessage ? "again, merged with that at offset "
+                                            : "again, replaces that at offset ") +
+             std::to_string(*piece.earlier);
+    }
+    return piece.is_late ? "behind a field with a higher number" : "";
+  }
+
+  // Pieces that are not shown have one row for those that follow each other.
+  void leave_out(size_t offset, size_t end, int depth) {
+    if (left_out_.begin == left_out_.end) {
+      left_out_ = {offset, offset, depth};
+    }
+    left_out_.end = end;
+  }
+
+  void write_left_out() {
+    const LeftOut range = std::exchange(left_out_, {});
+    if (range.begin != range.end) {
+      write_row(range.begin, range.begin, range.depth, "?" + not_shown(range.end - range.begin));
+    }
   }
 
   void row(size_t offset, size_t end, int depth, const std::string& meaning) {
+    write_left_out();
+    write_row(offset, end, depth, meaning);
+  }
+
+  void write_row(size_t offset, size_t end, int depth, const std::string& meaning) {
     const size_t size = end - offset;
     const size_t shown = options_.show_all ? size : std::min(size, kMostShown);
     size_t at = 0;
@@ -186,7 +234,9 @@ class Explanation : public Visitor {
       const size_t in_row = std::min(shown - at, kBytesInRow);
       out_ << colours_.quiet << printed("%06llx", offset + at) << colours_.end << ' ';
       for (size_t i = 0; i < in_row; ++i) {
-        out_ << printed(" %02llx", static_cast<unsigned char>(bytes_[offset + at + i]));
+        const size_t byte = offset + at + i;
+        out_ << (hidden_.at(byte) ? " **"
+                                  : printed(" %02llx", static_cast<unsigned char>(bytes_[byte])));
       }
       if (at == 0) {
         out_ << std::string(3 * (kBytesInRow - in_row) + 2 + 2 * static_cast<size_t>(depth), ' ')
@@ -200,21 +250,28 @@ class Explanation : public Visitor {
     }
   }
 
+  struct LeftOut {
+    size_t begin = 0;
+    size_t end = 0;
+    int depth = 0;
+  };
+
   std::string_view bytes_;
+  const Hidden& hidden_;
   const ExplainOptions& options_;
   const Colours& colours_;
   std::ostream& out_;
+  LeftOut left_out_;
 };
 
 }  // namespace
 
 bool explain(std::string_view bytes, const google::protobuf::Descriptor& type,
              const ExplainOptions& options, std::ostream* out) {
-  Explanation explanation(bytes, options, out);
+  const Hidden hidden = options.show_token ? Hidden() : Hidden(bytes, type);
+  Explanation explanation(bytes, hidden, options, out);
   const std::optional<Problem> problem = walk(bytes, type, &explanation);
-  if (problem.has_value()) {
-    explanation.problem(*problem);
-  }
+  explanation.finish(problem);
   return !problem.has_value();
 }
 

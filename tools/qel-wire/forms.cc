@@ -100,7 +100,7 @@ void for_each_value(const Message& message, Take take) {
 
 class TextWriter {
  public:
-  explicit TextWriter(const FormOptions& options) : options_(options) {}
+  explicit TextWriter(const Colours& colours) : colours_(colours) {}
 
   void write(const Message& message) {
     for_each_value(message, [&](const FieldDescriptor& field, int index) {
@@ -121,8 +121,7 @@ class TextWriter {
     } else if constexpr (std::is_same_v<Value, EnumValueDescriptor>) {
       line(field.name(), value.name());
     } else if constexpr (std::is_same_v<Value, std::string>) {
-      const bool is_hidden = !options_.show_token && is_access_token(field);
-      line(field.name(), in_quotes(is_hidden ? kNotShown : value));
+      line(field.name(), in_quotes(value));
     } else if constexpr (std::is_same_v<Value, bool>) {
       line(field.name(), value ? "true" : "false");
     } else {
@@ -149,13 +148,9 @@ class TextWriter {
           write_unknown(field.group());
           close();
           break;
-        default: {
+        default:
           // Not taken apart: a text that is no message looks like one often enough.
-          const std::string& text = field.length_delimited();
-          const bool is_hidden = !options_.show_token &&
-                                 may_hold_access_token(static_cast<uint32_t>(field.number()), text);
-          line(name, in_quotes(is_hidden ? kNotShown : text));
-        }
+          line(name, in_quotes(field.length_delimited()));
       }
     }
   }
@@ -167,14 +162,14 @@ class TextWriter {
   }
 
   void begin_line(const std::string& name) {
-    text_.append(2 * depth_, ' ').append(options_.colours.name).append(name);
-    text_ += options_.colours.end;
+    text_.append(2 * depth_, ' ').append(colours_.name).append(name);
+    text_ += colours_.end;
   }
 
   void line(const std::string& name, const std::string& value) {
     begin_line(name);
-    text_.append(": ").append(options_.colours.value).append(value);
-    text_.append(options_.colours.end).append("\n");
+    text_.append(": ").append(colours_.value).append(value);
+    text_.append(colours_.end).append("\n");
   }
 
   void open(const std::string& name) {
@@ -188,27 +183,24 @@ class TextWriter {
     text_.append(2 * depth_, ' ').append("}\n");
   }
 
-  const FormOptions& options_;
+  const Colours& colours_;
   size_t depth_ = 0;
   std::string text_;
 };
 
 // ---- JSON
 
-Json json_object(const Message& message, bool show_token);
+Json json_object(const Message& message);
 
 template <typename Value>
-Json json_value(const FieldDescriptor& field, const Value& value, bool show_token) {
+Json json_value(const FieldDescriptor& field, const Value& value) {
   if constexpr (std::is_same_v<Value, Message>) {
-    return json_object(value, show_token);
+    return json_object(value);
   } else if constexpr (std::is_same_v<Value, EnumValueDescriptor>) {
     return value.name();
   } else if constexpr (std::is_same_v<Value, std::string>) {
-    if (!show_token && is_access_token(field)) {
-      return kNotShown;
-    }
-    return field.type() == FieldDescriptor::TYPE_BYTES ? to_notation(value, Notation::kBase64)
-                                                       : value;
+    const bool is_encoded = field.type() == FieldDescriptor::TYPE_BYTES && value != kNotShown;
+    return is_encoded ? to_notation(value, Notation::kBase64) : value;
   } else if constexpr (std::is_same_v<Value, google::protobuf::int64>) {
     return std::to_string(value);
   } else {
@@ -216,15 +208,15 @@ Json json_value(const FieldDescriptor& field, const Value& value, bool show_toke
   }
 }
 
-Json json_object(const Message& message, bool show_token) {
+Json json_object(const Message& message) {
   Json object = Json::object();
   for_each_value(message, [&](const FieldDescriptor& field, int index) {
     take_value(message, field, index, [&](const auto& value) {
       Json& place = object[field.name()];
       if (index >= 0) {
-        place.push_back(json_value(field, value, show_token));
+        place.push_back(json_value(field, value));
       } else {
-        place = json_value(field, value, show_token);
+        place = json_value(field, value);
       }
     });
   });
@@ -301,18 +293,17 @@ std::optional<std::string> from_base64(std::string_view text) {
 
 }  // namespace
 
-std::string text_form(const Message& message, const FormOptions& options) {
-  TextWriter writer(options);
+std::string text_form(const Message& message, const Colours& colours) {
+  TextWriter writer(colours);
   writer.write(message);
   return std::move(writer).text();
 }
 
-std::string json_form(const Message& message, const FormOptions& options) {
+std::string json_form(const Message& message, const Colours& colours) {
   // Characters outside ASCII are escaped, as most printers of JSON do; what is no UTF-8 is
   // replaced.
-  const std::string json =
-      json_object(message, options.show_token).dump(2, ' ', true, Json::error_handler_t::replace);
-  return with_coloured_names(json, options.colours, find_key);
+  const std::string json = json_object(message).dump(2, ' ', true, Json::error_handler_t::replace);
+  return with_coloured_names(json, colours, find_key);
 }
 
 int unknown_fields(const Message& message) {
@@ -327,6 +318,21 @@ int unknown_fields(const Message& message) {
     }
   });
   return count;
+}
+
+bool lacks_hidden_text(const Message& message) {
+  bool found = false;
+  for_each_value(message, [&](const FieldDescriptor& field, int index) {
+    take_value(message, field, index, [&](const auto& value) {
+      using Value = std::decay_t<decltype(value)>;
+      if constexpr (std::is_same_v<Value, Message>) {
+        found = found || lacks_hidden_text(value);
+      } else if constexpr (std::is_same_v<Value, std::string>) {
+        found = found || value == kNotShown;
+      }
+    });
+  });
+  return found;
 }
 
 std::optional<std::string> parse_text(const std::string& text, Message* message) {

@@ -11,56 +11,37 @@ namespace qel_wire {
 namespace {
 
 using google::protobuf::Descriptor;
-using google::protobuf::FieldDescriptor;
 using google::protobuf::FileDescriptor;
 
 class Fitting : public Visitor {
  public:
-  explicit Fitting(Fit* fit) : fit_(*fit) { levels_.emplace_back(); }
+  explicit Fitting(Fit* fit) : fit_(*fit) {}
 
   void begin(const Piece& piece) override {
     if (!piece.is_known) {
       ++fit_.unknown;
     } else if (!piece.is_element()) {
       ++fit_.known;
-      check_order(*piece.field);
+      if (piece.depth == 0) {
+        different_.set(static_cast<size_t>(piece.field->index()));
+      }
     }
     // Packed lists are taken and never written.
     if (piece.kind == Piece::kPacked || piece.is_doubtful()) {
       ++fit_.doubtful;
     }
-    if (piece.is_container()) {
-      levels_.emplace_back();
-    }
-  }
-
-  void end(const Piece& /*piece*/) override { levels_.pop_back(); }
-
-  // Of the message itself: how many of its fields it had.
-  size_t different_fields() const { return std::bitset<64>(levels_.front().seen).count(); }
-
- private:
-  // The fields that a message had so far. No message of the schema has 64.
-  struct Level {
-    uint64_t seen = 0;  // a bit each, by its index
-    int highest = 0;    // number
-  };
-
-  // Encoders write fields in the order of their numbers.
-  void check_order(const FieldDescriptor& field) {
-    Level& level = levels_.back();
-    const uint64_t bit = uint64_t{1} << static_cast<unsigned>(field.index());
-    const bool is_again = (level.seen & bit) != 0 && !field.is_repeated();
-    const bool is_late = field.number() < level.highest;
-    if (is_again || is_late) {
+    // Encoders write fields in the order of their numbers.
+    if (piece.earlier.has_value() || piece.is_late) {
       ++fit_.doubtful;
     }
-    level.seen |= bit;
-    level.highest = std::max(level.highest, field.number());
   }
 
+  // Of the message itself: how many of its fields it had.
+  size_t different_fields() const { return different_.count(); }
+
+ private:
   Fit& fit_;
-  std::vector<Level> levels_;  // of nesting
+  std::bitset<64> different_;  // by their indices; no message of the schema has more fields
 };
 
 Fit fit(std::string_view bytes, const Descriptor& type) {

@@ -15,15 +15,16 @@
 #include <memory>
 #include <new>
 #include <optional>
-#include <stdexcept>
 #include <string>
 #include <vector>
 
+#include "decode.h"
 #include "explain.h"
 #include "forms.h"
 #include "guess.h"
 #include "schema.h"
 #include "text.h"
+#include "token.h"
 #include "walk.h"
 
 namespace {
@@ -146,12 +147,16 @@ std::string read_file(const std::string& name) {
   std::string content;
   char block[65536];
   size_t size = 0;
-  while (file != nullptr && (size = std::fread(block, 1, sizeof block, file.get())) > 0) {
+  while (file != nullptr && content.size() <= qel_wire::kMostBytes &&
+         (size = std::fread(block, 1, sizeof block, file.get())) > 0) {
     content.append(block, size);
   }
   if (file == nullptr || std::ferror(file.get()) != 0) {
     throw Failure{kNoAccess, "cannot read " + (is_standard_input ? "standard input" : name) + ": " +
                                  std::strerror(errno)};
+  }
+  if (content.size() > qel_wire::kMostBytes) {
+    throw Failure{kBroken, "the input has more than 64 MiB, which no call takes"};
   }
   return content;
 }
@@ -165,9 +170,10 @@ std::string read_bytes(const Call& call, size_t needed) {
   const bool is_given = call.written.has_value();
   if (!is_given && call.notation != Notation::kRaw && call.arguments.size() > needed &&
       call.arguments[needed] != "-" && access(call.arguments[needed].c_str(), F_OK) != 0) {
+    // The bytes, if that is what they are, may hold a token.
     throw Failure{kNoAccess,
-                  "there is no file '" + call.arguments[needed] +
-                      "'; bytes in the call itself are written --hex=BYTES, --base64=BYTES"};
+                  "there is no such file; bytes in the call itself are written --hex=BYTES, "
+                  "--base64=BYTES"};
   }
   const std::string source = is_given ? *call.written : read_source(call, needed);
   const std::optional<std::string> bytes = qel_wire::from_notation(source, call.notation);
@@ -187,10 +193,6 @@ const Descriptor& message_of(const Call& call) {
   return *type;
 }
 
-std::unique_ptr<Message> new_message(const Descriptor& type) {
-  return std::unique_ptr<Message>(MessageFactory::generated_factory()->GetPrototype(&type)->New());
-}
-
 bool is_coloured(const Call& call) {
   if (call.colour != "auto") {
     return call.colour == "always";
@@ -201,37 +203,34 @@ bool is_coloured(const Call& call) {
 
 int decode(const Call& call) {
   const Descriptor& type = message_of(call);
-  const std::string bytes = read_bytes(call, 1);
-  qel_wire::Visitor nobody;
-  if (const auto problem = qel_wire::walk(bytes, type, &nobody)) {
+  qel_wire::DecodeOptions options;
+  options.colours = qel_wire::Colours(is_coloured(call));
+  options.as_json = call.has(kJson);
+  options.show_token = call.has(kShowToken);
+  const qel_wire::Decoded decoded = qel_wire::decode(read_bytes(call, 1), type, options);
+  if (const auto& problem = decoded.problem) {
     throw Failure{kBroken, "broken at offset " + std::to_string(problem->offset) + ": " +
                                problem->reason + " ('qel-wire explain' shows what comes before)"};
   }
-  const auto message = new_message(type);
-  if (!message->ParseFromString(bytes)) {
-    throw std::logic_error("the message's class does not take what was read");
-  }
-  const qel_wire::FormOptions options{qel_wire::Colours(is_coloured(call)), call.has(kShowToken)};
-  if (!call.has(kJson)) {
-    std::cout << qel_wire::text_form(*message, options);
-    return kDone;
-  }
-  std::cout << qel_wire::json_form(*message, options);
-  if (const int unknown = qel_wire::unknown_fields(*message)) {
-    std::cerr << "qel-wire: without "
-              << qel_wire::counted(static_cast<size_t>(unknown), "unknown field")
-              << ", which JSON has no place for\n";
+  std::cout << decoded.text;
+  for (const std::string& note : decoded.notes) {
+    std::cerr << "qel-wire: " << note << '\n';
   }
   return kDone;
 }
 
 int encode(const Call& call) {
-  const auto message = new_message(message_of(call));
+  const std::unique_ptr<Message> message(
+      MessageFactory::generated_factory()->GetPrototype(&message_of(call))->New());
   if (call.written.has_value()) {
     throw Failure{kWrongCall, "encode takes a text: --hex and --base64 have no bytes there"};
   }
   if (const auto complaint = qel_wire::parse_text(read_source(call, 1), message.get())) {
     throw Failure{kBroken, "the text is no " + call.arguments[0] + ": " + *complaint};
+  }
+  if (qel_wire::lacks_hidden_text(*message)) {
+    throw Failure{kBroken, "the text has " + std::string(qel_wire::kNotShown) +
+                               " for what was hidden: decode the bytes with --show-token"};
   }
   std::cout << qel_wire::to_notation(message->SerializeAsString(), call.notation);
   if (call.notation != Notation::kRaw) {

@@ -102,6 +102,11 @@ std::string in_quotes(std::string_view text) {
   return result + '"';
 }
 
+size_t size_of_character(std::string_view text) {
+  const Character character = text.empty() ? Character() : first_character(text);
+  return is_obeyed(character.code) ? 0 : character.size;
+}
+
 bool is_utf8(std::string_view text) {
   while (!text.empty()) {
     const size_t size = first_character(text).size;

@@ -9,15 +9,15 @@
 
 namespace qel_wire {
 
-// In place of the access token.
-constexpr char kNotShown[] = "(not shown)";
-
 // With octal escapes for what is no UTF-8, and for characters that a terminal would obey instead of
 // showing them.
 std::string readable(std::string_view text);
 
 // The same in quotes, as the text form has it.
 std::string in_quotes(std::string_view text);
+
+// The bytes of the text's first character, or 0 if that is none or one that a terminal would obey.
+size_t size_of_character(std::string_view text);
 
 // Whether all of it is UTF-8.
 bool is_utf8(std::string_view text);

@@ -4,17 +4,44 @@
 
 #include <google/protobuf/descriptor.h>
 
-#include <cstdint>
+#include <cstddef>
+#include <string>
 #include <string_view>
+#include <vector>
 
 namespace qel_wire {
 
-bool is_access_token(const google::protobuf::FieldDescriptor& field);
+// In place of what is hidden.
+constexpr char kNotShown[] = "(not shown)";
 
-// Whether a text that no field is known for may be one or hold one, because the bytes are read as
-// another message or begin elsewhere: it has the token's number, or is a ChannelAuthRequest with a
-// token, or has a field in which one is.
-bool may_hold_access_token(uint32_t number, std::string_view text);
+// Which bytes of the input are not shown, because they may be the access token's.
+//
+// A capture may be read as another message than it is, begin or end anywhere, or be damaged, so a
+// field's name says little. If the bytes are read whole and as an encoder writes them, they are
+// what they seem to be, and their texts are shown but for a few. If not, whatever may be a piece of
+// a text is hidden, wherever it is: a token is text.
+class Hidden {
+ public:
+  Hidden() = default;  // nothing
+  Hidden(std::string_view bytes, const google::protobuf::Descriptor& type);
+
+  bool at(size_t offset) const { return !hidden_.empty() && hidden_[offset]; }
+  // Whether one of them is.
+  bool any(size_t begin, size_t end) const;
+
+ private:
+  std::vector<bool> hidden_;  // for each byte, or empty if none is
+};
+
+// A message without what is hidden.
+struct Censored {
+  std::string bytes;    // texts that are hidden are kNotShown there
+  size_t left_out = 0;  // other fields that are hidden
+};
+
+// Of bytes that are read whole.
+Censored censored(std::string_view bytes, const google::protobuf::Descriptor& type,
+                  const Hidden& hidden);
 
 }  // namespace qel_wire
 

@@ -3,6 +3,7 @@
 #include <google/protobuf/wire_format_lite.h>
 
 #include <algorithm>
+#include <array>
 
 #include "text.h"
 
@@ -16,12 +17,35 @@ using google::protobuf::internal::WireFormatLite;
 constexpr size_t kLongestVarint = 10;
 constexpr int kDeepest = 100;
 
+// The known fields that a message had so far.
+class Seen {
+ public:
+  void add(Piece* piece) {
+    // No message of the schema has more fields than there are bits.
+    const auto index = static_cast<size_t>(piece->field->index());
+    const uint64_t bit = uint64_t{1} << index;
+    if ((fields_ & bit) != 0 && !piece->field->is_repeated()) {
+      piece->earlier = offsets_.at(index);
+    }
+    piece->is_late = piece->field->number() < highest_;
+    fields_ |= bit;
+    offsets_.at(index) = piece->offset;
+    highest_ = std::max(highest_, piece->field->number());
+  }
+
+ private:
+  uint64_t fields_ = 0;             // a bit each, by its index
+  std::array<size_t, 64> offsets_;  // where it was last, if its bit is set
+  int highest_ = 0;                 // number
+};
+
 class Walk {
  public:
   Walk(std::string_view bytes, Visitor* visitor) : bytes_(bytes), visitor_(visitor) {}
 
-  // Reads the fields of a message, or those that nobody knows (type is null), up to the end.
-  bool fields(const Descriptor* type, size_t end, int depth) {
+  // Reads the fields of a message up to the end.
+  bool fields(const Descriptor& type, size_t end, int depth) {
+    Seen seen;
     while (at_ < end) {
       Piece piece;
       piece.offset = at_;
@@ -30,7 +54,7 @@ class Walk {
       if (!tag.has_value()) {
         return false;
       }
-      if (!field(piece, static_cast<uint32_t>(*tag), type, end)) {
+      if (!field(piece, static_cast<uint32_t>(*tag), &type, &seen, end)) {
         return false;
       }
     }
@@ -75,8 +99,9 @@ class Walk {
     return std::nullopt;
   }
 
-  // The rest of a field, behind its tag.
-  bool field(Piece piece, uint32_t tag, const Descriptor* type, size_t end) {
+  // The rest of a field, behind its tag. In a group, whose fields nobody knows, type and seen are
+  // null.
+  bool field(Piece piece, uint32_t tag, const Descriptor* type, Seen* seen, size_t end) {
     const auto number = static_cast<uint32_t>(WireFormatLite::GetTagFieldNumber(tag));
     const auto wire_type = WireFormatLite::GetTagWireType(tag);
     piece.number = number;
@@ -89,6 +114,9 @@ class Walk {
       const bool is_packed =
           piece.field->is_packable() && wire_type == WireFormatLite::WIRETYPE_LENGTH_DELIMITED;
       piece.is_known = is_packed || wire_type == wire_type_of(*piece.field);
+      if (piece.is_known) {
+        seen->add(&piece);
+      }
       if (is_packed) {
         return packed(piece, end);
       }
@@ -199,7 +227,7 @@ class Walk {
       return false;
     }
     visitor_->begin(piece);
-    if (!fields(piece.field->message_type(), *own_end, piece.depth + 1)) {
+    if (!fields(*piece.field->message_type(), *own_end, piece.depth + 1)) {
       return false;
     }
     visitor_->end(piece);
@@ -246,7 +274,7 @@ class Walk {
       }
       const auto number = static_cast<uint32_t>(*tag);
       if (WireFormatLite::GetTagWireType(number) != WireFormatLite::WIRETYPE_END_GROUP) {
-        if (!field(inner, number, nullptr, end)) {
+        if (!field(inner, number, nullptr, nullptr, end)) {
           return false;
         }
       } else if (static_cast<uint32_t>(WireFormatLite::GetTagFieldNumber(number)) == piece.number) {
@@ -294,7 +322,7 @@ std::optional<Problem> walk(std::string_view bytes, const Descriptor& type, Visi
     return Problem{kMostBytes, kMostBytes, kMostBytes, 0, "more than 64 MiB, which no call takes"};
   }
   Walk walk(bytes, visitor);
-  walk.fields(&type, bytes.size(), 0);
+  walk.fields(type, bytes.size(), 0);
   return walk.problem();
 }
 

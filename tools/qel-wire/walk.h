@@ -28,6 +28,11 @@ struct Piece {
   // Whether the wire type is the field's. Where it is not, or there is no such field, the runtime
   // keeps the piece as an unknown field.
   bool is_known = false;
+  // Of a known field that is not repeated and was there before: the offset where. The runtime keeps
+  // the later value; embedded messages are merged.
+  std::optional<size_t> earlier;
+  // Whether a known field with a higher number came before it, which no encoder writes.
+  bool is_late = false;
 
   // Tag and length, then the value. The elements of a packed field have no tag.
   size_t offset = 0;
@@ -43,6 +48,8 @@ struct Piece {
 
   // Whether other pieces lie in it.
   bool is_container() const { return kind == kMessage || kind == kGroup || kind == kPacked; }
+  // Whether it ends before its length says so.
+  bool is_short() const { return is_container() && length > end - value_offset; }
   // Of a packed list: it has no tag.
   bool is_element() const { return offset == value_offset; }
   // Of a number: what the runtime keeps for an int32 or an enumeration.
