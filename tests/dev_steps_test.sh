@@ -92,11 +92,11 @@ cmake --build --preset release --target plugin_session front_end
 run_demo.sh build/release/examples
 TXT
     ;;
-  demo_without_log)
-    starts demo --no-log <<TXT
+  demo_with_log)
+    starts demo --log <<TXT
 cmake --preset release
 cmake --build --preset release --target plugin_session front_end
-run_demo.sh build/release/examples --no-log
+run_demo.sh build/release/examples --log
 TXT
     ;;
   test)
