@@ -114,7 +114,7 @@ int main(int argc, char** argv) {
 
   try {
     const int listener = listen_on(port);
-    std::printf("front end: listening on 127.0.0.1:%d\n", port_of(listener));
+    std::printf("service: its front end listens on 127.0.0.1:%d\n", port_of(listener));
     if (!port_file.empty()) {
       write_port_file(port_file, port_of(listener));
     }

@@ -1,14 +1,14 @@
 #!/usr/bin/env bash
 # Lets the example's plug-in talk to its front end. Exits with 0 only if both ends are content.
 #
-#   run_demo.sh FOLDER [--no-log] [--port PORT] [--access-token TEXT] [--emulator COMMAND]
+#   run_demo.sh FOLDER [--log] [--port PORT] [--access-token TEXT] [--emulator COMMAND]
 #
-# FOLDER holds the two programs. --no-log silences the library's log lines. COMMAND, an emulator, runs
+# FOLDER holds the two programs. --log shows the library's log lines too. COMMAND, an emulator, runs
 # the programs.
 set -u
 
 usage() {
-  echo 'usage: run_demo.sh FOLDER [--no-log] [--port PORT] [--access-token TEXT] [--emulator COMMAND]' >&2
+  echo 'usage: run_demo.sh FOLDER [--log] [--port PORT] [--access-token TEXT] [--emulator COMMAND]' >&2
   exit 2
 }
 
@@ -18,15 +18,17 @@ shift
 emulator=()
 front_end_options=()
 plugin_options=()
+log=
 while [ $# -gt 0 ]; do
   case $1 in
-    --no-log) export DLOG_STANDIN_PRIORITY=S && shift ;;
+    --log) log=shown && shift ;;
     --port) front_end_options+=("$1" "${2?--port takes a number}") && shift 2 ;;
     --access-token) plugin_options+=("$1" "${2?--access-token takes a text}") && shift 2 ;;
     --emulator) emulator=("${2?--emulator takes a command}") && shift 2 ;;
     *) usage ;;
   esac
 done
+[ -n "$log" ] || export DLOG_STANDIN_PRIORITY=S
 
 scratch=$(mktemp -d) || exit 1
 front_end=

@@ -6,6 +6,8 @@
 
 #include <cstdio>
 #include <cstdlib>
+#include <sstream>
+#include <vector>
 
 #include "framing.h"
 
@@ -29,12 +31,29 @@ constexpr int64_t kStart = 1700000000000;  // of what happened before the sessio
 
 enum ResultCode { kOk = 0, kSomeRefused = 1001, kBadToken = 2001, kSomeNotInvited = 3003 };
 
-// What a session of this example consists of, but for the authentication.
-constexpr const char* kRequests[] = {
-    "CurrentTimeRequest", "CreateChatroomRequest",      "AllowChatRequest",     "ChatRequest",
-    "ReadMessageRequest", "GetAllUnreadMessageRequest", "UnsealMessageRequest", "IsTyping",
-    "SaveCallLogRequest", "ChangeChatroomMetaRequest",  "InviteRequest",        "EndChatRequest",
+// What a session of this example consists of, and what the plug-in does with it.
+constexpr struct {
+  const char* name;
+  const char* title;
+} kRequests[] = {
+    {"ChannelAuthRequest", "The plug-in signs in"},
+    {"CurrentTimeRequest",
+     "The plug-in asks for the time; the service first asks whether it is alive"},
+    {"CreateChatroomRequest", "The plug-in creates a chatroom; some of the users are refused"},
+    {"AllowChatRequest", "The plug-in enters the chatroom"},
+    {"ChatRequest", "The plug-in sends a message; another member writes before it is confirmed"},
+    {"ReadMessageRequest", "The plug-in tells which message the user has read"},
+    {"GetAllUnreadMessageRequest",
+     "The plug-in fetches what was stored meanwhile, two messages at a time"},
+    {"UnsealMessageRequest", "The plug-in opens a sealed message"},
+    {"IsTyping", "The plug-in tells that the user types; another member types too"},
+    {"SaveCallLogRequest", "The plug-in reports a call"},
+    {"ChangeChatroomMetaRequest", "The plug-in changes the chatroom"},
+    {"InviteRequest", "The plug-in invites more users; most of them are refused"},
+    {"EndChatRequest", "The plug-in leaves two chats"},
 };
+
+constexpr size_t kColumns = 80;  // of a terminal
 
 int64_t now_millis() {
   timeval now;
@@ -42,7 +61,43 @@ int64_t now_millis() {
   return int64_t{now.tv_sec} * 1000 + now.tv_usec / 1000;
 }
 
-// The message's fields, one a line; the access token is a credential and is not shown.
+bool is_plain_field(const std::string& line) {
+  return line.back() != '{' && line.back() != '}';
+}
+
+// Puts fields that stand one a line side by side, as far as a terminal is wide.
+std::string side_by_side(const std::string& fields) {
+  std::vector<std::string> lines;
+  std::istringstream input(fields);
+  for (std::string line; std::getline(input, line);) {
+    const size_t depth = line.find_first_not_of(' ');
+    if (!lines.empty() && is_plain_field(lines.back())) {
+      std::string& last = lines.back();
+      const size_t last_depth = last.find_first_not_of(' ');
+      if (last_depth == depth && is_plain_field(line) &&
+          last.size() + 2 + line.size() - depth <= kColumns) {
+        last += ", " + line.substr(depth);
+        continue;
+      }
+      if (last_depth > depth && lines.end()[-2].back() == '{') {  // line is "}"
+        const std::string whole = lines.end()[-2] + " " + last.substr(last_depth) + " }";
+        if (whole.size() <= kColumns) {
+          lines.pop_back();
+          lines.back() = whole;
+          continue;
+        }
+      }
+    }
+    lines.push_back(line);
+  }
+  std::string text;
+  for (const std::string& line : lines) {
+    text += line + "\n";
+  }
+  return text;
+}
+
+// The message's fields; the access token is a credential and is not shown.
 std::string text_form(const Message& message) {
   std::unique_ptr<Message> shown(message.New());
   shown->CopyFrom(message);
@@ -56,12 +111,19 @@ std::string text_form(const Message& message) {
   printer.SetInitialIndentLevel(2);
   std::string text;
   printer.PrintToString(*shown, &text);
-  return text;
+  return side_by_side(text);
 }
 
 void print_message(const char* direction, const Message& message, int size) {
-  std::printf("%s  %s, %d bytes\n%s", direction, message.GetTypeName().c_str(), size,
-              text_form(message).c_str());
+  std::ostringstream text;  // whole, as the plug-in prints too
+  for (const auto& request : kRequests) {
+    if (message.GetTypeName() == request.name) {
+      text << "\n== " << request.title << "\n";
+    }
+  }
+  text << direction << "  " << message.GetTypeName() << ", " << size << " bytes\n"
+       << text_form(message);
+  std::fputs(text.str().c_str(), stdout);
 }
 
 void require_chatroom(bool has_chatroom, int64_t chatroom, const std::string& request) {
@@ -123,11 +185,11 @@ void Service::run() {
   while (const std::unique_ptr<Message> request = receive()) {
     answer(*request);
   }
-  require(authenticated_, "the plug-in never authenticated");
-  for (const std::string name : kRequests) {
-    require(answered_.count(name) > 0, "the plug-in never sent a message " + name);
+  for (const auto& request : kRequests) {
+    require(answered_.count(request.name) > 0,
+            std::string("the plug-in never sent a message ") + request.name);
   }
-  std::printf("front end: session complete, %d chat messages\n", chat_messages_);
+  std::printf("service: session complete, %d chat messages\n", chat_messages_);
 }
 
 std::unique_ptr<Message> Service::receive() {
@@ -145,7 +207,7 @@ std::unique_ptr<Message> Service::receive() {
           std::string("not a valid message: ") + frame.name);
   require(message->GetReflection()->GetUnknownFields(*message).empty(),
           std::string("unknown fields in: ") + frame.name);
-  print_message("plug-in -> front end", *message, frame.size);
+  print_message("plug-in -> service", *message, frame.size);
   return message;
 }
 
@@ -159,7 +221,7 @@ Message Service::expect(const std::string& otherwise) {
 
 void Service::send(const Message& message) {
   const std::string bytes = message.SerializeAsString();
-  print_message("front end -> plug-in", message, static_cast<int>(bytes.size()));
+  print_message("service -> plug-in", message, static_cast<int>(bytes.size()));
   require(frame_send(connection_, message.GetTypeName().c_str(),
                      reinterpret_cast<const unsigned char*>(bytes.data()),
                      static_cast<int>(bytes.size())) == 0,
@@ -168,6 +230,7 @@ void Service::send(const Message& message) {
 
 void Service::answer(const Message& message) {
   const auto* auth = dynamic_cast<const ChannelAuthRequest*>(&message);
+  answered_.insert(message.GetTypeName());
   if (auth != nullptr) {
     authenticate(*auth);
     return;
@@ -181,7 +244,6 @@ void Service::answer(const Message& message) {
       answered(message, &Service::log_call) || answered(message, &Service::change_chatroom) ||
       answered(message, &Service::invite) || answered(message, &Service::end_chats);
   require(known, "this front end does not take a " + message.GetTypeName());
-  answered_.insert(message.GetTypeName());
 }
 
 template <typename Request>

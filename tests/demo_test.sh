@@ -22,7 +22,7 @@ case $1 in
     run || fail 'the demo failed'
     # All but the port and the clock, whose numbers have as many digits on every day. Each end on its
     # own: which of two lines comes first is open where both print at once.
-    sed -E 's/(127\.0\.0\.1:|[a-z]+TimeMillis: |sentTime: |recorded at |clock says ).*/\1.../' \
+    sed -E 's/(127\.0\.0\.1:|[a-z]+TimeMillis: |sentTime: |recorded at |clock says )[-: 0-9]*[0-9]/\1.../' \
       "$scratch/out" >"$scratch/said"
     transcript=$(dirname "${BASH_SOURCE[0]}")/demo_transcript.txt
     diff <(grep '^plug-in: ' "$transcript") <(grep '^plug-in: ' "$scratch/said") >&2 ||
@@ -36,17 +36,21 @@ case $1 in
     ! run --access-token refused-access-token || fail 'a wrong token is no failure'
     ! grep -q 'access-token' "$scratch/out" "$scratch/err" || fail 'a refused access token shows'
     ;;
-  log_is_shown)
+  lines_fit_a_terminal)
     run || fail 'the demo failed'
+    ! LC_ALL=C.UTF-8 grep -E '.{81}' "$scratch/out" >&2 || fail 'more than 80 columns'
+    ;;
+  log_is_shown_if_asked_for)
+    run --log || fail 'the demo failed'
     grep -q ' D MESSAGE_PLUGIN .* > \[[0-9]*\]chat_request_serialize: exit$' "$scratch/err" ||
       fail 'no log lines'
     ;;
-  no_log)
-    run --no-log || fail 'the demo failed'
+  log_is_not_shown)
+    run || fail 'the demo failed'
     [ ! -s "$scratch/err" ] || fail 'log lines all the same'
     ;;
   every_function_is_called)
-    run || fail 'the demo failed'
+    run --log || fail 'the demo failed'
     functions=$(grep -v '^forward_stored_message_' \
       "$(dirname "${BASH_SOURCE[0]}")/../proto-lib/exported-functions.txt")
     for function in $functions; do
@@ -55,7 +59,7 @@ case $1 in
     ;;
   only_streams_are_kept)
     # The plug-in under LeakSanitizer, with nothing suppressed.
-    LSAN_OPTIONS=exitcode=0 run || fail 'the demo failed'
+    LSAN_OPTIONS=exitcode=0 run --log || fail 'the demo failed'
     calls=$(grep -E '\][a-z_]+_deserialize(:? start|: enter)$' "$scratch/err" |
       grep -Evc '\](channel_auth_reply|client_echo)_deserialize ')
     awk -v calls="$calls" '

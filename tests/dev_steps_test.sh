@@ -92,18 +92,19 @@ cmake --build --preset release --target plugin_session front_end
 run_demo.sh build/release/examples
 TXT
     ;;
-  demo_without_log)
-    starts demo --no-log <<TXT
+  demo_with_log)
+    starts demo --log <<TXT
 cmake --preset release
 cmake --build --preset release --target plugin_session front_end
-run_demo.sh build/release/examples --no-log
+run_demo.sh build/release/examples --log
 TXT
     ;;
   test)
-    starts test -R NAME <<TXT
+    starts test NAME -j 4 <<TXT
 cmake --preset release
 cmake --build --preset release
-ctest --preset release -R NAME
+ctest --preset release -N -R NAME
+ctest --preset release -R NAME -j 4
 TXT
     ;;
   test_of_a_device_runtime)
@@ -125,13 +126,13 @@ TXT
     [ ! -e "$checkout/build/release/of_another_compiler" ]
     ;;
   arm)
-    starts arm <<TXT
+    starts arm -j4 -R NAME --rerun-failed <<TXT
 cmake --preset armhf
 cmake --build --preset armhf
-ctest --preset armhf
+ctest --preset armhf -j4 -R NAME --rerun-failed
 cmake --preset armel
 cmake --build --preset armel
-ctest --preset armel
+ctest --preset armel -j4 -R NAME --rerun-failed
 TXT
     ;;
   abi)
