@@ -98,27 +98,27 @@ extern "C" {
  *  @{ */
 
 /** Two users whose combination the service refuses. An id that it left out is 0. */
-typedef struct {
+typedef struct qel_message_didviolationuser_t {
   int64_t userA; /**< one of the two */
   int64_t userB; /**< the other */
 } qel_message_didviolationuser_t;
 
 /** How far a member of a chatroom has acknowledged, as read or as delivered. */
-typedef struct {
+typedef struct qel_message_watermarkentry_t {
   int64_t userId;    /**< the member */
   int64_t msgId;     /**< the last message that the member acknowledged */
   int64_t timestamp; /**< when */
 } qel_message_watermarkentry_t;
 
 /** A member of a chatroom. */
-typedef struct {
+typedef struct qel_message_chatroommember_t {
   int64_t userId;    /**< the member */
   int64_t available; /**< 1 or 0 */
   char* name;        /**< as handed out: "" without a name */
 } qel_message_chatroommember_t;
 
 /** A message in the inbox. */
-typedef struct {
+typedef struct qel_message_inboxentry_t {
   int64_t msgId;      /**< the message */
   int32_t msgType;    /**< a MsgType */
   int64_t sender;     /**< who sent it */
@@ -131,7 +131,7 @@ typedef struct {
 } qel_message_inboxentry_t;
 
 /** A chat to end. */
-typedef struct {
+typedef struct qel_message_endchatentry_t {
   int64_t chatroomId;  /**< the chatroom */
   bool denyInvitation; /**< refuse further invitations into it */
 } qel_message_endchatentry_t;
