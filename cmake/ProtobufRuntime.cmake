@@ -1,7 +1,7 @@
-# Protocol Buffers, 2.6 series: the target protobuf26 (headers and shared library) and the compiler
-# of the schema, QEL_PROTOC. ./dev setup builds one in .deps; an existing installation, a device
-# SDK's for example, is used where QEL_PROTOBUF_ROOT names it. When cross-compiling, the target's
-# runtime is the one of ./dev arm, and its compiler the one of this machine.
+# Protocol Buffers, 2.6 series, 2.6.1 at least: the target protobuf26 (headers and shared library) and
+# the compiler of the schema, QEL_PROTOC. ./dev setup builds one in .deps; an existing installation, a
+# device SDK's for example, is used where QEL_PROTOBUF_ROOT names it. When cross-compiling, the
+# target's runtime is the one of ./dev arm, and its compiler the one of this machine.
 
 set(QEL_PROTOBUF_ROOT "" CACHE PATH "Installation of Protocol Buffers 2.6 (empty: the one of ./dev)")
 set(QEL_PROTOC "" CACHE FILEPATH "Compiler of the schema (empty: the installation's, or the one of ./dev when cross-compiling)")
@@ -38,18 +38,18 @@ math(EXPR _major "${_number} / 1000000")
 math(EXPR _minor "${_number} / 1000 % 1000")
 math(EXPR _patch "${_number} % 1000")
 set(QEL_PROTOBUF_VERSION "${_major}.${_minor}.${_patch}")
-if(NOT "${_major}.${_minor}" STREQUAL "2.6")
-  message(FATAL_ERROR "This library needs Protocol Buffers 2.6, but ${QEL_PROTOBUF_PREFIX} has ${QEL_PROTOBUF_VERSION}.")
+if(NOT QEL_PROTOBUF_VERSION MATCHES "^2\\.6\\.[1-9]")
+  message(FATAL_ERROR "This library needs Protocol Buffers 2.6.1, but ${QEL_PROTOBUF_PREFIX} has ${QEL_PROTOBUF_VERSION}.")
 endif()
 
 execute_process(COMMAND "${_protoc}" --version
   OUTPUT_VARIABLE _line ERROR_QUIET RESULT_VARIABLE _status OUTPUT_STRIP_TRAILING_WHITESPACE)
 if(NOT _status EQUAL 0)
-  message(FATAL_ERROR "The schema's compiler ${_protoc} does not run here: let QEL_PROTOC name a protoc 2.6 of this machine.")
+  message(FATAL_ERROR "The schema's compiler ${_protoc} does not run here: let QEL_PROTOC name a protoc 2.6.1 of this machine.")
 endif()
 string(REGEX MATCH "[0-9.]+$" _protoc_version "${_line}")
-if(NOT _protoc_version MATCHES "^2\\.6\\.")
-  message(FATAL_ERROR "This library needs the compiler of Protocol Buffers 2.6, but ${_protoc} is of ${_protoc_version}.")
+if(NOT _protoc_version MATCHES "^2\\.6\\.[1-9]")
+  message(FATAL_ERROR "This library needs the compiler of Protocol Buffers 2.6.1, but ${_protoc} is of ${_protoc_version}.")
 endif()
 set(QEL_PROTOC_COMMAND "${_protoc}")
 

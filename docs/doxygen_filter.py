@@ -15,6 +15,10 @@ import sys
 
 IMAGE_OR_LINK = re.compile(r"(!?)\[((?:[^][]|\[[^][]*\])*)\]\(([^()\s]+)\)")
 
+# The sources in the reference: the header, and those of docs/examples.dox.
+SOURCES = ["proto-lib/qel-message-serialize.h", "examples/plugin_session.c", "examples/pushes.c",
+           "examples/framing.h"]
+
 
 def slug(heading):
     """The anchor that viewers of Markdown give a heading, if it is the first of its kind."""
@@ -38,7 +42,7 @@ def link(match, page):
     path = os.path.normpath(os.path.join(os.path.dirname(page), path)) if path else page
     if path.endswith(".md"):
         return f"[{plain}](@ref {name_of(path, anchor)})"
-    if path == "proto-lib/qel-message-serialize.h":
+    if path in SOURCES:
         return f"[{plain}](@ref {os.path.basename(path)})"
     return text
 

@@ -30,6 +30,12 @@ constexpr bool is_in_msg_type_range(int type) {
   return static_cast<unsigned>(type) <= 30;
 }
 
+// What a caller means by a bool: its byte is 0 or something else. Any other way the compiler takes
+// for granted that it is 0 or 1, drops a test of it, and sends what it is.
+bool is_true(const bool& flag) {
+  return *reinterpret_cast<const volatile unsigned char*>(&flag) != 0;
+}
+
 }  // namespace
 
 // ---- Stored messages: placeholders
@@ -310,19 +316,19 @@ int allow_chat_request_serialize(int64_t requestId, int64_t chatroomId, const bo
   request.set_requestid(requestId);
   request.set_chatroomid(chatroomId);
   if (isAutoAllow != nullptr) {
-    request.set_isautoallow(*isAutoAllow);
+    request.set_isautoallow(is_true(*isAutoAllow));
   }
   request.set_maxcount(is_page_size(maxCount) ? maxCount : kMaxPageSize);
-  request.set_needdeliveryack(needDeliveryAck);
-  if (needDeliveryAck) {
+  request.set_needdeliveryack(is_true(needDeliveryAck));
+  if (request.needdeliveryack()) {
     request.set_lastdeliveryacktimestamp(lastDeliveryAckTimestamp);
   }
-  request.set_needreadack(needReadAck);
-  if (needReadAck) {
+  request.set_needreadack(is_true(needReadAck));
+  if (request.needreadack()) {
     request.set_lastreadacktimestamp(lastReadAckTimestamp);
   }
-  request.set_needorderedchatroommemberlist(needOrderedChatroomMemberList);
-  request.set_needchatroommeta(needChatroomMeta);
+  request.set_needorderedchatroommemberlist(is_true(needOrderedChatroomMemberList));
+  request.set_needchatroommeta(is_true(needChatroomMeta));
 
   return encode(request, serialized_data, size);
 }
@@ -444,7 +450,7 @@ int forward_online_message_reply_serialize(int64_t requestId, int64_t chatroomId
   reply.set_requestid(requestId);
   reply.set_chatroomid(chatroomId);
   if (markAsRead != nullptr) {
-    reply.set_markasread(*markAsRead);
+    reply.set_markasread(is_true(*markAsRead));
   }
 
   return encode(reply, serialized_data, size);
@@ -630,7 +636,7 @@ int end_chat_request_serialize(int64_t requestId, const qel_message_endchatentry
   for (int i = 0; i < count; ++i) {
     EndChatEntry* entry = request.add_endchatentries();
     entry->set_chatroomid(entries[i].chatroomId);
-    entry->set_denyinvitation(entries[i].denyInvitation);
+    entry->set_denyinvitation(is_true(entries[i].denyInvitation));
   }
 
   return encode(request, serialized_data, size);

@@ -9,13 +9,18 @@
  *
  * @par Transport
  * The library opens no connection. How buffers travel, any framing around them, and which reply
- * belongs to which request (by requestId) are the caller's business.
+ * belongs to which request (by requestId) are the caller's business. The transport must carry the
+ * kind of each message: bytes do not say it, and many a function succeeds with those of another.
  *
  * @par Types
- * Identifiers and times are int64_t; 32-bit values, counts and lengths are int; received bytes are
- * data and size, their length in bytes. Text is NUL-terminated, UTF-8, and measured in bytes; text
- * that is not UTF-8 passes through unchanged, after a line of the protocol runtime on standard
- * error.
+ * Identifiers and times are int64_t, times in milliseconds; 32-bit values, counts and lengths are
+ * int; received bytes are data and size, their length in bytes. A bool that is handed in is false
+ * if its byte is 0, else true. Text is NUL-terminated, UTF-8, and measured in bytes; text that is
+ * not UTF-8 passes through unchanged, after a line of the protocol runtime on standard error.
+ *
+ * @par
+ * What result codes mean, the unit of lifetimes (msgTtl), and since when times count, are the
+ * service's matter.
  *
  * @par Serializers
  * They return 0, or -1 after one error line in the log. The last two arguments receive the encoded
@@ -60,13 +65,14 @@
  * the call reads or writes through it.
  *
  * @par Memory
- * Every deserializer keeps one small block (its input stream) allocated for good, except where the
- * function says that it is released.
+ * Each call of a deserializer leaves one small block (its input stream) allocated for good, except
+ * where the function says that it is released: a process that receives grows with each message.
  *
  * @par Enumerations
  * A value outside the message's enumeration ends the process with an assertion failure (SIGABRT),
  * unless the function says that it checks the range. A number that the service sends and that is
- * outside the enumeration reads as if the field were absent.
+ * outside the enumeration reads as if the field were absent: a message of a type that is newer than
+ * this library has the msgType 0, and cannot be told from a TEXT.
  * - ChatType: SINGLE 0, GROUP 1, BROADCAST 2, SECURE 3, MONOLOGUE 4
  * - MsgType: TEXT 0, MEDIA 1, CUSTOM 2, RECALL 3, NOTI 4, READ_ACK 5, DELIVERY_ACK 6, UNSEAL 10,
  *   VOIP_CALL_SETUP 30
@@ -98,29 +104,29 @@ extern "C" {
  *  @{ */
 
 /** Two users whose combination the service refuses. An id that it left out is 0. */
-typedef struct {
+typedef struct qel_message_didviolationuser_t {
   int64_t userA; /**< one of the two */
   int64_t userB; /**< the other */
 } qel_message_didviolationuser_t;
 
 /** How far a member of a chatroom has acknowledged, as read or as delivered. */
-typedef struct {
+typedef struct qel_message_watermarkentry_t {
   int64_t userId;    /**< the member */
   int64_t msgId;     /**< the last message that the member acknowledged */
   int64_t timestamp; /**< when */
 } qel_message_watermarkentry_t;
 
 /** A member of a chatroom. */
-typedef struct {
+typedef struct qel_message_chatroommember_t {
   int64_t userId;    /**< the member */
   int64_t available; /**< 1 or 0 */
   char* name;        /**< as handed out: "" without a name */
 } qel_message_chatroommember_t;
 
 /** A message in the inbox. */
-typedef struct {
+typedef struct qel_message_inboxentry_t {
   int64_t msgId;      /**< the message */
-  int32_t msgType;    /**< a MsgType */
+  int32_t msgType;    /**< a MsgType; as handed out, TEXT may also be a type not known here */
   int64_t sender;     /**< who sent it */
   int64_t receiver;   /**< whom it is for */
   int64_t sentTime;   /**< when it was sent */
@@ -131,7 +137,7 @@ typedef struct {
 } qel_message_inboxentry_t;
 
 /** A chat to end. */
-typedef struct {
+typedef struct qel_message_endchatentry_t {
   int64_t chatroomId;  /**< the chatroom */
   bool denyInvitation; /**< refuse further invitations into it */
 } qel_message_endchatentry_t;
@@ -180,7 +186,9 @@ int channel_auth_request_serialize(int64_t requestId, int64_t userId, int64_t de
 
 /**
  * ChannelAuthReply. All three outputs are written on success, and none of the pointers may be
- * NULL: without a result *resultCode is 0, and without a text *resultMsg is NULL.
+ * NULL: without a result *resultCode is 0, and without a text *resultMsg is NULL. So empty bytes
+ * and most other messages read as a reply with the code 0: compare *requestId with the request's,
+ * and give no request the id 0.
  *
  * @param data,size             the received bytes
  * @param requestId             the request that is answered

@@ -157,6 +157,21 @@ TEST_F(AllowChatRequestSerialize, WhenMetaIsWanted_SetsItsFlagAlone) {
   EXPECT_EQ(encoded(), "58 01 60 02 70 03 78 00 80 01 00 90 01 01 98 01 00");
 }
 
+TEST_F(AllowChatRequestSerialize, WhenFlagsHoldOtherBytesThanOneAndZero_EncodesThemAsTrue) {
+  // Of callers whose compiler has no bool.
+  using Call = int (*)(int64_t, int64_t, const unsigned char*, int, unsigned char, int64_t,
+                       unsigned char, int64_t, unsigned char, unsigned char, unsigned char**, int*);
+  const auto call =
+      reinterpret_cast<Call>(reinterpret_cast<void (*)()>(allow_chat_request_serialize));
+  for (const unsigned char byte : support::kBytesOfNoBool) {
+    Encoded out;
+    call(1, 2, &byte, 3, byte, 5, byte, 6, byte, byte, &out.data.block, &out.size);
+    EXPECT_EQ(to_hex(out.bytes()),
+              "58 01 60 02 68 01 70 03 78 01 80 01 01 88 01 06 90 01 01 98 01 01 a0 01 05")
+        << static_cast<int>(byte);
+  }
+}
+
 // ---- allow_chat_reply_deserialize
 
 class AllowChatReplyDeserialize : public ExchangeTest {

@@ -30,18 +30,38 @@ refused() {
   exit 1
 }
 
+# headers NUMBER: an installation of that version, which has nothing else, in $scratch/other.
+headers() {
+  mkdir -p "$scratch/other/include/google/protobuf/stubs"
+  echo "#define GOOGLE_PROTOBUF_VERSION $1" >"$scratch/other/include/google/protobuf/stubs/common.h"
+}
+
+# compiler VERSION: one that says so and does nothing, $scratch/protoc.
+compiler() {
+  printf '#!/bin/sh\necho libprotoc %s\n' "$1" >"$scratch/protoc"
+  chmod +x "$scratch/protoc"
+}
+
 case $1 in
   another_series_of_headers)
-    mkdir -p "$scratch/other/include/google/protobuf/stubs"
-    echo '#define GOOGLE_PROTOBUF_VERSION 3021012' >"$scratch/other/include/google/protobuf/stubs/common.h"
+    headers 3021012
     refused -DQEL_PROTOBUF_ROOT="$scratch/other"
-    expect "This library needs Protocol Buffers 2.6, but $scratch/other has 3.21.12."
+    expect "This library needs Protocol Buffers 2.6.1, but $scratch/other has 3.21.12."
+    ;;
+  older_headers)
+    headers 2006000
+    refused -DQEL_PROTOBUF_ROOT="$scratch/other"
+    expect "This library needs Protocol Buffers 2.6.1, but $scratch/other has 2.6.0."
     ;;
   another_series_of_compiler)
-    printf '#!/bin/sh\necho libprotoc 3.21.12\n' >"$scratch/protoc"
-    chmod +x "$scratch/protoc"
+    compiler 3.21.12
     refused -DQEL_PROTOBUF_ROOT="$protobuf" -DQEL_PROTOC="$scratch/protoc"
-    expect "This library needs the compiler of Protocol Buffers 2.6, but $scratch/protoc is of 3.21.12."
+    expect "This library needs the compiler of Protocol Buffers 2.6.1, but $scratch/protoc is of 3.21.12."
+    ;;
+  older_compiler)
+    compiler 2.6.0
+    refused -DQEL_PROTOBUF_ROOT="$protobuf" -DQEL_PROTOC="$scratch/protoc"
+    expect "This library needs the compiler of Protocol Buffers 2.6.1, but $scratch/protoc is of 2.6.0."
     ;;
   no_runtime)
     refused -DQEL_PROTOBUF_ROOT="$scratch/nowhere"
@@ -49,7 +69,7 @@ case $1 in
     ;;
   compiler_that_does_not_run)
     refused -DQEL_PROTOBUF_ROOT="$protobuf" -DQEL_PROTOC="$scratch/nowhere"
-    expect "The schema's compiler $scratch/nowhere does not run here: let QEL_PROTOC name a protoc 2.6 of this machine."
+    expect "The schema's compiler $scratch/nowhere does not run here: let QEL_PROTOC name a protoc 2.6.1 of this machine."
     ;;
   folder_of_libraries_that_is_named)
     configure -DQEL_PROTOBUF_ROOT="$protobuf" -DCMAKE_INSTALL_LIBDIR=lib

@@ -1,5 +1,6 @@
 // Ending chats.
 
+#include <cstring>
 #include <limits>
 
 #include "support/exchange.h"
@@ -41,6 +42,16 @@ TEST_F(EndChatRequestSerialize, WhenCalled_EncodesEntriesInOrderAndNoIdsOfTheSen
 TEST_F(EndChatRequestSerialize, WhenInvitationsAreNotDenied_EncodesThatAsPresent) {
   call(1, {{2, false}});
   expect_bytes("58 01 62 04 08 02 58 00");
+}
+
+TEST_F(EndChatRequestSerialize, WhenDenyInvitationHoldsAnotherByte_EncodesItAsTrue) {
+  for (const unsigned char byte : support::kBytesOfNoBool) {
+    Encoded out;
+    qel_message_endchatentry_t entry = {2, false};
+    std::memset(&entry.denyInvitation, byte, 1);
+    end_chat_request_serialize(1, &entry, 1, &out.data.block, &out.size);
+    EXPECT_EQ(to_hex(out.bytes()), "58 01 62 04 08 02 58 01") << static_cast<int>(byte);
+  }
 }
 
 TEST_F(EndChatRequestSerialize, WhenIdsAreZero_EncodesThemAsPresent) {

@@ -168,6 +168,13 @@ TEST_F(ForwardOnlineMessageReplySerialize, WhenMarkAsReadIsNull_LeavesItOut) {
   EXPECT_EQ(encoded(1, 2, nullptr), "58 01 60 02");
 }
 
+TEST_F(ForwardOnlineMessageReplySerialize, WhenMarkAsReadHoldsAnotherByte_EncodesItAsTrue) {
+  for (const unsigned char byte : support::kBytesOfNoBool) {
+    EXPECT_EQ(encoded(1, 2, reinterpret_cast<const bool*>(&byte)), "58 01 60 02 68 01")
+        << static_cast<int>(byte);
+  }
+}
+
 TEST_F(ForwardOnlineMessageReplySerialize, WhenIdsAreZero_EncodesThemAsPresent) {
   EXPECT_EQ(encoded(0, 0, nullptr), "58 00 60 00");
 }

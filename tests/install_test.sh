@@ -125,14 +125,21 @@ case $1 in
     refused "set(CMAKE_FIND_USE_CMAKE_SYSTEM_PATH OFF)
       set(CMAKE_FIND_USE_SYSTEM_ENVIRONMENT_PATH OFF)
       find_package(qel-message-protosvc REQUIRED COMPONENTS classes)" -DCMAKE_PREFIX_PATH="$tree"
-    expect "The component 'classes' needs Protocol Buffers 2.6, but CMake finds no headers of it: let CMAKE_PREFIX_PATH name an installation."
+    expect "The component 'classes' needs Protocol Buffers 2.6.1, but CMake finds no headers of it: let CMAKE_PREFIX_PATH name an installation."
     ;;
   classes_of_another_series_are_refused)
     mkdir -p "$scratch/other/include/google/protobuf/stubs"
     echo '#define GOOGLE_PROTOBUF_VERSION 3021012' >"$scratch/other/include/google/protobuf/stubs/common.h"
     refused 'find_package(qel-message-protosvc REQUIRED COMPONENTS classes)' \
       -DCMAKE_PREFIX_PATH="$tree;$scratch/other"
-    expect "needs Protocol Buffers 2.6, but CMake finds headers of 3.21 in $scratch/other/include:"
+    expect "needs Protocol Buffers 2.6.1, but CMake finds headers of 3.21.12 in $scratch/other/include:"
+    ;;
+  classes_of_an_older_runtime_are_refused)
+    mkdir -p "$scratch/other/include/google/protobuf/stubs"
+    echo '#define GOOGLE_PROTOBUF_VERSION 2006000' >"$scratch/other/include/google/protobuf/stubs/common.h"
+    refused 'find_package(qel-message-protosvc REQUIRED COMPONENTS classes)' \
+      -DCMAKE_PREFIX_PATH="$tree;$scratch/other"
+    expect "needs Protocol Buffers 2.6.1, but CMake finds headers of 2.6.0 in $scratch/other/include:"
     ;;
   classes_without_runtime_are_refused)
     install_component development
@@ -140,7 +147,7 @@ case $1 in
     cp -r "$protobuf/include/google" "$scratch/tree/include"
     refused 'find_package(qel-message-protosvc REQUIRED COMPONENTS classes)' \
       -DCMAKE_PREFIX_PATH="$scratch/tree"
-    expect "needs Protocol Buffers 2.6, but CMake finds no libprotobuf.so.9:"
+    expect "needs Protocol Buffers 2.6.1, but CMake finds no libprotobuf.so.9:"
     ;;
   *)
     fail "no such case: $1"

@@ -12,10 +12,11 @@ functions=$source/proto-lib/exported-functions.txt
 
 records() { sed -nE 's/^\} (qel_message_[a-z]+_t);/\1/p' "$header"; }
 
-# Targets of links and pictures, and of the tree beside the pages.
+# Targets of links and pictures, and of the tree beside the pages. Its index names a list of pages
+# even where there is none, at no place in the tree.
 targets() {
   grep -ohE '(href|src|data)="[^"]+"' "$html"/*.html | sed -E 's/^[a-z]+="//; s/"$//' | grep -vE '^[a-z]+:'
-  grep -ohE '"[^" ]+\.html(#[^"]*)?"' "$html"/*.js | tr -d '"'
+  sed -E '/":\[\],?$/d' "$html"/*.js | grep -oE '"[^" ]+\.html(#[^"]*)?"' | tr -d '"'
 }
 
 # complete FOLDER: there are its pages.
@@ -51,6 +52,10 @@ case $1 in
     diff "$functions" \
       <(sed -nE 's/^<td class="markdownTableBody[A-Za-z]*"><a [^>]*>([a-z_]+serialize)<.*/\1/p' \
         "$html/page_docs_interface.html") >&2
+    ;;
+  every_page_is_in_the_navigation)
+    diff <(find "$html" -name 'page_*.html' -printf '%f\n' | sort) \
+      <(grep -oE '@ref page_\w+' "$source/docs/layout.xml" | sed 's/@ref //; s/$/.html/' | sort -u) >&2
     ;;
   every_diagram_is_drawn)
     in_pages=$(cd "$source" && find . -name '*.md' -not -path './build/*' -not -path './.*/*' -exec cat {} + |

@@ -22,6 +22,9 @@ constexpr int64_t kLargest = std::numeric_limits<int64_t>::max();
 constexpr int kSmallestInt = std::numeric_limits<int>::min();
 constexpr int kLargestInt = std::numeric_limits<int>::max();
 
+// What a bool should not hold, and does where callers have left it unset.
+constexpr unsigned char kBytesOfNoBool[] = {2, 0x80, 0xff};
+
 // Starts every test with an empty log.
 class ExchangeTest : public ::testing::Test {
  protected:

@@ -2,8 +2,9 @@
 # name. A block that is neither under "Wrong:" nor under "Right:" is an error.
 BEGIN {
   print "#include <stdlib.h>"
+  print "#include <string.h>"
   print ""
-  print "#include \"migration_examples.h\""
+  print "#include \"mistakes_examples.h\""
 }
 
 on && /^```$/ { on = 0; label = ""; next }
