@@ -57,9 +57,7 @@ def prose(text, page, slugs):
     text = re.sub(r"^(#+) (.*)$", heading, text, flags=re.MULTILINE)
     text = IMAGE_OR_LINK.sub(lambda match: link(match, page), text)
     text = re.sub(r"(?<!\[)`(\w+_(?:de)?serialize)`", r"[\1](@ref \1)", text)
-    text = re.sub(r"`([\w-]*)(::[\w-]+)`", r"<code>\1\\\2</code>", text)  # or Doxygen looks for it
-    # A name that is wider than a telephone may be broken.
-    return re.sub(r"`([\w.=]{36,})`", r'<code style="overflow-wrap: anywhere">\1</code>', text)
+    return re.sub(r"`([\w-]*)(::[\w-]+)`", r"<code>\1\\\2</code>", text)  # or Doxygen looks for it
 
 
 def diagram(block):
