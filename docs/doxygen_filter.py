@@ -1,11 +1,14 @@
 #!/usr/bin/env python3
-"""A Markdown page as Doxygen takes it, while viewers of Markdown have it as it is.
+"""A Markdown page or the header as Doxygen takes it, while others have it as it is.
 
-usage: doxygen_filter.py PAGE
+usage: doxygen_filter.py FILE
 
-Mermaid's sequence diagrams become PlantUML's, whose language is the same but for the participants.
-Headings get names, and links go to these; functions are links. A file that is not in the reference
-is named, not linked.
+In a page, Mermaid's sequence diagrams become PlantUML's, whose language is the same but for the
+participants. Headings get names, and links go to these; functions are links. A file that is not in
+the reference is named, not linked.
+
+In the header, each function gets what its caller frees, from the table of docs/interface.md, and
+what to see also: the other functions of its section, and the notes that hold for all.
 """
 
 import collections
@@ -64,19 +67,58 @@ def prose(text, page, slugs):
 def diagram(block):
     block = re.sub(r"^```mermaid\nsequenceDiagram$", "\n@startuml", block, flags=re.MULTILINE)
     block = re.sub(r"^```$", "@enduml", block, flags=re.MULTILINE)
-    return re.sub(r"participant (\w+) as (.+)", r'participant "\2" as \1', block)
+    block = re.sub(r"participant (\w+) as (.+)", r'participant "\2" as \1', block)
+    return f"<center>{block}\n</center>"  # which scrolls by itself where the window is too narrow
 
 
-def main(page):
-    with open(page, encoding="utf-8") as file:
-        parts = re.split(r"^(```.*?^```$)", file.read(), flags=re.MULTILINE | re.DOTALL)
+def owners():
+    """What the caller of each function frees."""
+    with open("docs/interface.md", encoding="utf-8") as file:
+        rows = [re.split(r" *\| *", line.strip("| \n")) for line in file if line.startswith("|")]
+    column = rows[0].index("Caller frees")
+    return {row[0].strip("`"): row[column] for row in rows[1:]}
+
+
+def header(text, name):
+    frees = owners()
+
+    def section(match):
+        functions = re.findall(r"^(?:int|void) (\w+)\(", match[0], flags=re.MULTILINE)
+
+        def end_of_comment(match):
+            others = [function for function in functions if function != match[1]]
+            # In one line, so that line numbers stay those of the file.
+            return (
+                f" * @par Who frees what @newline The caller frees {frees[match[1]]}."
+                f" What holds for all functions is in {name}."
+                f" @newline @see {', '.join(others + [name])} */\n"
+            )
+
+        return re.sub(
+            r"^ \*/\n(?=(?:int|void) (\w+)\()", end_of_comment, match[0], flags=re.MULTILINE
+        )
+
+    return re.sub(r"@defgroup.*?@}", section, text, flags=re.DOTALL)
+
+
+def page(text, name):
+    parts = re.split(r"^(```.*?^```$)", text, flags=re.MULTILINE | re.DOTALL)
     slugs = collections.Counter()
     for i, part in enumerate(parts):
         if i % 2 == 0:
-            part = prose(part, page, slugs)
+            parts[i] = prose(part, name, slugs)
         elif part.startswith("```mermaid\n"):
-            part = diagram(part)
-        sys.stdout.write(part)
+            parts[i] = diagram(part)
+    return "".join(parts)
+
+
+def main(path):
+    with open(path, encoding="utf-8") as file:
+        text = file.read()
+    if path.endswith(".md"):
+        sys.stdout.write(page(text, path))
+    else:
+        sys.stdout.write(header(text, os.path.basename(path)))
 
 
 main(os.path.relpath(sys.argv[1]))

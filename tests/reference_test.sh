@@ -22,8 +22,24 @@ targets() {
 # complete FOLDER: there are its pages.
 complete() {
   [ -s "$1/share/doc/qel-message-protosvc/html/index.html" ]
+  [ -s "$1/share/doc/qel-message-protosvc/html/doxygen-awesome.css" ]
   [ -s "$1/share/man/man3/chat_request_serialize.3" ]
 }
+
+# entries_with PATTERN: the functions whose entry on a web page has such a line.
+entries_with() {
+  awk -v text="$1" '/"memname">(int|void) / { name = $3 } $0 ~ text { print name }' \
+    "$html"/group*.html | sort -u
+}
+
+# man_pages_with SECTION PATTERN: the functions whose man page has such a line in the section.
+man_pages_with() {
+  awk -v name="$1" -v text="$2" \
+    '/^[.]SH/ { inside = index($0, name) } inside && $0 ~ text { print FILENAME }' \
+    "$docs"/man/man3/*serialize.3 | sed 's|.*/||; s/[.]3$//' | sort -u
+}
+
+are_all_functions() { diff <(sort "$functions") - >&2; }
 
 case $1 in
   is_installed)
@@ -57,6 +73,25 @@ case $1 in
     diff <(find "$html" -name 'page_*.html' -printf '%f\n' | sort) \
       <(grep -oE '@ref page_\w+' "$source/docs/layout.xml" | sed 's/@ref //; s/$/.html/' | sort -u) >&2
     ;;
+  every_function_says_who_frees_what)
+    entries_with 'Who frees what.*The caller frees .*"qel-message-serialize_8h.html"' |
+      are_all_functions
+    man_pages_with 'WHO FREES WHAT' '^The caller frees .*[.]h.*[(]3[)]' | are_all_functions
+    ;;
+  what_is_freed_is_as_in_the_table)
+    [ "$(man_pages_with 'WHO FREES WHAT' '[*]state')" = typing_updated_deserialize ]
+    ;;
+  every_function_says_what_to_include)
+    entries_with '#include &lt;<a [^>]*"qel-message-serialize_8h.html"' | are_all_functions
+    man_pages_with SYNOPSIS '#include <qel.*[.]h>' | are_all_functions
+    ;;
+  every_function_says_what_to_see_also)
+    entries_with 'See also.*"qel-message-serialize_8h.html"' | are_all_functions
+    man_pages_with 'SEE ALSO' '[.]h.*[(]3[)]' | are_all_functions
+    # Each is named by the other one of its exchange.
+    sed -sn '/^\.SH "SEE ALSO"/,$p' "$docs"/man/man3/*serialize.3 | grep -oE '[a-z_]+serialize' |
+      sort -u | are_all_functions
+    ;;
   every_diagram_is_drawn)
     in_pages=$(cd "$source" && find . -name '*.md' -not -path './build/*' -not -path './.*/*' -exec cat {} + |
       grep -cx '```mermaid')
@@ -76,8 +111,10 @@ case $1 in
     mkdir "$scratch/proto-lib"
     cp -r "$source/docs" "$scratch/docs"
     sed '/@param callId /d' "$header" >"$scratch/proto-lib/${header##*/}"
+    touch "$scratch/doxygen-awesome.css"
     cd "$scratch"
-    if QEL_VERSION='' QEL_PLANTUML='' QEL_DOCS_PAGES='' QEL_DOCS_FOLDER=$scratch "$doxygen" docs/Doxyfile 2>out; then
+    if QEL_VERSION='' QEL_PLANTUML='' QEL_DOXYGEN_THEME=$scratch QEL_DOCS_PAGES='' \
+      QEL_DOCS_FOLDER=$scratch "$doxygen" docs/Doxyfile 2>out; then
       echo "accepted" >&2
       exit 1
     fi

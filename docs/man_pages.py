@@ -1,0 +1,64 @@
+#!/usr/bin/env python3
+"""The man pages, in the shape that man pages have, of those that Doxygen writes.
+
+usage: man_pages.py FOLDER-OF-DOXYGENS FOLDER
+
+Doxygen has a page for each section of the header; here each function has its own, and other pages,
+the Markdown ones, have none.
+"""
+
+import pathlib
+import re
+import sys
+
+INCLUDE = ".nf\n.B #include <qel\\-message\\-serialize.h>\n.fi\n"
+
+
+def description(body):
+    """A function's text, with sections and tagged paragraphs instead of bold and italic words."""
+    body = re.sub(r"^\n\.PP\n\\fC#include .*\n\.PP\n", "", body)
+    body = re.sub(r"^(\\fI.*?\\fP) (.*?) *\n(\.br\n)?", r".TP\n\1\n\2\n", body, flags=re.M)
+    body = re.sub(
+        r"\.PP\n\\fB(Who frees what|See also) *\\fP\n\.RS 4\n(.*?) *\n\.RE\n",
+        lambda match: f'.SH "{match[1].upper()}"\n{match[2]}\n',
+        body,
+        flags=re.S,
+    )
+    body = re.sub(
+        r"\\fB([\w-]+(_serialize|_deserialize|\\&\.h)\\fP)",
+        lambda match: match[0].replace("-", r"\-") + "(3)",
+        body,
+    )
+    return re.sub(r"(\.PP)?\s*$", "", body) + "\n"
+
+
+def functions(page):
+    """Name and page of each function on a section's page."""
+    version, project = re.match(r'\.TH ".*?" 3 ".*?" "Version (.*?)" "(.*?)"', page).groups()
+    blocks = re.split(r'^\.SS "\w+ (\w+) .*"\n', page, flags=re.M)
+    for name, body in zip(blocks[1::2], blocks[2::2]):
+        result, arguments, brief = re.search(
+            rf'^\.RI "(\w+) \\fB{name}\\fP \((.*)\)"\n\.br\n\.RI "(.*?)(?:\\&\.)? "', page, re.M
+        ).groups()
+        arguments = ", ".join(r"\ ".join(one.rsplit(" ", 1)) for one in arguments.split(", "))
+        yield name, (
+            f'.TH "{name}" 3 "" "{project} {version}" " "\n.ad l\n.nh\n'
+            f".SH NAME\n{name} \\- {brief}\n"
+            f".SH SYNOPSIS\n{INCLUDE}.HP\n{result} \\fB{name}\\fP({arguments});\n"
+            f".SH DESCRIPTION\n{description(body)}"
+        )
+
+
+def main(source, target):
+    target.mkdir(parents=True)
+    for path in source.glob("qel*"):
+        page = path.read_text(encoding="utf-8")
+        if '.SH "Function Documentation"' in page:
+            for name, text in functions(page):
+                (target / f"{name}.3").write_text(text, encoding="utf-8")
+        else:
+            page = page.replace(".SH SYNOPSIS\n.br\n.PP\n.SH", f".SH SYNOPSIS\n{INCLUDE}.SH")
+            (target / path.name).write_text(page, encoding="utf-8")
+
+
+main(*map(pathlib.Path, sys.argv[1:]))
