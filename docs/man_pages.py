@@ -19,7 +19,7 @@ def description(body):
     body = re.sub(r"^\n\.PP\n\\fC#include .*\n\.PP\n", "", body)
     body = re.sub(r"^(\\fI.*?\\fP) (.*?) *\n(\.br\n)?", r".TP\n\1\n\2\n", body, flags=re.M)
     body = re.sub(
-        r"\.PP\n\\fB(Who frees what|See also) *\\fP\n\.RS 4\n(.*?) *\n\.RE\n",
+        r"\.PP\n\\fB(Who frees what|See also|Examples) *\\fP\n\.RS 4\n(.*?) *\n\.RE\n",
         lambda match: f'.SH "{match[1].upper()}"\n{match[2]}\n',
         body,
         flags=re.S,
