@@ -28,6 +28,38 @@ refused() {
 
 expect() { [[ $messages == *"$1"* ]] || fail "expected: $1"$'\n'"said: $messages"; }
 
+# expect_leaks LOST COMMAND...: the checker reports blocks of these sizes and no others.
+expect_leaks() {
+  local lost=$1 reported
+  shift
+  DLOG_STANDIN_PRIORITY=S "$@" >"$scratch/messages" 2>&1 || [ -n "$lost" ] || fail "$(cat "$scratch/messages")"
+  reported=$(sed -nE 's/.* ([0-9]+) (\([^)]*\) )?(bytes in .* lost in loss record|byte\(s\) in .* allocated from).*/\1/p' \
+    "$scratch/messages" | sort -n | xargs)
+  [ "$reported" = "$lost" ] || fail "lost are '$lost', reported '$reported'"$'\n'"$(cat "$scratch/messages")"
+}
+
+# leaks_alone_are_reported SANITIZER COMMAND...: of plug-ins in C and in C++, with the library as it is
+# and stripped. COMMAND runs the client, and is the checker where SANITIZER is empty.
+leaks_alone_are_reported() {
+  local sanitize=${1:+-fsanitize=$1} library language compiler flags
+  shift
+  cp -r "$tree" "$scratch/stripped"
+  strip --strip-unneeded "$scratch/stripped/$libdir/libqel-message-protosvc.so.$version"
+  "$cc" ${sanitize:+"$sanitize"} "$source/tests/consumers/leaks/client.c" -ldl -o "$scratch/client"
+  for library in "$tree" "$scratch/stripped"; do
+    flags_of "$library" qel-message-protosvc
+    for language in c c++; do
+      compiler=$cc
+      [ "$language" = c ] || compiler=$cxx
+      "$compiler" ${sanitize:+"$sanitize"} -shared -fPIC -x "$language" \
+        "$source/tests/consumers/leaks/plugin.c" -x none "${flags[@]}" -Wl,-rpath,"$library/$libdir" \
+        -o "$scratch/plugin.so"
+      expect_leaks '' "$@" "$scratch/client" "$scratch/plugin.so"
+      expect_leaks '2 3 8 77 256' "$@" "$scratch/client" "$scratch/plugin.so" forgetful
+    done
+  done
+}
+
 case $1 in
   set_up)
     rm -rf "$build/install-test"
@@ -89,12 +121,17 @@ case $1 in
     compile_with_cmake "$tree" classes
     prints 'ClientEcho 7' "$tree" "$scratch/built/module"
     ;;
+  leaks_alone_are_reported_by_valgrind)
+    leaks_alone_are_reported '' valgrind --leak-check=full --show-leak-kinds=definite,indirect \
+      --suppressions="$tree/share/qel-message-protosvc/valgrind.supp"
+    ;;
+  leaks_alone_are_reported_by_leak_sanitizer) leaks_alone_are_reported leak ;;
+  leaks_alone_are_reported_by_address_sanitizer) leaks_alone_are_reported address ;;
   tool_runs) prints "qel-wire $version" "$tree" "$tree/bin/qel-wire" --version ;;
   classes_module_compiles_with_pkg_config)
     export PKG_CONFIG_PATH=$tree/$libdir/pkgconfig:$protobuf/lib/pkgconfig
-    flags=$(pkg-config --cflags --libs qel-message-protosvc-classes)
-    # shellcheck disable=SC2086 # a list of words
-    "$cxx" "$source/tests/consumers/classes/module.cc" $flags -Wl,-rpath,"$tree/$libdir" -o "$scratch/module"
+    eval "flags=($(pkg-config --cflags --libs qel-message-protosvc-classes))"
+    "$cxx" "$source/tests/consumers/classes/module.cc" "${flags[@]}" -Wl,-rpath,"$tree/$libdir" -o "$scratch/module"
     prints 'ClientEcho 7' "$tree" "$scratch/module"
     ;;
   pkg_config_refuses_classes_of_another_series)

@@ -106,6 +106,7 @@ TXT
 ./usr/$libdir/pkgconfig/qel-message-protosvc-classes.pc
 ./usr/$libdir/pkgconfig/qel-message-protosvc.pc
 ./usr/share/qel-message-protosvc/msgspec_frontend.proto
+./usr/share/qel-message-protosvc/valgrind.supp
 TXT
     ;;
   workstation_has_runtime_and_log_service)
