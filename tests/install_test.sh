@@ -91,6 +91,14 @@ case $1 in
     install_component development
     ! grep -F '.so.' <<<"$files" >&2 || exit 1
     ;;
+  all_can_be_read_whatever_the_umask)
+    umask 077
+    mkdir "$scratch/private"
+    cmake --install "$build" --prefix "$scratch/private/opt/qel" >"$scratch/messages"
+    modes=$(find "$scratch/private" -mindepth 1 -printf '%M\n' | sort -u | xargs)
+    [[ $modes =~ ^-rw-r--r--( -rwxr-xr-x)?' drwxr-xr-x lrwxrwxrwx'$ ]] || fail "$modes"
+    [ "$(stat -c %a "$scratch/private")" = 700 ] || fail 'a folder that was there has changed'
+    ;;
   soname_has_the_first_number)
     dynamic=$(readelf -dW "$moved/$libdir/libqel-message-protosvc.so")
     grep -q "SONAME.*\[libqel-message-protosvc\.so\.$first\]" <<<"$dynamic" || fail "$dynamic"

@@ -88,6 +88,7 @@ install_packages() {
 case $1 in
   set_up)
     rm -rf "$packages"
+    umask 077 # whatever it is, all_can_be_read
     cpack --config "$build/CPackConfig.cmake" -B "$packages"
     ;;
   library_has_the_shared_object)
@@ -192,6 +193,12 @@ TXT
     mkdir "$scratch/archive"
     tar -xzf "$archive" -C "$scratch/archive"
     ! grep -rlF -e "$source" -e "$build" -e "$protobuf" "$scratch" >&2 || exit 1
+    ;;
+  all_can_be_read)
+    modes=$({ gunzip -c "$archive" | tar -tv && for package in "$packages"/*.deb; do
+      dpkg-deb --fsys-tarfile "$package" | tar -tv
+    done; } | cut -d ' ' -f 1 | sort -u | xargs)
+    [[ $modes =~ ^-rw-r--r--( -rwxr-xr-x)?' drwxr-xr-x lrwxrwxrwx'$ ]] || fail "$modes"
     ;;
   library_is_not_installed_without_its_runtime)
     make_root
