@@ -145,18 +145,49 @@ case $1 in
     "$cxx" "$source/tests/consumers/classes/module.cc" "${flags[@]}" -Wl,-rpath,"$tree/$libdir" -o "$scratch/module"
     prints 'ClientEcho 7' "$tree" "$scratch/module"
     ;;
-  pkg_config_refuses_classes_of_another_series)
-    mkdir "$scratch/other"
-    sed 's/^Version:.*/Version: 3.21.12/' "$protobuf/lib/pkgconfig/protobuf.pc" >"$scratch/other/protobuf.pc"
-    export PKG_CONFIG_PATH=$tree/$libdir/pkgconfig:$scratch/other
-    ! messages=$(pkg-config --print-errors --exists qel-message-protosvc-classes 2>&1) ||
-      fail 'was not refused'
-    expect "'protobuf < 2.7'"
+  linkers_are_told_where_others_lie)
+    # Where the library does not look beside itself, as a device's does not.
+    cp -r "$tree" "$scratch/tree"
+    # shellcheck disable=SC2016 # the loader's variable
+    sed -i 's#$ORIGIN#/absent#' "$scratch/tree/$libdir/libqel-message-protosvc.so.$version"
+    flags_of "$scratch/tree" qel-message-protosvc
+    "$cc" "$source/tests/consumers/c/plugin.c" "${flags[@]}" -o "$scratch/plugin"
+    compile_with_cmake "$scratch/tree" cxx -DCMAKE_SKIP_RPATH=ON
+    export LD_LIBRARY_PATH=$scratch/tree/$libdir
+    prints 'probe 7, answer of 2 bytes' "$scratch/tree" "$scratch/plugin"
+    prints 'probe 7, answer of 2 bytes' "$scratch/tree" "$scratch/built/module"
     ;;
-  another_first_number_is_refused)
-    refused "find_package(qel-message-protosvc $((first + 1)).0 REQUIRED)" -DCMAKE_PREFIX_PATH="$tree"
-    expect "compatible with requested version \"$((first + 1)).0\""
-    expect "qel-message-protosvc-config.cmake, version: $version"
+  pkg_config_takes_classes_of_one_series_and_version)
+    export PKG_CONFIG_PATH=$scratch
+    while read -r runtime library answer; do
+      sed "s/^Version:.*/Version: $runtime/" "$protobuf/lib/pkgconfig/protobuf.pc" >"$scratch/protobuf.pc"
+      cp "$tree/$libdir/pkgconfig/"*.pc "$scratch"
+      sed -i "s/^Version:.*/Version: $library/" "$scratch/qel-message-protosvc.pc"
+      said=$(pkg-config --print-errors --exists qel-message-protosvc-classes 2>&1) && said=taken
+      [[ $said == *"$answer"* ]] || fail "runtime $runtime, library $library: expected '$answer', said '$said'"
+    done <<TXT
+2.6.1 $version taken
+2.5.9 $version 'protobuf >= 2.6
+2.7.0 $version 'protobuf < 2.7'
+2.6.1 $version.1 'qel-message-protosvc = $version'
+TXT
+    ;;
+  versions_of_one_first_number_are_compatible)
+    cp -r "$tree" "$scratch/tree"
+    sed -i "s/$version/1.2.3/g" "$scratch/tree/$libdir/cmake/qel-message-protosvc/qel-message-protosvc-config-version.cmake"
+    cat >"$scratch/CMakeLists.txt" <<'TXT'
+cmake_minimum_required(VERSION 3.25)
+project(consumer C)
+foreach(asked 0.9 1 1.0 1.2.3 1.2.4 1.3 2.0 "1.2.3;EXACT" "1.2.2;EXACT")
+  find_package(qel-message-protosvc ${asked} QUIET)
+  if(qel-message-protosvc_FOUND)
+    message("taken for: ${asked}")
+  endif()
+  unset(qel-message-protosvc_DIR CACHE)
+endforeach()
+TXT
+    cmake -S "$scratch" -B "$scratch/built" -G Ninja -DCMAKE_PREFIX_PATH="$scratch/tree" 2>"$scratch/messages"
+    diff <(printf 'taken for: %s\n' 1 1.0 1.2.3 '1.2.3;EXACT') "$scratch/messages" >&2
     ;;
   projects_of_old_policies_find_it)
     printf '%s\n' 'cmake_minimum_required(VERSION 2.8.12)' 'project(consumer C)' \
