@@ -71,16 +71,18 @@ case $1 in
     fi
     ;;
   commands_of_the_readme_work)
-    # In their order, with another prefix and this build.
-    sed -n '/^## Installing/,/^or, with/p' "$source/README.md" | awk '/^```/ {on = $0 == "```sh"; next} on' |
-      sed "s#/opt/qel#$scratch/qel#g" >"$scratch/commands"
+    # In their order, with another prefix and this build. Packages are installed by packages_test.sh.
+    sed -n '/^## Installing/,/^## Working/p' "$source/README.md" |
+      awk '/^```/ {on = $0 == "```sh"; next} on' | sed "/^sudo apt/d; s#/opt/qel#$scratch/qel#g" >"$scratch/commands"
     mkdir -p "$scratch/build"
     ln -s "$build" "$scratch/build/release"
     cp "$source/tests/consumers/c/plugin.c" "$scratch"
+    cp "$source/tests/consumers/c/plugin.c" "$scratch/client.c"
     [ -s "$scratch/commands" ] || fail 'no commands'
     cd "$scratch"
     bash -euo pipefail "$scratch/commands" >"$scratch/messages" 2>&1 || fail "$(cat "$scratch/messages")"
     readelf -dW plugin.so | grep -q "NEEDED.*\[libqel-message-protosvc\.so\.$first\]" || fail 'not linked with it'
+    grep -q 'ERROR SUMMARY: 0 errors' "$scratch/messages" || fail "$(cat "$scratch/messages")"
     ;;
   runtime_is_the_shared_object_alone)
     install_component runtime

@@ -210,6 +210,16 @@ TXT
     install_packages "$library" "$development" "$workstation" || fail "$(cat "$scratch/messages")"
     c_plugin_runs "$root/usr"
     ;;
+  nothing_is_left_where_they_are_removed)
+    make_root
+    install_packages "$library" "$development" "$workstation" || fail "$(cat "$scratch/messages")"
+    PATH=$PATH:/usr/sbin:/sbin fakeroot dpkg --root="$root" --log=/dev/null --remove \
+      "libqel-message-protosvc$first" libqel-message-protosvc-dev qel-message-protosvc-workstation \
+      >"$scratch/messages" 2>&1 || fail "$(cat "$scratch/messages")"
+    left=$(find "$root" -path "$root/var/lib/dpkg" -prune -o \
+      '(' -name '*qel*' -o -name 'libprotobuf*' -o -name 'libdlog*' ')' -print)
+    [ -z "$left" ] || fail "$left"
+    ;;
   classes_module_runs_where_they_are_installed)
     make_root
     install_packages "$library" "$development" "$workstation" || fail "$(cat "$scratch/messages")"
