@@ -214,8 +214,9 @@ TXT
     make_root
     install_packages "$library" "$development" "$workstation" || fail "$(cat "$scratch/messages")"
     PATH=$PATH:/usr/sbin:/sbin fakeroot dpkg --root="$root" --log=/dev/null --remove \
-      "libqel-message-protosvc$first" libqel-message-protosvc-dev qel-message-protosvc-workstation \
-      >"$scratch/messages" 2>&1 || fail "$(cat "$scratch/messages")"
+      "libqel-message-protosvc$first:$architecture" "libqel-message-protosvc-dev:$architecture" \
+      "qel-message-protosvc-workstation:$architecture" >"$scratch/messages" 2>&1 ||
+      fail "$(cat "$scratch/messages")"
     left=$(find "$root" -path "$root/var/lib/dpkg" -prune -o \
       '(' -name '*qel*' -o -name 'libprotobuf*' -o -name 'libdlog*' ')' -print)
     [ -z "$left" ] || fail "$left"
