@@ -9,8 +9,8 @@ if(CMAKE_LIBRARY_ARCHITECTURE AND NOT CMAKE_SYSROOT)
 endif()
 include(GNUInstallDirs)
 
-# CMake makes folders as the umask has it. Those that an installation makes are for all to read; those
-# that were there stay as they are.
+# CMake makes folders as the umask has it. Those that an installation makes are for all to read;
+# those that were there stay as they are.
 set(_folders
   "${CMAKE_INSTALL_BINDIR}"
   "${CMAKE_INSTALL_INCLUDEDIR}/${PROJECT_NAME}"

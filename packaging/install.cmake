@@ -20,8 +20,8 @@ install(FILES proto-lib/msgspec_frontend.proto
 set(_valgrind "# Memcheck: what libqel-message-protosvc keeps allocated on purpose.\n")
 file(STRINGS proto-lib/exported-functions.txt _deserializers REGEX "_deserialize$")
 foreach(_function IN LISTS _deserializers)
-  string(APPEND _valgrind
-    "{\n  input stream of ${_function}\n  Memcheck:Leak\n  fun:_Znw*\n  ...\n  fun:${_function}\n}\n")
+  string(APPEND _valgrind "{\n  input stream of ${_function}\n  Memcheck:Leak\n"
+    "  fun:_Znw*\n  ...\n  fun:${_function}\n}\n")
 endforeach()
 file(CONFIGURE OUTPUT "${_made}/valgrind.supp" CONTENT "${_valgrind}" @ONLY)
 install(FILES "${_made}/valgrind.supp"

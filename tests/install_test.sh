@@ -32,14 +32,16 @@ expect() { [[ $messages == *"$1"* ]] || fail "expected: $1"$'\n'"said: $messages
 expect_leaks() {
   local lost=$1 reported
   shift
-  DLOG_STANDIN_PRIORITY=S "$@" >"$scratch/messages" 2>&1 || [ -n "$lost" ] || fail "$(cat "$scratch/messages")"
-  reported=$(sed -nE 's/.* ([0-9]+) (\([^)]*\) )?(bytes in .* lost in loss record|byte\(s\) in .* allocated from).*/\1/p' \
-    "$scratch/messages" | sort -n | xargs)
-  [ "$reported" = "$lost" ] || fail "lost are '$lost', reported '$reported'"$'\n'"$(cat "$scratch/messages")"
+  DLOG_STANDIN_PRIORITY=S "$@" >"$scratch/messages" 2>&1 || [ -n "$lost" ] ||
+    fail "$(cat "$scratch/messages")"
+  reported=$(sed -nE "s/.* ([0-9]+) (\([^)]*\) )?bytes in .* lost in loss record.*/\1/p
+    s/.* leak of ([0-9]+) byte\(s\) in .*/\1/p" "$scratch/messages" | sort -n | xargs)
+  [ "$reported" = "$lost" ] ||
+    fail "lost are '$lost', reported '$reported'"$'\n'"$(cat "$scratch/messages")"
 }
 
-# leaks_alone_are_reported SANITIZER COMMAND...: of plug-ins in C and in C++, with the library as it is
-# and stripped. COMMAND runs the client, and is the checker where SANITIZER is empty.
+# leaks_alone_are_reported SANITIZER COMMAND...: of plug-ins in C and in C++, with the library as it
+# is and stripped. COMMAND runs the client, and is the checker where SANITIZER is empty.
 leaks_alone_are_reported() {
   local sanitize=${1:+-fsanitize=$1} library language compiler flags
   shift
@@ -52,8 +54,8 @@ leaks_alone_are_reported() {
       compiler=$cc
       [ "$language" = c ] || compiler=$cxx
       "$compiler" ${sanitize:+"$sanitize"} -shared -fPIC -x "$language" \
-        "$source/tests/consumers/leaks/plugin.c" -x none "${flags[@]}" -Wl,-rpath,"$library/$libdir" \
-        -o "$scratch/plugin.so"
+        "$source/tests/consumers/leaks/plugin.c" -x none "${flags[@]}" \
+        -Wl,-rpath,"$library/$libdir" -o "$scratch/plugin.so"
       expect_leaks '' "$@" "$scratch/client" "$scratch/plugin.so"
       expect_leaks '2 3 8 77 256' "$@" "$scratch/client" "$scratch/plugin.so" forgetful
     done
@@ -71,9 +73,10 @@ case $1 in
     fi
     ;;
   commands_of_the_readme_work)
-    # In their order, with another prefix and this build. Packages are installed by packages_test.sh.
+    # In their order, with another prefix and this build. packages_test.sh installs the packages.
     sed -n '/^## Installing/,/^## Working/p' "$source/README.md" |
-      awk '/^```/ {on = $0 == "```sh"; next} on' | sed "/^sudo apt/d; s#/opt/qel#$scratch/qel#g" >"$scratch/commands"
+      awk '/^```/ {on = $0 == "```sh"; next} on' |
+      sed "/^sudo apt/d; s#/opt/qel#$scratch/qel#g" >"$scratch/commands"
     mkdir -p "$scratch/build"
     ln -s "$build" "$scratch/build/release"
     cp "$source/tests/consumers/c/plugin.c" "$scratch"
@@ -119,7 +122,8 @@ case $1 in
   c_plugin_runs) c_plugin_runs "$tree" ;;
   c_plugin_reads_one_header_of_the_tree)
     # The compiler's and the C library's lie elsewhere.
-    read_headers=$(compile_c "$tree" -fsyntax-only -H 2>&1 | sed -n 's/^\.\.* //p' | xargs -d '\n' realpath)
+    read_headers=$(compile_c "$tree" -fsyntax-only -H 2>&1 | sed -n 's/^\.\.* //p' |
+      xargs -d '\n' realpath)
     others=$(grep -v '^/usr/' <<<"$read_headers")
     [ "$others" = "$tree/include/qel-message-protosvc/qel-message-serialize.h" ] || fail "$others"
     ;;
@@ -141,10 +145,12 @@ case $1 in
   classes_module_compiles_with_pkg_config)
     # The runtime's own build leaves a blank in its prefix as it is.
     mkdir "$scratch/runtime"
-    sed "s#^prefix=.*#prefix=${protobuf// /\\\\ }#" "$protobuf/lib/pkgconfig/protobuf.pc" >"$scratch/runtime/protobuf.pc"
+    sed "s#^prefix=.*#prefix=${protobuf// /\\\\ }#" "$protobuf/lib/pkgconfig/protobuf.pc" \
+      >"$scratch/runtime/protobuf.pc"
     export PKG_CONFIG_PATH=$tree/$libdir/pkgconfig:$scratch/runtime
     eval "flags=($(pkg-config --cflags --libs qel-message-protosvc-classes))"
-    "$cxx" "$source/tests/consumers/classes/module.cc" "${flags[@]}" -Wl,-rpath,"$tree/$libdir" -o "$scratch/module"
+    "$cxx" "$source/tests/consumers/classes/module.cc" "${flags[@]}" -Wl,-rpath,"$tree/$libdir" \
+      -o "$scratch/module"
     prints 'ClientEcho 7' "$tree" "$scratch/module"
     ;;
   linkers_are_told_where_others_lie)
@@ -162,11 +168,13 @@ case $1 in
   pkg_config_takes_classes_of_one_series_and_version)
     export PKG_CONFIG_PATH=$scratch
     while read -r runtime library answer; do
-      sed "s/^Version:.*/Version: $runtime/" "$protobuf/lib/pkgconfig/protobuf.pc" >"$scratch/protobuf.pc"
+      sed "s/^Version:.*/Version: $runtime/" "$protobuf/lib/pkgconfig/protobuf.pc" \
+        >"$scratch/protobuf.pc"
       cp "$tree/$libdir/pkgconfig/"*.pc "$scratch"
       sed -i "s/^Version:.*/Version: $library/" "$scratch/qel-message-protosvc.pc"
       said=$(pkg-config --print-errors --exists qel-message-protosvc-classes 2>&1) && said=taken
-      [[ $said == *"$answer"* ]] || fail "runtime $runtime, library $library: expected '$answer', said '$said'"
+      [[ $said == *"$answer"* ]] ||
+        fail "runtime $runtime, library $library: expected '$answer', said '$said'"
     done <<TXT
 2.6.1 $version taken
 2.5.9 $version 'protobuf >= 2.6
@@ -176,7 +184,8 @@ TXT
     ;;
   versions_of_one_first_number_are_compatible)
     cp -r "$tree" "$scratch/tree"
-    sed -i "s/$version/1.2.3/g" "$scratch/tree/$libdir/cmake/qel-message-protosvc/qel-message-protosvc-config-version.cmake"
+    sed -i "s/$version/1.2.3/g" \
+      "$scratch/tree/$libdir/cmake/qel-message-protosvc/qel-message-protosvc-config-version.cmake"
     cat >"$scratch/CMakeLists.txt" <<'TXT'
 cmake_minimum_required(VERSION 3.25)
 project(consumer C)
@@ -188,7 +197,8 @@ foreach(asked 0.9 1 1.0 1.2.3 1.2.4 1.3 2.0 "1.2.3;EXACT" "1.2.2;EXACT")
   unset(qel-message-protosvc_DIR CACHE)
 endforeach()
 TXT
-    cmake -S "$scratch" -B "$scratch/built" -G Ninja -DCMAKE_PREFIX_PATH="$scratch/tree" 2>"$scratch/messages"
+    cmake -S "$scratch" -B "$scratch/built" -G Ninja -DCMAKE_PREFIX_PATH="$scratch/tree" \
+      2>"$scratch/messages"
     diff <(printf 'taken for: %s\n' 1 1.0 1.2.3 '1.2.3;EXACT') "$scratch/messages" >&2
     ;;
   projects_of_old_policies_find_it)
