@@ -8,3 +8,33 @@ if(CMAKE_LIBRARY_ARCHITECTURE AND NOT CMAKE_SYSROOT)
     "Folder of libraries in the prefix")
 endif()
 include(GNUInstallDirs)
+
+# CMake makes folders as the umask has it. Those that an installation makes are for all to read;
+# those that were there stay as they are.
+set(_folders
+  "${CMAKE_INSTALL_BINDIR}"
+  "${CMAKE_INSTALL_INCLUDEDIR}/${PROJECT_NAME}"
+  "${CMAKE_INSTALL_LIBDIR}/pkgconfig"
+  "${CMAKE_INSTALL_LIBDIR}/cmake/${PROJECT_NAME}"
+  "${CMAKE_INSTALL_DATADIR}/${PROJECT_NAME}"
+  "${CMAKE_INSTALL_DATADIR}/bash-completion/completions"
+  "${CMAKE_INSTALL_DOCDIR}/html"
+  "${CMAKE_INSTALL_DOCDIR}-workstation"
+  "${CMAKE_INSTALL_MANDIR}/man3")
+install(CODE "set(qel_folders \"${_folders}\")" ALL_COMPONENTS)
+install(CODE [[
+  set(qel_made "")
+  foreach(folder IN LISTS qel_folders)
+    set(path "$ENV{DESTDIR}${CMAKE_INSTALL_PREFIX}/${folder}")
+    while(NOT EXISTS "${path}")
+      list(APPEND qel_made "${path}")
+      cmake_path(GET path PARENT_PATH path)
+    endwhile()
+  endforeach()]] ALL_COMPONENTS)
+cmake_language(DEFER CALL install CODE [[
+  foreach(path IN LISTS qel_made)
+    if(EXISTS "${path}")
+      file(CHMOD "${path}" PERMISSIONS OWNER_READ OWNER_WRITE OWNER_EXECUTE GROUP_READ GROUP_EXECUTE
+        WORLD_READ WORLD_EXECUTE)
+    endif()
+  endforeach()]] ALL_COMPONENTS)

@@ -57,20 +57,6 @@ case $1 in
       grep -Eq "\]$function(:? start|: enter)$" "$scratch/err" || fail "$function was not called"
     done
     ;;
-  only_streams_are_kept)
-    # The plug-in under LeakSanitizer, with nothing suppressed.
-    LSAN_OPTIONS=exitcode=0 run --log || fail 'the demo failed'
-    calls=$(grep -E '\][a-z_]+_deserialize(:? start|: enter)$' "$scratch/err" |
-      grep -Evc '\](channel_auth_reply|client_echo)_deserialize ')
-    awk -v calls="$calls" '
-      /leak of [0-9]+ byte\(s\) in [0-9]+ object\(s\)/ {leaks += $7; reports++}
-      /^ +#1 .* in parse / {streams++}
-      END {
-        printf "%d calls that keep a stream, %d leaks, %d reports, %d of them streams\n", calls,
-          leaks, reports, streams
-        exit !(calls > 0 && leaks == calls && streams == reports)
-      }' "$scratch/err" || fail 'something else is kept'
-    ;;
   wrong_token)
     ! run --access-token wrong || fail 'a wrong token is no failure'
     grep -qx 'demo: failed (plug-in 1, front end 1)' "$scratch/err" || fail 'other exit statuses'

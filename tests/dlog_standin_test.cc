@@ -3,33 +3,49 @@
 #include <fcntl.h>
 #include <gtest/gtest.h>
 #include <regex.h>
+#include <sys/socket.h>
 #include <sys/syscall.h>
 #include <termios.h>
 #include <unistd.h>
 
 #include <algorithm>
+#include <chrono>
+#include <cstdint>
+#include <cstdio>
 #include <cstdlib>
+#include <ctime>
 #include <string>
 #include <thread>
+#include <vector>
 
 extern "C" int __dlog_print(int log_id, int priority, const char* tag, const char* format, ...);
 
 namespace {
 
-// What write puts on standard error while that is connected to the descriptor into; read from from.
+// What write puts on standard error while that is connected to the descriptor into; read from from,
+// one read after the other.
 template <typename Write>
-std::string captured(int into, int from, const Write& write) {
+std::vector<std::string> pieces(int into, int from, const Write& write) {
   const int before = dup(STDERR_FILENO);
   dup2(into, STDERR_FILENO);
   write();
   dup2(before, STDERR_FILENO);
   close(before);
 
-  std::string text;
+  std::vector<std::string> read_pieces;
   char chunk[8192];
   fcntl(from, F_SETFL, O_NONBLOCK);
   for (ssize_t n = 0; (n = read(from, chunk, sizeof chunk)) > 0;) {
-    text.append(chunk, static_cast<size_t>(n));
+    read_pieces.emplace_back(chunk, static_cast<size_t>(n));
+  }
+  return read_pieces;
+}
+
+template <typename Write>
+std::string captured(int into, int from, const Write& write) {
+  std::string text;
+  for (const std::string& piece : pieces(into, from, write)) {
+    text += piece;
   }
   return text;
 }
@@ -90,7 +106,15 @@ std::string text_of(const std::string& line) {
   return at == std::string::npos ? "no line: " + line : line.substr(at + 2);
 }
 
-TEST(DlogStandin, WhenCalled_PrintsTimePriorityTagProcessAndThread) {
+class DlogStandin : public ::testing::Test {
+ protected:
+  DlogStandin() {  // whatever the environment of the tests has
+    unsetenv("DLOG_STANDIN_PRIORITY");
+    unsetenv("NO_COLOR");
+  }
+};
+
+TEST_F(DlogStandin, WhenCalled_PrintsTimePriorityTagProcessAndThread) {
   const std::string line =
       on_pipe([] { __dlog_print(0, 5, "TAG", "%s is %d and %lld", "x", -1, 5000000000LL); });
   const std::string process = std::to_string(getpid());
@@ -99,7 +123,40 @@ TEST(DlogStandin, WhenCalled_PrintsTimePriorityTagProcessAndThread) {
   EXPECT_TRUE(matches(line, pattern)) << line;
 }
 
-TEST(DlogStandin, WhenCalledByAnotherThread_PrintsThatThreadsId) {
+int64_t milliseconds_now() {
+  using std::chrono::milliseconds;
+  const auto now = std::chrono::system_clock::now().time_since_epoch();
+  return std::chrono::duration_cast<milliseconds>(now).count();
+}
+
+TEST_F(DlogStandin, WhenCalled_PrintsTheLocalTimeInMilliseconds) {
+  setenv("TZ", "HERE-05:45", 1);
+  tzset();
+  const int64_t before = milliseconds_now();
+  const std::string line = on_pipe([] { __dlog_print(0, 5, "TAG", "text"); });
+  const int64_t after = milliseconds_now();
+
+  int hours = 0;
+  int minutes = 0;
+  int seconds = 0;
+  int fraction = 0;
+  ASSERT_EQ(sscanf(line.c_str(), "%d:%d:%d.%d", &hours, &minutes, &seconds, &fraction), 4) << line;
+  const int64_t local = ((hours * 60 + minutes) * 60 + seconds) * 1000 + fraction;
+  constexpr int64_t kDay = 24 * 60 * 60 * 1000;
+  const int64_t since = (local - (5 * 60 + 45) * 60 * 1000 - before) % kDay;
+  EXPECT_LE((since + kDay) % kDay, after - before) << line;
+}
+
+TEST_F(DlogStandin, WhenCalled_WritesTheLineAtOnce) {
+  int ends[2];
+  ASSERT_EQ(socketpair(AF_UNIX, SOCK_SEQPACKET, 0, ends), 0);
+  const auto writes = pieces(ends[1], ends[0], [] { __dlog_print(0, 5, "TAG", "text"); });
+  EXPECT_EQ(writes.size(), 1u);
+  close(ends[0]);
+  close(ends[1]);
+}
+
+TEST_F(DlogStandin, WhenCalledByAnotherThread_PrintsThatThreadsId) {
   long id = 0;
   const std::string line = on_pipe([&] {
     std::thread([&] {
@@ -110,7 +167,7 @@ TEST(DlogStandin, WhenCalledByAnotherThread_PrintsThatThreadsId) {
   EXPECT_NE(line.find(" T" + std::to_string(id) + ": text\n"), std::string::npos) << line;
 }
 
-TEST(DlogStandin, OfEachPriority_PrintsTheLetter) {
+TEST_F(DlogStandin, OfEachPriority_PrintsTheLetter) {
   const std::string letters = "??VDIWEFS?";
   for (int priority = 0; priority < static_cast<int>(letters.size()); ++priority) {
     const std::string line = on_pipe([&] { __dlog_print(0, priority, "TAG", "text"); });
@@ -118,12 +175,12 @@ TEST(DlogStandin, OfEachPriority_PrintsTheLetter) {
   }
 }
 
-TEST(DlogStandin, WhenPriorityIsNegative_PrintsAQuestionMark) {
+TEST_F(DlogStandin, WhenPriorityIsNegative_PrintsAQuestionMark) {
   const std::string line = on_pipe([] { __dlog_print(0, -1, "TAG", "text"); });
   EXPECT_EQ(line.substr(13, 2), "? ");
 }
 
-TEST(DlogStandin, OnATerminal_KeepsColours) {
+TEST_F(DlogStandin, OnATerminal_KeepsColours) {
   const Terminal terminal;
   if (!terminal.exists()) {
     GTEST_SKIP() << "no pseudo-terminals on this machine";
@@ -133,17 +190,29 @@ TEST(DlogStandin, OnATerminal_KeepsColours) {
   EXPECT_EQ(text_of(line), "a \033[31m[7]b\033[0m\n");
 }
 
-TEST(DlogStandin, ElsewhereThanOnATerminal_RemovesColours) {
+TEST_F(DlogStandin, OnATerminalWithNoColorSet_RemovesColours) {
+  const Terminal terminal;
+  if (!terminal.exists()) {
+    GTEST_SKIP() << "no pseudo-terminals on this machine";
+  }
+  const auto write = [] { __dlog_print(0, 6, "T", "a \033[31m[%d]b\033[0m", 7); };
+  setenv("NO_COLOR", "1", 1);
+  EXPECT_EQ(text_of(terminal.captured(write)), "a [7]b\n");
+  setenv("NO_COLOR", "", 1);
+  EXPECT_EQ(text_of(terminal.captured(write)), "a \033[31m[7]b\033[0m\n");
+}
+
+TEST_F(DlogStandin, ElsewhereThanOnATerminal_RemovesColours) {
   const std::string line = on_pipe([] { __dlog_print(0, 6, "T", "a \033[31m[%d]b\033[0m", 7); });
   EXPECT_EQ(text_of(line), "a [7]b\n");
 }
 
-TEST(DlogStandin, WhenTextHasALineBreak_StaysOneLine) {
+TEST_F(DlogStandin, WhenTextHasALineBreak_StaysOneLine) {
   const std::string line = on_pipe([] { __dlog_print(0, 3, "T", "count=3\n\033[0m"); });
   EXPECT_EQ(text_of(line), "count=3\\n\n");
 }
 
-TEST(DlogStandin, WhenTextIsTooLong_PrintsOneLineOf4096Bytes) {
+TEST_F(DlogStandin, WhenTextIsTooLong_PrintsOneLineOf4096Bytes) {
   const std::string text(10000, 'x');
   const std::string line = on_pipe([&] { __dlog_print(0, 3, "T", "%s", text.c_str()); });
   EXPECT_LE(line.size(), 4096u);
@@ -152,7 +221,7 @@ TEST(DlogStandin, WhenTextIsTooLong_PrintsOneLineOf4096Bytes) {
   EXPECT_EQ(line.back(), '\n');
 }
 
-TEST(DlogStandin, WhenAColouredTextIsTooLong_EndsTheColour) {
+TEST_F(DlogStandin, WhenAColouredTextIsTooLong_EndsTheColour) {
   const Terminal terminal;
   if (!terminal.exists()) {
     GTEST_SKIP() << "no pseudo-terminals on this machine";
@@ -164,24 +233,27 @@ TEST(DlogStandin, WhenAColouredTextIsTooLong_EndsTheColour) {
   EXPECT_EQ(line.substr(line.size() - 6), "x\033[0m\n");
 }
 
-TEST(DlogStandin, WhenTagIsTooLong_PrintsOneLine) {
+TEST_F(DlogStandin, WhenTagIsTooLong_PrintsOneLine) {
   const std::string tag(10000, 'x');
   const std::string line = on_pipe([&] { __dlog_print(0, 3, tag.c_str(), "text"); });
   EXPECT_LE(line.size(), 4096u);
   EXPECT_EQ(line.back(), '\n');
 }
 
-TEST(DlogStandin, WhenAPriorityIsAskedFor_PrintsItAndThoseAbove) {
+TEST_F(DlogStandin, WhenAPriorityIsAskedFor_PrintsItAndThoseAbove) {
   setenv("DLOG_STANDIN_PRIORITY", "W", 1);
   EXPECT_EQ(on_pipe([] { __dlog_print(0, 4, "T", "text"); }), "");
   EXPECT_NE(on_pipe([] { __dlog_print(0, 5, "T", "text"); }), "");
-  unsetenv("DLOG_STANDIN_PRIORITY");
 }
 
-TEST(DlogStandin, WhenSilenceIsAskedFor_PrintsNothing) {
+TEST_F(DlogStandin, WhenSilenceIsAskedFor_PrintsNothing) {
   setenv("DLOG_STANDIN_PRIORITY", "S", 1);
   EXPECT_EQ(on_pipe([] { __dlog_print(0, 6, "T", "text"); }), "");
-  unsetenv("DLOG_STANDIN_PRIORITY");
+}
+
+TEST_F(DlogStandin, WhenThePrioritySettingIsEmpty_PrintsAll) {
+  setenv("DLOG_STANDIN_PRIORITY", "", 1);
+  EXPECT_NE(on_pipe([] { __dlog_print(0, 2, "T", "text"); }), "");
 }
 
 }  // namespace

@@ -28,6 +28,40 @@ refused() {
 
 expect() { [[ $messages == *"$1"* ]] || fail "expected: $1"$'\n'"said: $messages"; }
 
+# expect_leaks LOST COMMAND...: the checker reports blocks of these sizes and no others.
+expect_leaks() {
+  local lost=$1 reported
+  shift
+  DLOG_STANDIN_PRIORITY=S "$@" >"$scratch/messages" 2>&1 || [ -n "$lost" ] ||
+    fail "$(cat "$scratch/messages")"
+  reported=$(sed -nE "s/.* ([0-9]+) (\([^)]*\) )?bytes in .* lost in loss record.*/\1/p
+    s/.* leak of ([0-9]+) byte\(s\) in .*/\1/p" "$scratch/messages" | sort -n | xargs)
+  [ "$reported" = "$lost" ] ||
+    fail "lost are '$lost', reported '$reported'"$'\n'"$(cat "$scratch/messages")"
+}
+
+# leaks_alone_are_reported SANITIZER COMMAND...: of plug-ins in C and in C++, with the library as it
+# is and stripped. COMMAND runs the client, and is the checker where SANITIZER is empty.
+leaks_alone_are_reported() {
+  local sanitize=${1:+-fsanitize=$1} library language compiler flags
+  shift
+  cp -r "$tree" "$scratch/stripped"
+  strip --strip-unneeded "$scratch/stripped/$libdir/libqel-message-protosvc.so.$version"
+  "$cc" ${sanitize:+"$sanitize"} "$source/tests/consumers/leaks/client.c" -ldl -o "$scratch/client"
+  for library in "$tree" "$scratch/stripped"; do
+    flags_of "$library" qel-message-protosvc
+    for language in c c++; do
+      compiler=$cc
+      [ "$language" = c ] || compiler=$cxx
+      "$compiler" ${sanitize:+"$sanitize"} -shared -fPIC -x "$language" \
+        "$source/tests/consumers/leaks/plugin.c" -x none "${flags[@]}" \
+        -Wl,-rpath,"$library/$libdir" -o "$scratch/plugin.so"
+      expect_leaks '' "$@" "$scratch/client" "$scratch/plugin.so"
+      expect_leaks '2 3 8 77 256' "$@" "$scratch/client" "$scratch/plugin.so" forgetful
+    done
+  done
+}
+
 case $1 in
   set_up)
     rm -rf "$build/install-test"
@@ -39,16 +73,19 @@ case $1 in
     fi
     ;;
   commands_of_the_readme_work)
-    # In their order, with another prefix and this build.
-    sed -n '/^## Installing/,/^or, with/p' "$source/README.md" | awk '/^```/ {on = $0 == "```sh"; next} on' |
-      sed "s#/opt/qel#$scratch/qel#g" >"$scratch/commands"
+    # In their order, with another prefix and this build. packages_test.sh installs the packages.
+    sed -n '/^## Installing/,/^## Working/p' "$source/README.md" |
+      awk '/^```/ {on = $0 == "```sh"; next} on' |
+      sed "/^sudo apt/d; s#/opt/qel#$scratch/qel#g" >"$scratch/commands"
     mkdir -p "$scratch/build"
     ln -s "$build" "$scratch/build/release"
     cp "$source/tests/consumers/c/plugin.c" "$scratch"
+    cp "$source/tests/consumers/c/plugin.c" "$scratch/client.c"
     [ -s "$scratch/commands" ] || fail 'no commands'
     cd "$scratch"
     bash -euo pipefail "$scratch/commands" >"$scratch/messages" 2>&1 || fail "$(cat "$scratch/messages")"
     readelf -dW plugin.so | grep -q "NEEDED.*\[libqel-message-protosvc\.so\.$first\]" || fail 'not linked with it'
+    grep -q 'ERROR SUMMARY: 0 errors' "$scratch/messages" || fail "$(cat "$scratch/messages")"
     ;;
   runtime_is_the_shared_object_alone)
     install_component runtime
@@ -58,6 +95,14 @@ case $1 in
   development_has_no_shared_object)
     install_component development
     ! grep -F '.so.' <<<"$files" >&2 || exit 1
+    ;;
+  all_can_be_read_whatever_the_umask)
+    umask 077
+    mkdir "$scratch/private"
+    cmake --install "$build" --prefix "$scratch/private/opt/qel" >"$scratch/messages"
+    modes=$(find "$scratch/private" -mindepth 1 -printf '%M\n' | sort -u | xargs)
+    [[ $modes =~ ^-rw-r--r--( -rwxr-xr-x)?' drwxr-xr-x lrwxrwxrwx'$ ]] || fail "$modes"
+    [ "$(stat -c %a "$scratch/private")" = 700 ] || fail 'a folder that was there has changed'
     ;;
   soname_has_the_first_number)
     dynamic=$(readelf -dW "$moved/$libdir/libqel-message-protosvc.so")
@@ -77,8 +122,9 @@ case $1 in
   c_plugin_runs) c_plugin_runs "$tree" ;;
   c_plugin_reads_one_header_of_the_tree)
     # The compiler's and the C library's lie elsewhere.
-    read_files=$(compile_c "$tree" -M | tr -s ' \\\n' '\n' | grep -v ':$' | xargs realpath)
-    others=$(grep -Ev "^/usr/|^$source/tests/consumers/" <<<"$read_files")
+    read_headers=$(compile_c "$tree" -fsyntax-only -H 2>&1 | sed -n 's/^\.\.* //p' |
+      xargs -d '\n' realpath)
+    others=$(grep -v '^/usr/' <<<"$read_headers")
     [ "$others" = "$tree/include/qel-message-protosvc/qel-message-serialize.h" ] || fail "$others"
     ;;
   cxx_module_runs)
@@ -89,26 +135,71 @@ case $1 in
     compile_with_cmake "$tree" classes
     prints 'ClientEcho 7' "$tree" "$scratch/built/module"
     ;;
+  leaks_alone_are_reported_by_valgrind)
+    leaks_alone_are_reported '' valgrind --leak-check=full --show-leak-kinds=definite,indirect \
+      --suppressions="$tree/share/qel-message-protosvc/valgrind.supp"
+    ;;
+  leaks_alone_are_reported_by_leak_sanitizer) leaks_alone_are_reported leak ;;
+  leaks_alone_are_reported_by_address_sanitizer) leaks_alone_are_reported address ;;
   tool_runs) prints "qel-wire $version" "$tree" "$tree/bin/qel-wire" --version ;;
   classes_module_compiles_with_pkg_config)
-    export PKG_CONFIG_PATH=$tree/$libdir/pkgconfig:$protobuf/lib/pkgconfig
-    flags=$(pkg-config --cflags --libs qel-message-protosvc-classes)
-    # shellcheck disable=SC2086 # a list of words
-    "$cxx" "$source/tests/consumers/classes/module.cc" $flags -Wl,-rpath,"$tree/$libdir" -o "$scratch/module"
+    # The runtime's own build leaves a blank in its prefix as it is.
+    mkdir "$scratch/runtime"
+    sed "s#^prefix=.*#prefix=${protobuf// /\\\\ }#" "$protobuf/lib/pkgconfig/protobuf.pc" \
+      >"$scratch/runtime/protobuf.pc"
+    export PKG_CONFIG_PATH=$tree/$libdir/pkgconfig:$scratch/runtime
+    eval "flags=($(pkg-config --cflags --libs qel-message-protosvc-classes))"
+    "$cxx" "$source/tests/consumers/classes/module.cc" "${flags[@]}" -Wl,-rpath,"$tree/$libdir" \
+      -o "$scratch/module"
     prints 'ClientEcho 7' "$tree" "$scratch/module"
     ;;
-  pkg_config_refuses_classes_of_another_series)
-    mkdir "$scratch/other"
-    sed 's/^Version:.*/Version: 3.21.12/' "$protobuf/lib/pkgconfig/protobuf.pc" >"$scratch/other/protobuf.pc"
-    export PKG_CONFIG_PATH=$tree/$libdir/pkgconfig:$scratch/other
-    ! messages=$(pkg-config --print-errors --exists qel-message-protosvc-classes 2>&1) ||
-      fail 'was not refused'
-    expect "'protobuf < 2.7'"
+  linkers_are_told_where_others_lie)
+    # Where the library does not look beside itself, as a device's does not.
+    cp -r "$tree" "$scratch/tree"
+    # shellcheck disable=SC2016 # the loader's variable
+    sed -i 's#$ORIGIN#/absent#' "$scratch/tree/$libdir/libqel-message-protosvc.so.$version"
+    flags_of "$scratch/tree" qel-message-protosvc
+    "$cc" "$source/tests/consumers/c/plugin.c" "${flags[@]}" -o "$scratch/plugin"
+    compile_with_cmake "$scratch/tree" cxx -DCMAKE_SKIP_RPATH=ON
+    export LD_LIBRARY_PATH=$scratch/tree/$libdir
+    prints 'probe 7, answer of 2 bytes' "$scratch/tree" "$scratch/plugin"
+    prints 'probe 7, answer of 2 bytes' "$scratch/tree" "$scratch/built/module"
     ;;
-  another_first_number_is_refused)
-    refused "find_package(qel-message-protosvc $((first + 1)).0 REQUIRED)" -DCMAKE_PREFIX_PATH="$tree"
-    expect "compatible with requested version \"$((first + 1)).0\""
-    expect "qel-message-protosvc-config.cmake, version: $version"
+  pkg_config_takes_classes_of_one_series_and_version)
+    export PKG_CONFIG_PATH=$scratch
+    while read -r runtime library answer; do
+      sed "s/^Version:.*/Version: $runtime/" "$protobuf/lib/pkgconfig/protobuf.pc" \
+        >"$scratch/protobuf.pc"
+      cp "$tree/$libdir/pkgconfig/"*.pc "$scratch"
+      sed -i "s/^Version:.*/Version: $library/" "$scratch/qel-message-protosvc.pc"
+      said=$(pkg-config --print-errors --exists qel-message-protosvc-classes 2>&1) && said=taken
+      [[ $said == *"$answer"* ]] ||
+        fail "runtime $runtime, library $library: expected '$answer', said '$said'"
+    done <<TXT
+2.6.1 $version taken
+2.5.9 $version 'protobuf >= 2.6
+2.7.0 $version 'protobuf < 2.7'
+2.6.1 $version.1 'qel-message-protosvc = $version'
+TXT
+    ;;
+  versions_of_one_first_number_are_compatible)
+    cp -r "$tree" "$scratch/tree"
+    sed -i "s/$version/1.2.3/g" \
+      "$scratch/tree/$libdir/cmake/qel-message-protosvc/qel-message-protosvc-config-version.cmake"
+    cat >"$scratch/CMakeLists.txt" <<'TXT'
+cmake_minimum_required(VERSION 3.25)
+project(consumer C)
+foreach(asked 0.9 1 1.0 1.2.3 1.2.4 1.3 2.0 "1.2.3;EXACT" "1.2.2;EXACT")
+  find_package(qel-message-protosvc ${asked} QUIET)
+  if(qel-message-protosvc_FOUND)
+    message("taken for: ${asked}")
+  endif()
+  unset(qel-message-protosvc_DIR CACHE)
+endforeach()
+TXT
+    cmake -S "$scratch" -B "$scratch/built" -G Ninja -DCMAKE_PREFIX_PATH="$scratch/tree" \
+      2>"$scratch/messages"
+    diff <(printf 'taken for: %s\n' 1 1.0 1.2.3 '1.2.3;EXACT') "$scratch/messages" >&2
     ;;
   projects_of_old_policies_find_it)
     printf '%s\n' 'cmake_minimum_required(VERSION 2.8.12)' 'project(consumer C)' \

@@ -45,6 +45,9 @@ pkg_config() {
   fi
 }
 
+# flags_of TREE MODULE: pkg-config's go to the array flags. It quotes for a shell.
+flags_of() { eval "flags=($(pkg_config "$1" --cflags --libs "$2"))"; }
+
 # compile_c TREE OPTION...: the plug-in in C, with the compiler and pkg-config alone. It names the
 # folder of the library itself, which finds the rest.
 compile_c() {
@@ -54,9 +57,8 @@ compile_c() {
     set -- --sysroot="$(root_of "$tree")" "$@"
     folder=/usr/$libdir
   fi
-  flags=$(pkg_config "$tree" --cflags --libs qel-message-protosvc)
-  # shellcheck disable=SC2086 # a list of words
-  "$cc" -std=c99 -pedantic -Wall -Wextra -Werror "$source/tests/consumers/c/plugin.c" $flags \
+  flags_of "$tree" qel-message-protosvc
+  "$cc" -std=c99 -pedantic -Wall -Wextra -Werror "$source/tests/consumers/c/plugin.c" "${flags[@]}" \
     -Wl,-rpath,"$folder" "$@"
 }
 

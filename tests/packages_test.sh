@@ -88,6 +88,7 @@ install_packages() {
 case $1 in
   set_up)
     rm -rf "$packages"
+    umask 077 # whatever it is, all_can_be_read
     cpack --config "$build/CPackConfig.cmake" -B "$packages"
     ;;
   library_has_the_shared_object)
@@ -106,6 +107,7 @@ TXT
 ./usr/$libdir/pkgconfig/qel-message-protosvc-classes.pc
 ./usr/$libdir/pkgconfig/qel-message-protosvc.pc
 ./usr/share/qel-message-protosvc/msgspec_frontend.proto
+./usr/share/qel-message-protosvc/valgrind.supp
 TXT
     ;;
   workstation_has_runtime_and_log_service)
@@ -192,6 +194,12 @@ TXT
     tar -xzf "$archive" -C "$scratch/archive"
     ! grep -rlF -e "$source" -e "$build" -e "$protobuf" "$scratch" >&2 || exit 1
     ;;
+  all_can_be_read)
+    modes=$({ gunzip -c "$archive" | tar -tv && for package in "$packages"/*.deb; do
+      dpkg-deb --fsys-tarfile "$package" | tar -tv
+    done; } | cut -d ' ' -f 1 | sort -u | xargs)
+    [[ $modes =~ ^-rw-r--r--( -rwxr-xr-x)?' drwxr-xr-x lrwxrwxrwx'$ ]] || fail "$modes"
+    ;;
   library_is_not_installed_without_its_runtime)
     make_root
     ! install_packages "$library" || fail 'was installed'
@@ -201,6 +209,17 @@ TXT
     make_root
     install_packages "$library" "$development" "$workstation" || fail "$(cat "$scratch/messages")"
     c_plugin_runs "$root/usr"
+    ;;
+  nothing_is_left_where_they_are_removed)
+    make_root
+    install_packages "$library" "$development" "$workstation" || fail "$(cat "$scratch/messages")"
+    PATH=$PATH:/usr/sbin:/sbin fakeroot dpkg --root="$root" --log=/dev/null --remove \
+      "libqel-message-protosvc$first:$architecture" "libqel-message-protosvc-dev:$architecture" \
+      "qel-message-protosvc-workstation:$architecture" >"$scratch/messages" 2>&1 ||
+      fail "$(cat "$scratch/messages")"
+    left=$(find "$root" -path "$root/var/lib/dpkg" -prune -o \
+      '(' -name '*qel*' -o -name 'libprotobuf*' -o -name 'libdlog*' ')' -print)
+    [ -z "$left" ] || fail "$left"
     ;;
   classes_module_runs_where_they_are_installed)
     make_root

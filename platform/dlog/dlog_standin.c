@@ -4,11 +4,12 @@
  *   10:31:07.251 W MESSAGE_PLUGIN P1234 T1234: text
  *
  * with the local time, the priority's letter, the tag, the process and the thread. Colour escapes
- * stay on a terminal and are removed elsewhere; line breaks inside the text are shown as "\n", so
- * that a call stays a line. What does not fit in a line of 4096 bytes is cut off, as on the device.
+ * stay on a terminal, unless NO_COLOR is set and not empty, and are removed elsewhere; line breaks
+ * inside the text are shown as "\n", so that a call stays a line. What does not fit in a line of
+ * 4096 bytes is cut off, as on the device.
  *
- * DLOG_STANDIN_PRIORITY in the environment, a letter, is the least priority that is printed;
- * S silences all.
+ * DLOG_STANDIN_PRIORITY in the environment, one of the letters below, is the least priority that is
+ * printed; S silences all. Where it is empty or begins otherwise all is printed.
  */
 #define _GNU_SOURCE
 #include <stdarg.h>
@@ -40,6 +41,11 @@ static int is_printed(int priority) {
   const char* least = getenv("DLOG_STANDIN_PRIORITY");
   const char* letter = least != NULL && *least != '\0' ? strchr(priority_letters, *least) : NULL;
   return letter == NULL || priority >= letter - priority_letters;
+}
+
+static int has_colours(void) {
+  const char* no_color = getenv("NO_COLOR");
+  return (no_color == NULL || *no_color == '\0') && isatty(STDERR_FILENO);
 }
 
 /* The character after the colour escape at text, or text if there is none. */
@@ -99,7 +105,7 @@ int __dlog_print(int log_id, int priority, const char* tag, const char* format, 
   if (head >= LINE_LENGTH / 2) {
     head = LINE_LENGTH / 2 - 1; /* a very long tag */
   }
-  length = append_text(line, (size_t)head, text, isatty(STDERR_FILENO));
+  length = append_text(line, (size_t)head, text, has_colours());
   line[length++] = '\n';
   /* One write, so that lines of several threads and processes do not mix. */
   return (int)write(STDERR_FILENO, line, length);
