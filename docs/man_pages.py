@@ -17,9 +17,10 @@ INCLUDE = ".nf\n.B #include <qel\\-message\\-serialize.h>\n.fi\n"
 def description(body):
     """A function's text, with sections and tagged paragraphs instead of bold and italic words."""
     body = re.sub(r"^\n\.PP\n\\fC#include .*\n\.PP\n", "", body)
+    body = re.sub(r"\.PP\n\\fBExamples\\fP\n.*\n.*\n", "", body)  # which are web pages
     body = re.sub(r"^(\\fI.*?\\fP) (.*?) *\n(\.br\n)?", r".TP\n\1\n\2\n", body, flags=re.M)
     body = re.sub(
-        r"\.PP\n\\fB(Who frees what|See also|Examples) *\\fP\n\.RS 4\n(.*?) *\n\.RE\n",
+        r"\.PP\n\\fB(Who frees what|See also) *\\fP\n\.RS 4\n(.*?) *\n\.RE\n",
         lambda match: f'.SH "{match[1].upper()}"\n{match[2]}\n',
         body,
         flags=re.S,

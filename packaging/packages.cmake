@@ -38,7 +38,7 @@ set(CPACK_DEBIAN_DEVELOPMENT_PACKAGE_NAME libqel-message-protosvc-dev)
 set(CPACK_DEBIAN_DEVELOPMENT_PACKAGE_SECTION libdevel)
 set(CPACK_DEBIAN_DEVELOPMENT_PACKAGE_DEPENDS "${_library_package} (= ${PROJECT_VERSION})")
 # The runtime's headers, for users of the classes.
-set(CPACK_DEBIAN_DEVELOPMENT_PACKAGE_SUGGESTS "libprotobuf-dev (>= 2.6), libprotobuf-dev (<< 2.7)")
+set(CPACK_DEBIAN_DEVELOPMENT_PACKAGE_SUGGESTS "libprotobuf-dev (>= 2.6.1), libprotobuf-dev (<< 2.7)")
 set(CPACK_COMPONENT_DEVELOPMENT_DESCRIPTION
   "Headers, schema, pkg-config files and CMake package, for authors of plug-ins in C and of modules
 that use the exported classes.")
