@@ -143,7 +143,7 @@ Depends: libqel-message-protosvc$first (= $version)
 Package: libqel-message-protosvc-dev
 Priority: optional
 Section: libdevel
-Suggests: libprotobuf-dev (>= 2.6), libprotobuf-dev (<< 2.7)
+Suggests: libprotobuf-dev (>= 2.6.1), libprotobuf-dev (<< 2.7)
 Version: $version
 TXT
     ;;
