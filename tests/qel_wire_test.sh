@@ -106,9 +106,18 @@ case $1 in
     exits 2 $'--\033[2J'
     says "qel-wire: there is no option '--\\033[2J', or it takes another value ('qel-wire --help')"
     exits 3 decode ClientEcho $'\033[2J'
-    says 'qel-wire: cannot read \033[2J: No such file or directory'
+    says 'qel-wire: cannot read '"'\\033[2J'"': No such file or directory'
     exits 2 decode $'\033[2J'
     says "qel-wire: there is no message '\\033[2J'; 'qel-wire schema' lists them"
+    ;;
+  complaints_have_no_bytes)
+    for call in '--hx=0801320a7365' '--hex 0801320a7365' 'explain --hex 0801320a7365' \
+      'decode ClientEcho --hex 0801320a7365' 'decode ClientEcho 0801320a7365' 'schema 0801320a7365'; do
+      # shellcheck disable=SC2086
+      "$tool" $call 2>"$scratch/err" >"$scratch/out" </dev/null && fail "taken: $call"
+      [ -s "$scratch/err" ] || fail "no complaint: $call"
+      ! grep -q 0801 "$scratch/err" || fail "the bytes: $call"
+    done
     ;;
   broken_hex)
     exits 1 decode ClientEcho --hex=080
@@ -145,7 +154,7 @@ case $1 in
     for call in 'decode ClientEcho' 'explain ClientEcho' guess 'encode ClientEcho' 'decode ClientEcho --hex'; do
       # shellcheck disable=SC2086
       exits 1 $call /dev/zero
-      says 'qel-wire: the input has more than 64 MiB, which no call takes'
+      says 'qel-wire: the input has more than 64 MiB'
     done
     ;;
   without_memory)
@@ -156,11 +165,11 @@ case $1 in
     ;;
   unreadable_input)
     exits 3 decode ClientEcho "$scratch/nothing"
-    says "qel-wire: cannot read $scratch/nothing: No such file or directory"
+    says "qel-wire: cannot read '$scratch/nothing': No such file or directory"
     exits 3 decode ClientEcho --hex 0807
     says 'qel-wire: there is no such file; bytes in the call itself are written --hex=BYTES, --base64=BYTES'
     exits 3 decode ClientEcho "$scratch"
-    says "qel-wire: cannot read $scratch: Is a directory"
+    says "qel-wire: cannot read '$scratch': Is a directory"
     ;;
   output_that_cannot_be_written)
     status=0

@@ -175,8 +175,49 @@ TEST(HiddenTexts, ThatAreReadAsGroups_HaveOneRow) {
 
 // Another byte for the tag of the token makes it the device's number.
 TEST(HiddenTexts, OfARequestWithoutToken_AreNotShown) {
-  EXPECT_EQ(decoded("ChannelAuthRequest", Wire().number(1, 7).text(4, kToken).bytes()),
-            "requestId: 7\nIMEI: \"(not shown)\"\n");
+  for (const char* end : {"", "32 00"}) {
+    const std::string bytes = Wire().number(1, 7).text(4, kToken).bytes() + hex(end);
+    EXPECT_NE(decoded("ChannelAuthRequest", bytes).find("IMEI: \"(not shown)\"\n"),
+              std::string::npos);
+  }
+}
+
+TEST(HiddenTexts, OfNumber6_NeedNoFourCharacters) {
+  EXPECT_EQ(decoded("ClientEcho", Wire().text(6, "abc").bytes()), "6: \"(not shown)\"\n");
+}
+
+TEST(HiddenTexts, ThatNobodyTypes_AreNotShown) {
+  for (const char* odd : {"\x01", "\x7f", "\xc3"}) {
+    const std::string bytes = Wire().text(2, std::string("fine") + odd).bytes();
+    EXPECT_EQ(decoded("Result", bytes), "msg: \"(not shown)\"\n") << odd;
+  }
+  EXPECT_EQ(decoded("Result", Wire().text(2, "fine\t\r\n").bytes()),
+            "msg: \"fine\\011\\015\\n\"\n");
+}
+
+// The end of a token whose first character is a tag, 'b', and whose second is the length of the
+// rest.
+TEST(HiddenTexts, OfAMessageThatIsAllCharacters_AreNotShown) {
+  const std::string end = "b!" + std::string(33, 'x');
+  EXPECT_EQ(decoded("NotificationReply", end), "notiId: \"(not shown)\"\n");
+  // Numbers can be characters too.
+  EXPECT_EQ(decoded("WrongReceiverDetail", "PpP2"),
+            "without 2 fields that may be a piece of an access token: --show-token shows them\n");
+  EXPECT_EQ(decoded("GetAllUnreadMessageRequest", hex("58 28 60 64")),
+            "requestId: 40\nmaxCount: 100\n");
+}
+
+TEST(HiddenNumbers, BehindAHiddenText_AreShown) {
+  EXPECT_EQ(decoded("InboxEntry", Wire().text(6, "fine").number(10, 200).number(99, 1).bytes()),
+            "chatMsg: \"(not shown)\"\nchatroomId: 200\n99: 1\n");
+}
+
+// The requestId, and tag and length of the result, are characters by chance.
+TEST(HiddenNumbers, WithTheHeadOfARecord_LeaveTheRecord) {
+  EXPECT_EQ(
+      decoded("ChatReply", hex("58 41 6a 21 08 07 12 1d") + std::string(29, 'x') + hex("98 06 01")),
+      "result {\n  code: 7\n  msg: \"(not shown)\"\n}\n99: 1\n"
+      "without 1 field that may be a piece of an access token: --show-token shows them\n");
 }
 
 // A request without appId is an entry too, but for the time.
@@ -185,8 +226,12 @@ TEST(HiddenTexts, OfAnEntry_AreShownIfItTellsWhenItWasSent) {
             "sender: 7\nchatMsg: \"(not shown)\"\n");
   EXPECT_EQ(decoded("InboxEntry", Wire().number(5, 1700000000000).text(6, "hello").bytes()),
             "sentTime: 1700000000000\nchatMsg: \"hello\"\n");
+  EXPECT_EQ(decoded("InboxEntry", Wire().number(5, 1700000000).text(6, "hello").bytes()),
+            "sentTime: 1700000000\nchatMsg: \"(not shown)\"\n");
   EXPECT_EQ(decoded("InboxEntry", Wire().number(4, 7).number(5, 1).text(6, "hello").bytes()),
             "receiver: 7\nsentTime: 1\nchatMsg: \"hello\"\n");
+  EXPECT_EQ(decoded("ForwardUnreadMessage", Wire().message(12, Wire().text(6, "hello")).bytes()),
+            "inboxEntries {\n  chatMsg: \"(not shown)\"\n}\n");
 }
 
 // ---- Whatever carries it

@@ -84,9 +84,9 @@ class Explanation : public Visitor {
 
   void begin(const Piece& piece) override {
     const bool is_text = piece.kind == Piece::kBytes;
-    const bool is_hidden_text = is_text && hidden_.any(piece.value_offset, piece.end);
+    const bool is_hidden_text = is_text && hidden_.hides_text(piece);
     const size_t end = piece.is_container() || is_hidden_text ? piece.value_offset : piece.end;
-    if (!is_text && hidden_.any(piece.offset, end)) {
+    if (!is_text && hidden_.hides_field(piece)) {
       leave_out(piece.offset, end, piece.depth);
       return;
     }
@@ -96,11 +96,10 @@ class Explanation : public Visitor {
   }
 
   void end(const Piece& piece) override {
-    if (piece.kind != Piece::kGroup) {
+    if (piece.kind != Piece::kGroup) {  // others have no bytes at their end
       return;
     }
-    // Alone it has bytes there.
-    if (hidden_.any(piece.end_tag, piece.end)) {
+    if (hidden_.hides_end(piece)) {
       leave_out(piece.end_tag, piece.end, piece.depth);
     } else {
       row(piece.end_tag, piece.end, piece.depth, std::to_string(piece.number) + " end of group");

@@ -57,7 +57,7 @@ which for encode say how the bytes are written.
 
   --json                    decode: as JSON
   --all                     explain: all bytes of long fields; guess: all messages
-  --show-token              the access token, which is hidden otherwise
+  --show-token              decode, explain: what is hidden because it may be the access token
   --color=WHEN              always, never, or auto: on a terminal, unless NO_COLOR is set
   --help, --version
 
@@ -97,6 +97,13 @@ constexpr option kOptions[] = {
     {nullptr, 0, nullptr, 0},
 };
 
+// An argument that a complaint names, but for bytes in the wrong place: these may hold a token.
+std::string named(const std::string& argument) {
+  const bool is_hex =
+      argument.find_first_not_of("0123456789abcdefABCDEF :,x\\") == std::string::npos;
+  return is_hex && argument.size() >= 8 ? qel_wire::kNotShown : "'" + argument + "'";
+}
+
 void take_option(int option, const char* value, Call* call) {
   call->options.push_back(option);
   switch (option) {
@@ -127,7 +134,8 @@ Call read_call(int argc, char** argv) {
   opterr = 0;  // the complaint is ours
   for (int option; (option = getopt_long(argc, argv, "", kOptions, nullptr)) != -1;) {
     if (option == '?') {
-      throw Failure{kWrongCall, std::string("there is no option '") + argv[optind - 1] +
+      const std::string name = argv[optind - 1];
+      throw Failure{kWrongCall, "there is no option '" + name.substr(0, name.find('=')) +
                                     "', or it takes another value ('qel-wire --help')"};
     }
     take_option(option, optarg, &call);
@@ -152,11 +160,11 @@ std::string read_file(const std::string& name) {
     content.append(block, size);
   }
   if (file == nullptr || std::ferror(file.get()) != 0) {
-    throw Failure{kNoAccess, "cannot read " + (is_standard_input ? "standard input" : name) + ": " +
-                                 std::strerror(errno)};
+    throw Failure{kNoAccess, "cannot read " + (is_standard_input ? "standard input" : named(name)) +
+                                 ": " + std::strerror(errno)};
   }
   if (content.size() > qel_wire::kMostBytes) {
-    throw Failure{kBroken, "the input has more than 64 MiB, which no call takes"};
+    throw Failure{kBroken, "the input has more than 64 MiB"};
   }
   return content;
 }
@@ -187,8 +195,8 @@ std::string read_bytes(const Call& call, size_t needed) {
 const Descriptor& message_of(const Call& call) {
   const Descriptor* type = qel_wire::message_named(call.arguments[0]);
   if (type == nullptr) {
-    throw Failure{kWrongCall,
-                  "there is no message '" + call.arguments[0] + "'; 'qel-wire schema' lists them"};
+    throw Failure{kWrongCall, "there is no message " + named(call.arguments[0]) +
+                                  "; 'qel-wire schema' lists them"};
   }
   return *type;
 }
@@ -276,8 +284,8 @@ int schema(const Call& call) {
   const std::string definition =
       qel_wire::schema_of(call.arguments[0], qel_wire::Colours(is_coloured(call)));
   if (definition.empty()) {
-    throw Failure{kWrongCall, "there is no message and no enumeration '" + call.arguments[0] +
-                                  "'; 'qel-wire schema' lists them"};
+    throw Failure{kWrongCall, "there is no message and no enumeration " + named(call.arguments[0]) +
+                                  "; 'qel-wire schema' lists them"};
   }
   std::cout << definition;
   return kDone;
@@ -329,9 +337,9 @@ int run(const Call& call) {
       return command.run(call);
     }
   }
-  throw Failure{kWrongCall, call.command.empty()
-                                ? "a command is missing ('qel-wire --help')"
-                                : "there is no command '" + call.command + "' ('qel-wire --help')"};
+  throw Failure{kWrongCall, call.command.empty() ? "a command is missing ('qel-wire --help')"
+                                                 : "there is no command " + named(call.command) +
+                                                       " ('qel-wire --help')"};
 }
 
 }  // namespace

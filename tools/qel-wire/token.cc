@@ -14,11 +14,15 @@ namespace qel_wire {
 namespace {
 
 using google::protobuf::Descriptor;
+using google::protobuf::FieldDescriptor;
 using google::protobuf::internal::WireFormatLite;
 using google::protobuf::io::CodedOutputStream;
 
 // So many characters in a row may be a piece of a token.
 constexpr size_t kFewestCharacters = 4;
+
+// A request whose numbers are small may be nothing but characters, but is no longer.
+constexpr size_t kLongestSmallRequest = 11;
 
 struct Run {
   size_t characters = 0;
@@ -73,7 +77,9 @@ class Search : public Visitor {
  public:
   Search(std::string_view bytes, const Descriptor& type) : bytes_(bytes), levels_(1) {
     levels_.back().type = &type;
-    hide_if_all_characters(0, bytes.size());
+    if (may_be_end_of_token(bytes, type)) {
+      hide(0, bytes.size());
+    }
   }
 
   void begin(const Piece& piece) override {
@@ -85,13 +91,12 @@ class Search : public Visitor {
     switch (piece.kind) {
       case Piece::kMessage:
         levels_.back().type = piece.field->message_type();
-        hide_if_all_characters(piece.value_offset, piece.end);
         return;
       case Piece::kVarint:
         levels_.back().note_number(piece);
         return;
       case Piece::kBytes:
-        if (is_token(piece) || may_be_request(piece)) {
+        if (is_token(piece) || may_hold_token(piece)) {
           hide(piece.value_offset, piece.end);
         }
         return;
@@ -104,7 +109,7 @@ class Search : public Visitor {
 
   // To be called after the walk.
   std::vector<bool> found(bool is_whole) && {
-    // What damage makes of a request may be read whole, but has no token where it belongs.
+    // A request whose token has become another field by damage has no token.
     const bool lacks_token =
         levels_.front().type == ChannelAuthRequest::descriptor() && !has_token_;
     if (!is_whole || !is_clean_ || lacks_token) {
@@ -129,8 +134,8 @@ class Search : public Visitor {
       }
     }
 
-    // A request without appId looks like an entry, but an entry tells when it was sent.
-    bool may_be_request() const {
+    // A request without appId has the fields of an entry, but no time at which it was sent.
+    bool looks_like_request() const {
       return type == InboxEntry::descriptor() && !has_plausible_time && !(has_time && has_receiver);
     }
   };
@@ -143,20 +148,26 @@ class Search : public Visitor {
     return is_token;
   }
 
-  // Whether a text may hold a request, or be the token of one that is read as another message.
-  bool may_be_request(const Piece& piece) const {
+  // Whether a text may hold a whole request, or be the token of a request that is read as an entry.
+  bool may_hold_token(const Piece& piece) const {
     if (!is_typed(piece.bytes)) {
       return has_telling_run(piece.bytes);
     }
-    return piece.number == InboxEntry::kChatMsgFieldNumber && levels_.back().may_be_request();
+    return piece.number == InboxEntry::kChatMsgFieldNumber && levels_.back().looks_like_request();
   }
 
-  // Of a message: the end of a token may begin with what looks like a field.
-  void hide_if_all_characters(size_t begin, size_t end) {
-    const Run run = characters_at(bytes_.substr(begin, end - begin));
-    if (run.is_telling() && run.bytes == end - begin) {
-      hide(begin, end);
+  // Whether the bytes, tags and lengths included, are rather the end of a token.
+  static bool may_be_end_of_token(std::string_view bytes, const Descriptor& type) {
+    const Run run = characters_at(bytes);
+    if (!run.is_telling() || run.bytes != bytes.size()) {
+      return false;
     }
+    const FieldDescriptor* request_id = type.FindFieldByName("requestId");
+    const bool begins_with_it =
+        request_id != nullptr &&
+        static_cast<unsigned char>(bytes[0]) ==
+            WireFormatLite::MakeTag(request_id->number(), WireFormatLite::WIRETYPE_VARINT);
+    return !begins_with_it || bytes.size() > kLongestSmallRequest;
   }
 
   void hide(size_t begin, size_t end) {
@@ -179,15 +190,27 @@ class Censor : public Visitor {
       : bytes_(bytes), hidden_(hidden), contents_(1) {}
 
   void begin(const Piece& piece) override {
-    const bool is_text = piece.kind == Piece::kBytes;
-    const size_t head_end = piece.is_container() ? piece.value_offset : piece.end;
-    const bool is_left_out = !is_text && hidden_.any(piece.offset, head_end);
-    left_out_ += is_left_out ? 1 : 0;
-    if (piece.is_container()) {
-      contents_.push_back({is_left_out, {}});
-    } else if (is_text && hidden_.any(piece.value_offset, piece.end)) {
-      append_with_length(piece.number, kNotShown);
-    } else if (!is_left_out) {
+    const bool is_within_left_out = contents_.back().is_left_out;
+    switch (piece.kind) {
+      case Piece::kBytes:
+        if (hidden_.hides_text(piece)) {
+          append_with_length(piece.number, kNotShown);
+        } else {
+          append(piece.offset, piece.end);
+        }
+        return;
+      case Piece::kMessage:
+      case Piece::kPacked:
+        contents_.push_back({is_within_left_out, {}});
+        return;
+      default:
+        break;
+    }
+    const bool is_hidden = hidden_.hides_field(piece);
+    left_out_ += is_hidden && !is_within_left_out ? 1 : 0;
+    if (piece.kind == Piece::kGroup) {
+      contents_.push_back({is_hidden || is_within_left_out, {}});
+    } else if (!is_hidden) {
       append(piece.offset, piece.end);
     }
   }
@@ -241,6 +264,21 @@ Hidden::Hidden(std::string_view bytes, const Descriptor& type) {
   Search search(bytes, type);
   const bool is_whole = !walk(bytes, type, &search).has_value();
   hidden_ = std::move(search).found(is_whole);
+}
+
+bool Hidden::hides_text(const Piece& piece) const {
+  return any(piece.value_offset, piece.end);
+}
+
+bool Hidden::hides_field(const Piece& piece) const {
+  // A tag alone, behind a text, tells one character at the most; but groups are nothing but tags.
+  const bool is_tag_shown = piece.kind != Piece::kGroup && !piece.is_element();
+  return any(piece.offset + (is_tag_shown ? 1 : 0),
+             piece.is_container() ? piece.value_offset : piece.end);
+}
+
+bool Hidden::hides_end(const Piece& piece) const {
+  return any(piece.end_tag, piece.end);
 }
 
 bool Hidden::any(size_t begin, size_t end) const {

@@ -9,6 +9,8 @@
 #include <string_view>
 #include <vector>
 
+#include "walk.h"
+
 namespace qel_wire {
 
 // In place of what is hidden.
@@ -26,10 +28,16 @@ class Hidden {
   Hidden(std::string_view bytes, const google::protobuf::Descriptor& type);
 
   bool at(size_t offset) const { return !hidden_.empty() && hidden_[offset]; }
-  // Whether one of them is.
-  bool any(size_t begin, size_t end) const;
+  // Whether the text of the piece, which is kBytes, is hidden.
+  bool hides_text(const Piece& piece) const;
+  // Whether a piece that is no text is hidden: its number, or that there is a container or the end
+  // of a group.
+  bool hides_field(const Piece& piece) const;
+  bool hides_end(const Piece& piece) const;
 
  private:
+  bool any(size_t begin, size_t end) const;
+
   std::vector<bool> hidden_;  // for each byte, or empty if none is
 };
 
