@@ -3,7 +3,7 @@
 # device SDK's for example, is used where QEL_PROTOBUF_ROOT names it. When cross-compiling, the
 # target's runtime is the one of ./dev arm, and its compiler the one of this machine.
 
-set(QEL_PROTOBUF_ROOT "" CACHE PATH "Installation of Protocol Buffers 2.6 (empty: the one of ./dev)")
+set(QEL_PROTOBUF_ROOT "" CACHE PATH "Installation of Protocol Buffers 2.6.1 (empty: the one of ./dev)")
 set(QEL_PROTOC "" CACHE FILEPATH "Compiler of the schema (empty: the installation's, or the one of ./dev when cross-compiling)")
 
 set(_build_command "./dev setup")

@@ -418,7 +418,7 @@ static int take_page(session_t* session, int page_size, bool* has_next) {
   for (i = 0; i < count; ++i) {
     printf("plug-in: stored message %lld from user %lld in chatroom %lld: \"%s\"\n",
            (long long)entries[i]->msgId, (long long)entries[i]->sender,
-           (long long)entries[i]->chatroomId, entries[i]->chatMsg);
+           (long long)entries[i]->chatroomId, shown_text(entries[i]));
     free(entries[i]->chatMsg);
     free(entries[i]);
   }

@@ -50,7 +50,7 @@ static int take_online_message(session_t* session, const frame_t* push) {
   session->last_message = received;
   printf("plug-in: message %lld from user %lld in chatroom %lld: \"%s\"\n",
          (long long)received.msgId, (long long)received.sender, (long long)chatroom,
-         received.chatMsg);
+         shown_text(&received));
   if (skip_reply) {
     return 0;
   }

@@ -28,7 +28,7 @@ while [ $# -gt 0 ]; do
     *) usage ;;
   esac
 done
-[ -n "$log" ] || export DLOG_STANDIN_PRIORITY=S
+[ -n "$log" ] || export DLOG_STANDIN_PRIORITY="${DLOG_STANDIN_PRIORITY:-S}"
 
 scratch=$(mktemp -d) || exit 1
 front_end=

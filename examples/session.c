@@ -37,6 +37,10 @@ int await_message(session_t* session, const char* name, frame_t* frame) {
   }
 }
 
+const char* shown_text(const qel_message_inboxentry_t* message) {
+  return message->msgType == 0 ? message->chatMsg : "(no text)";
+}
+
 /* The outputs tell how the parse went: an id that is not written means that it failed, and a text
    that is not that the reply has no whole result. */
 int check_result(const session_t* session, const char* what, int64_t request_id, int code,

@@ -37,6 +37,10 @@ int await_message(session_t* session, const char* name, frame_t* frame);
 int check_result(const session_t* session, const char* what, int64_t request_id, int code,
                  const char* text, int expected_code);
 
+/* What a user sees of a message: its text, if it is a TEXT. A type that this library does not know
+   reads as TEXT too, so nothing more is done with the text than to show it. */
+const char* shown_text(const qel_message_inboxentry_t* message);
+
 /* Takes a message that the service sends of its own accord. Fails if it is none. */
 int take_push(session_t* session, const frame_t* push);
 

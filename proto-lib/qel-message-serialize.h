@@ -19,16 +19,16 @@
  * not UTF-8 passes through unchanged, after a line of the protocol runtime on standard error.
  *
  * @par
- * What result codes mean, the unit of lifetimes (msgTtl), and since when times count, are the
- * service's matter.
+ * What result codes mean, the unit of lifetimes (msgTtl), and the point in time that times count
+ * from, are the service's matter.
  *
  * @par Serializers
  * They return 0, or -1 after one error line in the log. The last two arguments receive the encoded
  * message: its first byte and its length. The buffer has exactly that length, no terminating NUL
  * and no length prefix; release it with free(). A failed check of an argument leaves both outputs
  * as they were. If the buffer cannot be allocated, *size holds the length and *serialized_data is
- * NULL. If the length is below 1, which no message of these functions is, *size holds it and
- * *serialized_data is as it was.
+ * NULL. If the length is below 1, which only that of more than 2 GiB is, by overflow, *size holds it
+ * and *serialized_data is as it was.
  *
  * @par
  * Values passed by value are always put on the wire, 0 and "" included. A number or a bool that is
@@ -187,8 +187,8 @@ int channel_auth_request_serialize(int64_t requestId, int64_t userId, int64_t de
 /**
  * ChannelAuthReply. All three outputs are written on success, and none of the pointers may be
  * NULL: without a result *resultCode is 0, and without a text *resultMsg is NULL. So empty bytes
- * and most other messages read as a reply with the code 0: compare *requestId with the request's,
- * and give no request the id 0.
+ * and most other messages read as a reply with the code 0: besides the message's kind compare
+ * *requestId with the request's, and give no request the id 0.
  *
  * @param data,size             the received bytes
  * @param requestId             the request that is answered

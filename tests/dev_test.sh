@@ -139,7 +139,7 @@ case $1 in
     configure
     [[ $called != *--fresh* ]] || refuse 'what had not changed since was configured anew'
     ;;
-  full_disk_is_the_reason | first_error_is_the_reason)
+  full_disk_is_the_reason | first_error_is_the_reason | missing_library_is_the_reason)
     all_installed
     message=another
     reason='  1 | its line'
@@ -147,7 +147,11 @@ case $1 in
       message='as: cannot write a.o: No space left on device'
       reason="the disk is full: $message"
     fi
-    said="'a.cc:1:1: error: x' '  1 | its line' '$message' 'b.cc:1:1: error: y' stopped"
+    said="'checking for strerror: yes' 'a.cc:1:1: error: x' '  1 | its line' '$message' 'b.cc:1:1: error: y' stopped"
+    if [ "$1" = missing_library_is_the_reason ]; then
+      reason='ld: cannot find -la'
+      said="'$reason' 'collect2: error: ld returned 1 exit status'"
+    fi
     replace cmake "printf '%s\n' $said; exit 1"
     dev_command='test'
     run "$scratch/checkout" QEL_PROTOBUF_ROOT=/opt

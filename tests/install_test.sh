@@ -137,6 +137,7 @@ case $1 in
     ;;
   leaks_alone_are_reported_by_valgrind)
     leaks_alone_are_reported '' valgrind --leak-check=full --show-leak-kinds=definite,indirect \
+      --errors-for-leak-kinds=definite,indirect \
       --suppressions="$tree/share/qel-message-protosvc/valgrind.supp"
     ;;
   leaks_alone_are_reported_by_leak_sanitizer) leaks_alone_are_reported leak ;;
@@ -177,7 +178,7 @@ case $1 in
         fail "runtime $runtime, library $library: expected '$answer', said '$said'"
     done <<TXT
 2.6.1 $version taken
-2.5.9 $version 'protobuf >= 2.6
+2.6.0 $version 'protobuf >= 2.6.1'
 2.7.0 $version 'protobuf < 2.7'
 2.6.1 $version.1 'qel-message-protosvc = $version'
 TXT

@@ -19,7 +19,7 @@ bool chat_by_its_buffer(const char* text, unsigned char** data, int* size);
 bool chat_by_its_status(const char* text, unsigned char** data, int* size);
 
 bool logged_in_by_the_code(const unsigned char* data, int size);
-bool logged_in_by_the_reply(const unsigned char* data, int size, int64_t request);
+bool logged_in_by_the_reply(const char* name, const unsigned char* data, int size, int64_t request);
 
 int64_t sum_of_counted_receivers(const unsigned char* data, int size);
 int64_t sum_of_listed_receivers(const unsigned char* data, int size, int* count);

@@ -174,18 +174,18 @@ TEST_F(Mistakes, WhenTheCodeIsTakenForALogin_AChatReplyIsOne) {
 }
 
 TEST_F(Mistakes, WhenTheRequestIsCompared_EmptyBytesAreNoLogin) {
-  EXPECT_FALSE(logged_in_by_the_reply(nullptr, 0, 7));
+  EXPECT_FALSE(logged_in_by_the_reply("ChannelAuthReply", nullptr, 0, 7));
 }
 
-TEST_F(Mistakes, WhenTheRequestIsCompared_AChatReplyIsNoLogin) {
-  const Received reply(kChatReply);
-  EXPECT_FALSE(logged_in_by_the_reply(reply.data(), reply.size(), 7));
+TEST_F(Mistakes, WhenTheKindIsCompared_AnEchoProbeWithTheSameIdIsNoLogin) {
+  const Received probe(support::hex("08 07"));
+  EXPECT_FALSE(logged_in_by_the_reply("ClientEcho", probe.data(), probe.size(), 7));
 }
 
 // Whether it answers the request 7.
 bool is_login(int code) {
   const Received reply(Wire().number(1, 7).message(2, Wire().number(1, code)).bytes());
-  return logged_in_by_the_reply(reply.data(), reply.size(), 7);
+  return logged_in_by_the_reply("ChannelAuthReply", reply.data(), reply.size(), 7);
 }
 
 TEST_F(Mistakes, WhenTheRequestIsCompared_AReplyWithTheCodeZeroIsALogin) {
