@@ -27,8 +27,8 @@
  * message: its first byte and its length. The buffer has exactly that length, no terminating NUL
  * and no length prefix; release it with free(). A failed check of an argument leaves both outputs
  * as they were. If the buffer cannot be allocated, *size holds the length and *serialized_data is
- * NULL. If the length is below 1, which only that of more than 2 GiB is, by overflow, *size holds it
- * and *serialized_data is as it was.
+ * NULL. If the length is below 1, as that of more than 2 GiB is by overflow, *size holds it and
+ * *serialized_data is as it was.
  *
  * @par
  * Values passed by value are always put on the wire, 0 and "" included. A number or a bool that is
