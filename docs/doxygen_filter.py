@@ -18,10 +18,6 @@ import sys
 
 IMAGE_OR_LINK = re.compile(r"(!?)\[((?:[^][]|\[[^][]*\])*)\]\(([^()\s]+)\)")
 
-# The sources in the reference: the header, and those of docs/examples.dox.
-SOURCES = ["proto-lib/qel-message-serialize.h", "examples/plugin_session.c", "examples/pushes.c",
-           "examples/framing.h"]
-
 
 def slug(heading):
     """The anchor that viewers of Markdown give a heading, if it is the first of its kind."""
@@ -36,6 +32,13 @@ def name_of(page, anchor=""):
     return f"{name}_{anchor}" if anchor else name
 
 
+def sources():
+    """Those in the reference: the header, and the examples."""
+    with open("docs/examples.dox", encoding="utf-8") as file:
+        examples = re.findall(r"@example (\S+)", file.read())
+    return ["proto-lib/qel-message-serialize.h"] + [f"examples/{name}" for name in examples]
+
+
 def link(match, page):
     image, text, target = match.groups()
     if image or re.match(r"\w+:", target):
@@ -45,7 +48,7 @@ def link(match, page):
     path = os.path.normpath(os.path.join(os.path.dirname(page), path)) if path else page
     if path.endswith(".md"):
         return f"[{plain}](@ref {name_of(path, anchor)})"
-    if path in SOURCES:
+    if path in sources():
         return f"[{plain}](@ref {os.path.basename(path)})"
     return text
 

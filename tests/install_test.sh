@@ -7,7 +7,7 @@ export LC_ALL=C
 # shellcheck source=SCRIPTDIR/installed.sh
 . "$(dirname "$0")/installed.sh"
 name_arguments "$@"
-moved=$build/install-test/moved
+moved="$build/install-test/a prefix/moved" # as users' prefixes may have a blank, too
 tree=$moved
 [ -z "$toolchain" ] || tree=$build/install-test/sysroot/usr
 
@@ -66,6 +66,7 @@ case $1 in
   set_up)
     rm -rf "$build/install-test"
     cmake --install "$build" --prefix "$build/install-test/made"
+    mkdir "${moved%/*}"
     mv "$build/install-test/made" "$moved"
     if [ -n "$toolchain" ]; then # with what the classes need of others
       make_sysroot "$triple" "${tree%/usr}"
@@ -144,11 +145,11 @@ case $1 in
   leaks_alone_are_reported_by_address_sanitizer) leaks_alone_are_reported address ;;
   tool_runs) prints "qel-wire $version" "$tree" "$tree/bin/qel-wire" --version ;;
   classes_module_compiles_with_pkg_config)
-    # The runtime's own build leaves a blank in its prefix as it is.
-    mkdir "$scratch/runtime"
-    sed "s#^prefix=.*#prefix=${protobuf// /\\\\ }#" "$protobuf/lib/pkgconfig/protobuf.pc" \
-      >"$scratch/runtime/protobuf.pc"
-    export PKG_CONFIG_PATH=$tree/$libdir/pkgconfig:$scratch/runtime
+    # The runtime in a path with a blank, which its own build leaves as it is.
+    ln -s "$protobuf" "$scratch/a runtime"
+    sed "s#^prefix=.*#prefix=$scratch/a\\\\ runtime#" "$protobuf/lib/pkgconfig/protobuf.pc" \
+      >"$scratch/protobuf.pc"
+    export PKG_CONFIG_PATH=$tree/$libdir/pkgconfig:$scratch
     eval "flags=($(pkg-config --cflags --libs qel-message-protosvc-classes))"
     "$cxx" "$source/tests/consumers/classes/module.cc" "${flags[@]}" -Wl,-rpath,"$tree/$libdir" \
       -o "$scratch/module"

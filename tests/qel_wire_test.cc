@@ -22,7 +22,6 @@
 namespace {
 
 using google::protobuf::Message;
-using google::protobuf::MessageFactory;
 using qel_wire::ExplainOptions;
 using qel_wire::Fit;
 using qel_wire::Notation;
@@ -37,8 +36,7 @@ std::string explained(const std::string& message, const std::string& bytes,
 }
 
 std::unique_ptr<Message> parsed(const std::string& name, const std::string& bytes) {
-  const auto* type = qel_wire::message_named(name);
-  std::unique_ptr<Message> message(MessageFactory::generated_factory()->GetPrototype(type)->New());
+  std::unique_ptr<Message> message = qel_wire::new_message(*qel_wire::message_named(name));
   EXPECT_TRUE(message->ParseFromString(bytes)) << name;
   return message;
 }

@@ -8,6 +8,7 @@
 #include <stdexcept>
 
 #include "forms.h"
+#include "schema.h"
 #include "token.h"
 
 namespace qel_wire {
@@ -15,7 +16,6 @@ namespace {
 
 using google::protobuf::Descriptor;
 using google::protobuf::Message;
-using google::protobuf::MessageFactory;
 using google::protobuf::io::CodedInputStream;
 
 // Looks for fields that no encoder writes there.
@@ -44,7 +44,7 @@ class Order : public Visitor {
 };
 
 std::unique_ptr<Message> parsed(std::string_view bytes, const Descriptor& type) {
-  std::unique_ptr<Message> message(MessageFactory::generated_factory()->GetPrototype(&type)->New());
+  std::unique_ptr<Message> message = new_message(type);
   CodedInputStream stream(reinterpret_cast<const google::protobuf::uint8*>(bytes.data()),
                           static_cast<int>(bytes.size()));
   // What stands for hidden texts may be longer than they.

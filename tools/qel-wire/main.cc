@@ -30,8 +30,6 @@
 namespace {
 
 using google::protobuf::Descriptor;
-using google::protobuf::Message;
-using google::protobuf::MessageFactory;
 using qel_wire::Notation;
 
 // What the program exits with.
@@ -228,8 +226,7 @@ int decode(const Call& call) {
 }
 
 int encode(const Call& call) {
-  const std::unique_ptr<Message> message(
-      MessageFactory::generated_factory()->GetPrototype(&message_of(call))->New());
+  const auto message = qel_wire::new_message(message_of(call));
   if (call.written.has_value()) {
     throw Failure{kWrongCall, "encode takes a text: --hex and --base64 have no bytes there"};
   }

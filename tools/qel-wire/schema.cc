@@ -11,6 +11,8 @@ namespace {
 using google::protobuf::Descriptor;
 using google::protobuf::EnumDescriptor;
 using google::protobuf::FileDescriptor;
+using google::protobuf::Message;
+using google::protobuf::MessageFactory;
 
 const FileDescriptor& file() {
   return *ChannelAuthRequest::descriptor()->file();
@@ -43,6 +45,10 @@ std::pair<size_t, size_t> find_name(const std::string& line) {
 
 const Descriptor* message_named(const std::string& name) {
   return file().FindMessageTypeByName(name);
+}
+
+std::unique_ptr<Message> new_message(const Descriptor& type) {
+  return std::unique_ptr<Message>(MessageFactory::generated_factory()->GetPrototype(&type)->New());
 }
 
 std::string schema_names() {

@@ -178,7 +178,7 @@ class Search : public Visitor {
 
   std::string_view bytes_;
   std::vector<bool> hidden_;
-  bool is_clean_ = true;  // as an encoder writes it
+  bool is_clean_ = true;  // known fields alone, in their order
   bool has_token_ = false;
   std::vector<Level> levels_;  // of nesting
 };
@@ -282,12 +282,11 @@ bool Hidden::hides_end(const Piece& piece) const {
 }
 
 bool Hidden::any(size_t begin, size_t end) const {
-  for (size_t at = begin; at < end; ++at) {
-    if (this->at(at)) {
-      return true;
-    }
+  if (hidden_.empty()) {
+    return false;
   }
-  return false;
+  const auto last = hidden_.begin() + static_cast<std::ptrdiff_t>(end);
+  return std::find(hidden_.begin() + static_cast<std::ptrdiff_t>(begin), last, true) != last;
 }
 
 Censored censored(std::string_view bytes, const Descriptor& type, const Hidden& hidden) {

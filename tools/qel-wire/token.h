@@ -19,9 +19,9 @@ constexpr char kNotShown[] = "(not shown)";
 // Which bytes of the input are not shown, because they may be the access token's.
 //
 // A capture may be read as another message than it is, begin or end anywhere, or be damaged, so a
-// field's name says little. If the bytes are read whole and as an encoder writes them, they are
-// what they seem to be, and their texts are shown but for a few. If not, whatever may be a piece of
-// a text is hidden, wherever it is: a token is text.
+// field's name says little. If the bytes are read whole, and have only known fields in their order,
+// they are taken for what they seem to be, and most texts are shown. If not, whatever may be a
+// piece of a text is hidden, wherever it is: a token is text.
 class Hidden {
  public:
   Hidden() = default;  // nothing
@@ -30,9 +30,9 @@ class Hidden {
   bool at(size_t offset) const { return !hidden_.empty() && hidden_[offset]; }
   // Whether the text of the piece, which is kBytes, is hidden.
   bool hides_text(const Piece& piece) const;
-  // Whether a piece that is no text is hidden: its number, or that there is a container or the end
-  // of a group.
+  // Whether a piece that is no text is hidden: a number, or what a container begins with.
   bool hides_field(const Piece& piece) const;
+  // Whether the end of a group is.
   bool hides_end(const Piece& piece) const;
 
  private:
@@ -43,8 +43,8 @@ class Hidden {
 
 // A message without what is hidden.
 struct Censored {
-  std::string bytes;    // texts that are hidden are kNotShown there
-  size_t left_out = 0;  // other fields that are hidden
+  std::string bytes;    // hidden texts are kNotShown there
+  size_t left_out = 0;  // hidden numbers, and groups
 };
 
 // Of bytes that are read whole.
