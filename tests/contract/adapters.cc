@@ -1,0 +1,184 @@
+#include "adapters.h"
+
+#include <dlfcn.h>
+
+#include <cstdlib>
+#include <map>
+#include <sstream>
+#include <stdexcept>
+#include <tuple>
+
+namespace contract {
+namespace {
+
+void* address(const std::string& function) {
+  static void* library = [] {
+    const char* named = std::getenv("QEL_LIBRARY");
+    void* loaded = dlopen(named != nullptr ? named : QEL_BUILT_LIBRARY, RTLD_NOW);
+    if (loaded == nullptr) {
+      throw std::runtime_error(dlerror());
+    }
+    return loaded;
+  }();
+  void* found = dlsym(library, function.c_str());
+  if (found == nullptr) {
+    throw std::runtime_error(dlerror());
+  }
+  return found;
+}
+
+// A bool goes as the byte that it is, so that a byte that is neither 0 nor 1 can go too.
+template <typename T>
+using Passed = std::conditional_t<std::is_same_v<T, bool>, unsigned char, T>;
+
+using Bind = std::function<Invocation(const std::string& function, Call* call)>;
+
+template <typename R, typename... A>
+Bind adapter(R (* /*declared*/)(A...), const std::string& parameters) {
+  return [=](const std::string& function, Call* call) -> Invocation {
+    std::istringstream names(parameters);
+    std::string name;
+    // In braces, so that they are made in order.
+    const std::tuple<Passed<A>...> arguments{(names >> name, call->argument<Passed<A>>(name))...};
+    R (*called)(Passed<A>...) = nullptr;
+    void* found = address(function);
+    std::memcpy(&called, &found, sizeof called);
+    return [=]() -> std::optional<int> {
+      if constexpr (std::is_void_v<R>) {
+        std::apply(called, arguments);
+        return std::nullopt;
+      } else {
+        return std::apply(called, arguments);
+      }
+    };
+  };
+}
+
+// Nothing of the library is linked with this program: of the functions, only the types are used.
+template <typename F>
+Bind adapter(const std::string& parameters) {
+  return adapter(static_cast<F*>(nullptr), parameters);
+}
+
+const std::map<std::string, Bind>& adapters() {
+  static const std::map<std::string, Bind> all = {
+      {"forward_stored_message_reply_serialize",
+       adapter<decltype(forward_stored_message_reply_serialize)>(
+           "requestId nextPaginationKey maxCount serialized_data size")},
+      {"forward_stored_message_deserialize",
+       adapter<decltype(forward_stored_message_deserialize)>(
+           "data size requestId inboxEntries count nextPaginationKey")},
+      {"channel_auth_request_serialize",
+       adapter<decltype(channel_auth_request_serialize)>(
+           "requestId userId deviceId appId accessToken serialized_data size")},
+      {"channel_auth_reply_deserialize", adapter<decltype(channel_auth_reply_deserialize)>(
+                                             "data size requestId resultCode resultMsg")},
+      {"client_echo_reply_serialize",
+       adapter<decltype(client_echo_reply_serialize)>("requestId serialized_data size")},
+      {"client_echo_deserialize",
+       adapter<decltype(client_echo_deserialize)>("data size requestId")},
+      {"create_chatroom_request_serialize",
+       adapter<decltype(create_chatroom_request_serialize)>(
+           "requestId chatType receivers receiversCount chatroomTitle serialized_data size")},
+      {"create_chatroom_reply_deserialize",
+       adapter<decltype(create_chatroom_reply_deserialize)>(
+           "data size requestId chatroomId msgTtl resultCode resultMsg "
+           "invalidReceivers invalidReceiversCount disabledReceivers disabledReceiversCount "
+           "didViolationUsers didViolationUsersCount invitationDenied invitationDeniedCount")},
+      {"chat_request_serialize",
+       adapter<decltype(chat_request_serialize)>(
+           "requestId chatroomId msgId msgType chatMsg msgTtl reserved serialized_data size")},
+      {"chat_reply_deserialize",
+       adapter<decltype(chat_reply_deserialize)>(
+           "data size requestId chatroomId resultCode resultMsg count msgIds sentTimes")},
+      {"allow_chat_request_serialize",
+       adapter<decltype(allow_chat_request_serialize)>(
+           "requestId chatroomId isAutoAllow maxCount needDeliveryAck lastDeliveryAckTimestamp "
+           "needReadAck lastReadAckTimestamp needOrderedChatroomMemberList needChatroomMeta "
+           "serialized_data size")},
+      {"allow_chat_reply_deserialize",
+       adapter<decltype(allow_chat_reply_deserialize)>(
+           "data size requestId chatroomId resultCode resultMsg "
+           "deliveryAckEntries deliveryAckCount lastDeliveryAckTimestamp "
+           "readAckEntries readAckCount lastReadAckTimestamp members memberCount title msgTtl")},
+      {"get_all_unread_message_request_serialize",
+       adapter<decltype(get_all_unread_message_request_serialize)>(
+           "requestId maxCount serialized_data size")},
+      {"get_all_unread_message_reply_deserialize",
+       adapter<decltype(get_all_unread_message_reply_deserialize)>(
+           "data size requestId resultCode resultMsg")},
+      {"forward_online_message_reply_serialize",
+       adapter<decltype(forward_online_message_reply_serialize)>(
+           "requestId chatroomId markAsRead serialized_data size")},
+      {"forward_online_message_get_deserialize",
+       adapter<decltype(forward_online_message_get_deserialize)>(
+           "data size requestId chatroomId chatType inboxEntry skipReply errorCode errorMsg")},
+      {"forward_unread_message_reply_serialize",
+       adapter<decltype(forward_unread_message_reply_serialize)>(
+           "requestId nextPaginationKey maxCount serialized_data size")},
+      {"forward_unread_message_deserialize",
+       adapter<decltype(forward_unread_message_deserialize)>(
+           "data size requestId inboxEntries count nextPaginationKey")},
+      {"read_message_request_serialize",
+       adapter<decltype(read_message_request_serialize)>(
+           "requestId chatroomId inboxEntry serialized_data size")},
+      {"read_message_reply_deserialize",
+       adapter<decltype(read_message_reply_deserialize)>(
+           "data size requestId chatroomId resultCode resultMsg")},
+      {"end_chat_request_serialize", adapter<decltype(end_chat_request_serialize)>(
+                                         "requestId entries count serialized_data size")},
+      {"end_chat_reply_deserialize",
+       adapter<decltype(end_chat_reply_deserialize)>("data size requestId resultCode resultMsg")},
+      {"invite_chat_request_serialize",
+       adapter<decltype(invite_chat_request_serialize)>(
+           "requestId chatroomId invitingMembers invitingMembersCount serialized_data size")},
+      {"invite_reply_deserialize",
+       adapter<decltype(invite_reply_deserialize)>(
+           "data size requestId chatroomId sentTime resultCode resultMsg "
+           "invalidReceivers invalidReceiversCount interruptedReceivers interruptedReceiversCount "
+           "disabledReceivers disabledReceiversCount existingChatmembers existingChatmembersCount "
+           "didViolationUsers didViolationUsersCount invitationDenied invitationDeniedCount")},
+      {"current_time_request_serialize",
+       adapter<decltype(current_time_request_serialize)>("requestId serialized_data size")},
+      {"current_time_deserialize",
+       adapter<decltype(current_time_deserialize)>(
+           "data size requestId currentTimeMillis resultCode resultMsg")},
+      {"unseal_message_request_serialize",
+       adapter<decltype(unseal_message_request_serialize)>(
+           "requestId chatroomId sender msgId msgDetail serialized_data size")},
+      {"unseal_message_reply_deserialize",
+       adapter<decltype(unseal_message_reply_deserialize)>(
+           "data size requestId chatroomId resultCode resultMsg")},
+      {"save_call_log_request_serialize",
+       adapter<decltype(save_call_log_request_serialize)>(
+           "requestId chatroomId callId callLogType sender receiver conversationSeconds "
+           "serialized_data size")},
+      {"save_call_log_reply_deserialize", adapter<decltype(save_call_log_reply_deserialize)>(
+                                              "data size requestId resultCode resultMsg")},
+      {"is_typing_request_serialize",
+       adapter<decltype(is_typing_request_serialize)>(
+           "requestId chatroomId state contentType refresh serialized_data size")},
+      {"typing_updated_deserialize",
+       adapter<decltype(typing_updated_deserialize)>(
+           "data size requestId chatroomId sender state contentType refresh")},
+      {"change_chatroom_meta_request_serialize",
+       adapter<decltype(change_chatroom_meta_request_serialize)>(
+           "requestId chatroomId title msgTtl serialized_data size")},
+      {"change_chatroom_meta_reply_deserialize",
+       adapter<decltype(change_chatroom_meta_reply_deserialize)>(
+           "data size requestId chatroomId resultCode resultMsg")},
+  };
+  return all;
+}
+
+}  // namespace
+
+Invocation invocation_of(const std::string& function, Call* call) {
+  const auto found = adapters().find(function);
+  if (found == adapters().end()) {
+    throw std::runtime_error("no adapter for " + function);
+  }
+  return found->second(function, call);
+}
+
+}  // namespace contract

@@ -1,0 +1,294 @@
+// The arguments and outputs of one call, made from what a case of the contract gives.
+#ifndef TESTS_CONTRACT_CALL_H
+#define TESTS_CONTRACT_CALL_H
+
+#include <cstring>
+#include <functional>
+#include <map>
+#include <memory>
+#include <nlohmann/json.hpp>
+#include <optional>
+#include <string>
+#include <type_traits>
+#include <utility>
+#include <vector>
+
+#include "doubles.h"
+#include "qel-message-serialize.h"
+
+namespace contract {
+
+using Json = nlohmann::json;
+
+// Bytes spelled in hexadecimal, two digits each, and the other way round.
+std::string bytes_of(const std::string& hex);
+std::string hex_of(const std::string& bytes);
+
+// A text as the contract writes it: as it is, or {hex: ...} where it is no UTF-8.
+std::string text_of(const Json& value);
+Json json_of_text(const std::string& text);
+
+// The blocks of calloc, malloc and strdup that the call has asked for and nobody has freed.
+class Blocks {
+ public:
+  void add(void* block, size_t size) { sizes_[block] = size; }
+  void remove(void* block) { sizes_.erase(block); }
+  // Its size, if it is such a block.
+  std::optional<size_t> size_of(const void* block) const;
+  const std::map<const void*, size_t>& all() const { return sizes_; }
+
+ private:
+  std::map<const void*, size_t> sizes_;
+};
+
+// Shows what memory holds as the contract writes it. Blocks that are pointed to are looked up.
+class Reader {
+ public:
+  explicit Reader(const Blocks& blocks) : blocks_(blocks) {}
+
+  // "unwritten" if every byte is as it was handed out; elements of a record that are so, are left
+  // out.
+  template <typename T>
+  Json read(const T& value) {
+    if (is_fresh(&value, sizeof value)) {
+      return kUnwritten;
+    }
+    if constexpr (std::is_same_v<T, bool>) {
+      unsigned char byte = 0;
+      std::memcpy(&byte, &value, 1);
+      return byte > 1 ? Json(byte) : Json(byte == 1);
+    } else if constexpr (std::is_arithmetic_v<T>) {
+      return value;
+    } else if constexpr (std::is_pointer_v<T>) {
+      return value == nullptr ? Json() : read_block(value);
+    } else {
+      return read_record(value);
+    }
+  }
+
+  // The elements that a block of this size has room for.
+  template <typename T>
+  Json elements(const T* first, size_t bytes) {
+    Json list = Json::array();
+    for (size_t i = 0; i < bytes / sizeof(T); ++i) {
+      list.push_back(read(first[i]));
+    }
+    return list;
+  }
+
+  // A block that is in no output yet: the list itself, or the record of one of its elements.
+  template <typename T>
+  Json read_new_block(const T* block, size_t size, bool is_element) {
+    if constexpr (std::is_same_v<T, unsigned char>) {
+      return hex_of(std::string(reinterpret_cast<const char*>(block), size));
+    } else if constexpr (std::is_pointer_v<T>) {
+      return is_element ? read(*reinterpret_cast<const std::remove_pointer_t<T>*>(block))
+                        : elements(block, size);
+    } else {
+      return elements(block, size);
+    }
+  }
+
+  // Every block that was come across, once for each time.
+  const std::vector<const void*>& seen() const { return seen_; }
+
+  static constexpr const char* kUnwritten = "unwritten";
+
+ private:
+  static bool is_fresh(const void* memory, size_t size);
+
+  template <typename T>
+  Json read_block(T* block) {
+    seen_.push_back(block);
+    const std::optional<size_t> size = blocks_.size_of(block);
+    if (!size) {
+      return "a pointer to no block of calloc, malloc or strdup";
+    }
+    if constexpr (std::is_same_v<T, char>) {
+      return json_of_text(std::string(block, strnlen(block, *size)));
+    } else if constexpr (std::is_same_v<T, unsigned char>) {
+      return hex_of(std::string(reinterpret_cast<const char*>(block), *size));
+    } else if constexpr (std::is_same_v<T, qel_message_watermarkentry_t> ||
+                         std::is_same_v<T, qel_message_chatroommember_t> ||
+                         std::is_same_v<T, qel_message_inboxentry_t>) {
+      return read(*block);  // of these each is a block of its own
+    } else {
+      return elements(block, *size);
+    }
+  }
+
+  Json read_record(const qel_message_didviolationuser_t& pair);
+  Json read_record(const qel_message_watermarkentry_t& mark);
+  Json read_record(const qel_message_chatroommember_t& member);
+  Json read_record(const qel_message_inboxentry_t& entry);
+
+  const Blocks& blocks_;
+  std::vector<const void*> seen_;
+};
+
+class Call {
+ public:
+  // What is not given is 0, false or NULL, but for outputs, which are all there unless null is
+  // given.
+  Call(const Json& given, const std::string& received);
+
+  // As the parameter of this type and name.
+  template <typename T>
+  T argument(const std::string& name);
+
+  // What every output holds. Those that were not written are left out. The blocks handed out are
+  // noted in the reader.
+  Json outputs(Reader* reader) const;
+
+  // What a new block for an output or an element of it shows, if all its bytes are this one.
+  Json blank(const std::string& path, size_t size, unsigned char byte) const;
+
+  // As the log service might do it while the call logs a line.
+  void set(const std::string& output, int value) const;
+
+  // Names that were given and that no parameter has.
+  std::vector<std::string> unknown_names() const;
+
+ private:
+  // An output between bytes that nobody may write.
+  template <typename T>
+  struct Output {
+    unsigned char before[16];
+    T value;
+    unsigned char after[16];
+  };
+
+  template <typename T>
+  T* keep(std::vector<T> values);
+  template <typename T>
+  T* input(const std::string& name);
+  template <typename T>
+  T* output(const std::string& name);
+  qel_message_inboxentry_t inbox_entry(const Json& fields);
+  Json given(const std::string& name);
+  void expect_guards(const std::string& name, const unsigned char (&guard)[16], Json* shown) const;
+
+  Json given_;
+  std::string received_;
+  std::vector<std::string> names_;
+  std::vector<std::shared_ptr<void>> kept_;
+  std::vector<std::pair<std::string, std::function<void(Reader*, Json*)>>> outputs_;
+  std::map<std::string, int*> numbers_;  // of the outputs
+  std::map<std::string, std::function<Json(const void* block, size_t size, bool is_element)>>
+      blanks_;
+};
+
+template <typename T>
+T* Call::keep(std::vector<T> values) {
+  auto kept = std::make_shared<std::vector<T>>(std::move(values));
+  kept_.push_back(kept);
+  return kept->data();
+}
+
+template <typename T>
+T* Call::output(const std::string& name) {
+  if (given_.contains(name) && given_[name].is_null()) {
+    names_.push_back(name);
+    return nullptr;
+  }
+  names_.push_back(name);
+  const auto output = std::make_shared<Output<T>>();
+  std::memset(output.get(), kFreshByte, sizeof *output);
+  kept_.push_back(output);
+  if constexpr (std::is_same_v<T, int>) {
+    numbers_[name] = &output->value;
+  } else if constexpr (std::is_pointer_v<T>) {
+    blanks_[name] = [](const void* block, size_t size, bool is_element) {
+      return Reader(Blocks()).read_new_block(static_cast<const std::remove_pointer_t<T>*>(block),
+                                             size, is_element);
+    };
+  }
+  outputs_.emplace_back(name, [this, name, output](Reader* reader, Json* shown) {
+    Json value = reader->read(output->value);
+    if (value != Reader::kUnwritten) {
+      (*shown)[name] = std::move(value);
+    }
+    expect_guards(name, output->before, shown);
+    expect_guards(name, output->after, shown);
+  });
+  return &output->value;
+}
+
+// Values that callers pass by pointer, and lists of them.
+template <typename T>
+T* Call::input(const std::string& name) {
+  const Json value = given(name);
+  if (value.is_null()) {
+    return nullptr;
+  }
+  std::vector<T> values;
+  for (const Json& element : value.is_array() ? value : Json::array({value})) {
+    if constexpr (std::is_same_v<T, qel_message_inboxentry_t>) {
+      values.push_back(inbox_entry(element));
+    } else if constexpr (std::is_same_v<T, qel_message_endchatentry_t>) {
+      qel_message_endchatentry_t entry = {element.value("chatroomId", int64_t{0}), false};
+      const Json flag = element.value("denyInvitation", Json(false));
+      const auto byte = flag.is_boolean() ? static_cast<unsigned char>(flag.get<bool>())
+                                          : flag.get<unsigned char>();
+      std::memcpy(&entry.denyInvitation, &byte, 1);
+      values.push_back(entry);
+    } else {
+      values.push_back(element.is_boolean() ? static_cast<T>(element.get<bool>())
+                                            : element.get<T>());
+    }
+  }
+  values.shrink_to_fit();  // so that reading beyond it shows
+  return keep(std::move(values));
+}
+
+template <typename T>
+T Call::argument(const std::string& name) {
+  if constexpr (std::is_same_v<T, const unsigned char*>) {  // what was received
+    names_.push_back(name);
+    std::vector<unsigned char> bytes(received_.begin(), received_.end());
+    return keep(std::move(bytes));
+  } else if constexpr (std::is_same_v<T, int> || std::is_same_v<T, int64_t>) {
+    const Json value = given(name);
+    return !value.is_null() ? value.get<T>()
+           : name == "size" ? static_cast<T>(received_.size())
+                            : T{0};
+  } else if constexpr (std::is_same_v<T, unsigned char>) {  // a bool, or a byte that is none
+    const Json value = given(name);
+    return value.is_null()      ? T{0}
+           : value.is_boolean() ? static_cast<T>(value.get<bool>())
+                                : value.get<T>();
+  } else if constexpr (std::is_same_v<T, const char*>) {
+    const Json value = given(name);
+    if (value.is_null()) {
+      return nullptr;
+    }
+    const std::string text = text_of(value);
+    return keep(std::vector<char>(text.c_str(), text.c_str() + text.size() + 1));
+  } else if constexpr (std::is_same_v<T, const char**>) {
+    // {to: null} is a pointer to NULL.
+    const Json value = given(name);
+    if (value.is_null()) {
+      return nullptr;
+    }
+    const char* pointer = nullptr;
+    if (!value.is_object() || !value.contains("to")) {
+      const std::string text = text_of(value);
+      pointer = keep(std::vector<char>(text.c_str(), text.c_str() + text.size() + 1));
+    }
+    return keep(std::vector<const char*>{pointer});
+  } else if constexpr (std::is_same_v<T, const bool*>) {
+    return reinterpret_cast<const bool*>(input<unsigned char>(name));
+  } else if constexpr (std::is_const_v<std::remove_pointer_t<T>>) {
+    return input<std::remove_const_t<std::remove_pointer_t<T>>>(name);
+  } else {
+    return output<std::remove_pointer_t<T>>(name);
+  }
+}
+
+// A record that the caller brings, as the one output of this type.
+template <>
+qel_message_inboxentry_t** Call::argument<qel_message_inboxentry_t**>(const std::string& name);
+
+}  // namespace contract
+
+#endif

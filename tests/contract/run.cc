@@ -1,0 +1,526 @@
+#include "run.h"
+
+#include <sys/mman.h>
+#include <sys/wait.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <array>
+#include <csignal>
+#include <cstdio>
+#include <cstdlib>
+#include <map>
+#include <regex>
+#include <utility>
+
+#include "adapters.h"
+#include "log_statement.h"
+
+namespace contract {
+namespace {
+
+const std::map<std::string, int> kPriorities = {
+    {"debug", 3}, {"info", 4}, {"warn", 5}, {"error", 6}};
+const std::map<std::string, Allocator> kAllocators = {
+    {"calloc", Allocator::kCalloc}, {"malloc", Allocator::kMalloc}, {"strdup", Allocator::kStrdup}};
+const std::map<int, std::string> kColours = {
+    {3, "\033[32m"}, {4, "\033[34m"}, {5, "\033[33m"}, {6, "\033[31m"}};
+
+// Exit codes of a child that is meant to die otherwise.
+constexpr int kProblem = 97;
+constexpr int kReturned = 98;
+
+Json without(Json object, const std::string& key) {
+  object.erase(key);
+  return object;
+}
+
+// The common end of a serializer. If there is no memory, most log this error and return -1.
+void add_encode(const Json& encode, std::vector<Step>* steps) {
+  const std::string hex = encode.at("bytes");
+  const auto length = static_cast<int>(hex.size() / 2);
+  Json block = {{"for", "serialized_data"}, {"count", length}, {"size", 1}};
+  if (encode.contains("refused")) {
+    block["refused"] = encode["refused"];
+  } else {
+    block["refused"] = {{"does", {{{"error", "Could not allocate memory for serialized data"}}}},
+                        {"returns", -1}};
+  }
+  steps->push_back({Step::kWrite, {{"size", length}}});
+  steps->push_back({Step::kBlock, block});
+  steps->push_back({Step::kWrite, {{"serialized_data", hex}}});
+}
+
+std::vector<Step> steps_of(const Json& does) {
+  std::vector<Step> steps;
+  for (const Json& entry : does) {
+    const auto& [key, what] = *entry.items().begin();
+    if (kPriorities.count(key) > 0) {
+      Step step = {Step::kLine, what.is_array() ? what : Json::array({what})};
+      step.priority = kPriorities.at(key);
+      steps.push_back(step);
+    } else if (kAllocators.count(key) > 0) {
+      Step step = {Step::kBlock, what};
+      step.allocator = kAllocators.at(key);
+      steps.push_back(step);
+    } else if (key == "encode") {
+      add_encode(what, &steps);
+    } else if (key == "write") {
+      steps.push_back({Step::kWrite, what});
+    } else if (key == "meanwhile") {
+      steps.push_back({Step::kSet, what});
+    } else {  // parse, copy
+      steps.push_back({Step::kNews, what});
+    }
+  }
+  return steps;
+}
+
+// Whether the path leads into the output of the root: "members[0].name" into "members".
+bool leads_into(const std::string& path, const std::string& root) {
+  return path.compare(0, root.size(), root) == 0 &&
+         (path.size() == root.size() || path[root.size()] == '[' || path[root.size()] == '.');
+}
+
+bool writes_into(const Step& step, const std::string& root) {
+  const auto keys = step.what.items();
+  return step.kind == Step::kWrite && std::any_of(keys.begin(), keys.end(), [&](const auto& item) {
+           return leads_into(item.key(), root);
+         });
+}
+
+void merge(Json* into, const Json& value) {
+  if (into->is_object() && value.is_object()) {
+    for (const auto& [name, element] : value.items()) {
+      merge(&(*into)[name], element);
+    }
+  } else if (into->is_array() && value.is_array() && into->size() == value.size()) {
+    for (size_t i = 0; i < value.size(); ++i) {
+      merge(&(*into)[i], value[i]);
+    }
+  } else {
+    *into = value;
+  }
+}
+
+Json::json_pointer pointer_of(const std::string& path) {
+  std::string pointer = "/" + path;
+  for (const auto& [from, to] : {std::pair("[", "/"), std::pair("]", ""), std::pair(".", "/")}) {
+    for (size_t at = pointer.find(from); at != std::string::npos; at = pointer.find(from)) {
+      pointer.replace(at, 1, to);
+    }
+  }
+  return Json::json_pointer(pointer);
+}
+
+size_t bytes_in(const Json& block) {
+  const Json& size = block.at("size");
+  return block.value("count", size_t{1}) * (size == "pointer" ? sizeof(void*) : size.get<size_t>());
+}
+
+std::string shown(const LogLine& line) {
+  return "priority " + std::to_string(line.priority) + ", " + Json(line.format).dump() + " " +
+         line.arguments.dump();
+}
+
+// The frame that all lines share.
+bool is_in_frame(const LogLine& line, const std::string& function) {
+  static const std::regex kSource("qel-message-serialize\\.[a-z+]+");
+  const Json& arguments = line.arguments;
+  return line.log_id == 0 && line.tag == "MESSAGE_PLUGIN" && arguments.size() >= 4 &&
+         std::regex_match(arguments[0].get<std::string>(), kSource) && arguments[1] == function &&
+         arguments[2].get<int>() > 0 && line.fresh_thread_id != 0 &&
+         arguments[3] == line.fresh_thread_id;
+}
+
+// Whether the process has said this of its end. Compilers name a function's types in two ways.
+bool says_assertion(std::string said, const Json& aborts) {
+  const std::string expected = ": " + aborts.at("in").get<std::string>() + ": Assertion `" +
+                               aborts.at("assertion").get<std::string>() + "' failed.";
+  const size_t qualified = said.find("(::");
+  if (qualified != std::string::npos) {
+    said.erase(qualified + 1, 2);
+  }
+  return said.find(": proto-lib/msgspec_frontend.pb.h:") != std::string::npos &&
+         said.find(expected) != std::string::npos;
+}
+
+}  // namespace
+
+Course course_of(const Json& contract_case) {
+  Course course;
+  course.steps = steps_of(contract_case.at("does"));
+  for (const char* end : {"returns", "aborts", "faults", "throws"}) {
+    if (contract_case.contains(end)) {
+      course.end[end] = contract_case[end];
+    }
+  }
+  for (const Json& entry : contract_case["does"]) {
+    if (entry.contains("parse")) {
+      course.keeps_stream = entry["parse"].at("stream") == "kept";
+    }
+  }
+  return course;
+}
+
+int blocks_of(const Course& course) {
+  return static_cast<int>(std::count_if(course.steps.begin(), course.steps.end(),
+                                        [](const Step& s) { return s.kind == Step::kBlock; }));
+}
+
+Course course_without_block(const Course& course, int n) {
+  Course rest = course;
+  auto step = rest.steps.begin();
+  while (step->kind != Step::kBlock || n-- > 0) {
+    ++step;
+  }
+  step->is_refused = true;
+  const Json block = step->what;
+  if (block.contains("refused")) {
+    const Json& refused = block["refused"];
+    rest.steps.erase(step + 1, rest.steps.end());
+    for (const Step& follows : steps_of(refused.at("does"))) {
+      rest.steps.push_back(follows);
+    }
+    rest.end = without(refused, "does");
+    return rest;
+  }
+  if (step->allocator == Allocator::kStrdup) {
+    return rest;  // NULL is handed out
+  }
+  // Otherwise what is missing is written to.
+  const std::string path = block.at("for");
+  for (++step; step != rest.steps.end(); ++step) {
+    const bool is_slot = step->kind == Step::kBlock && step->what.at("for") != path &&
+                         leads_into(step->what["for"], path);
+    if (is_slot || writes_into(*step, path)) {
+      rest.steps.erase(is_slot ? step + 1 : step, rest.steps.end());
+      rest.steps.push_back({Step::kFault});
+      rest.end = {{"faults", "what could not be allocated is written to"}};
+      return rest;
+    }
+  }
+  return rest;
+}
+
+Run::Run(const Json& contract_case, Course course, int refused_new)
+    : case_(contract_case),
+      course_(std::move(course)),
+      refused_new_(refused_new),
+      function_(contract_case.at("call")),
+      call_(contract_case.value("given", Json::object()),
+            bytes_of(contract_case.value("received", Json::object()).value("bytes", ""))),
+      progress_(static_cast<Progress*>(mmap(nullptr, sizeof(Progress), PROT_READ | PROT_WRITE,
+                                            MAP_SHARED | MAP_ANONYMOUS, -1, 0)),
+                [](Progress* progress) { munmap(progress, sizeof *progress); }) {}
+
+void Run::problem(const std::string& text) {
+  ++progress_->problems;
+  problems_.push_back(text);
+}
+
+Json Run::outputs() {
+  Reader reader(blocks_);
+  return call_.outputs(&reader);
+}
+
+void Run::store(const std::string& path, const Json& value) {
+  merge(&model_[pointer_of(path)], value);
+}
+
+void Run::apply(const Step& step) {
+  for (const auto& [path, value] : step.what.items()) {
+    if (step.kind == Step::kSet) {
+      call_.set(path, value);
+    }
+    store(path, value);
+  }
+}
+
+void Run::compare_outputs(const std::string& when) {
+  const Json got = outputs();
+  if (got != model_) {
+    problem(when + ", the outputs hold\n  " + got.dump() + "\ninstead of\n  " + model_.dump());
+  }
+}
+
+// The step that comes next, if it is of this kind: until there the outputs are written as the case
+// says. After the first problem nothing more is compared.
+const Step* Run::take(Step::Kind kind, const std::string& what) {
+  if (!problems_.empty() || !is_called_) {
+    return nullptr;
+  }
+  while (!is_done() && course_.steps[next_].kind != Step::kLine &&
+         course_.steps[next_].kind != Step::kBlock && course_.steps[next_].kind != Step::kFault) {
+    if (course_.steps[next_].kind != Step::kNews) {
+      apply(course_.steps[next_]);
+    }
+    ++next_;
+  }
+  if (is_done() || course_.steps[next_].kind != kind) {
+    const bool is_ending = is_done() && kind == Step::kBlock &&
+                           (course_.end.contains("throws") || course_.end.contains("aborts"));
+    if (!is_ending) {  // which takes blocks too
+      problem("unexpected: " + what);
+    }
+    return nullptr;
+  }
+  const Step& step = course_.steps[next_];
+  compare_outputs("when it comes to: " + what);
+  ++next_;
+  ++progress_->steps;
+  return &step;
+}
+
+void Run::on_line(const LogLine& line) {
+  const Step* step = take(Step::kLine, shown(line));
+  if (step == nullptr) {
+    return;
+  }
+  const std::string text = step->what[0];
+  const Json arguments(step->what.begin() + 1, step->what.end());
+  const std::string format =
+      "%s: %s(%d) > " + kColours.at(step->priority) + "[%d]" + text + "\033[0m";
+  if (line.priority != step->priority || line.format != format || !is_in_frame(line, function_) ||
+      Json(line.arguments.begin() + 4, line.arguments.end()) != arguments) {
+    problem("the line is " + shown(line) + "\ninstead of " + step->what.dump() + " of priority " +
+            std::to_string(step->priority));
+    return;
+  }
+  const std::string other = other_statement(function_, step->priority, text, line.arguments[2]);
+  if (!other.empty()) {
+    problem(other);
+  }
+  while (!is_done() && course_.steps[next_].kind == Step::kSet) {
+    apply(course_.steps[next_++]);
+  }
+}
+
+bool Run::on_request(Allocator allocator, size_t count, size_t size, const char* text) {
+  if (!is_called_) {
+    return true;
+  }
+  if (allocator == Allocator::kNew) {
+    return on_new();
+  }
+  static const char* const kNames[] = {"calloc", "malloc", "strdup"};
+  const std::string asked =
+      std::string(kNames[static_cast<int>(allocator)]) + "(" +
+      (text != nullptr ? json_of_text(text).dump()
+                       : std::to_string(count) + ", " + std::to_string(size)) +
+      ")";
+  const Step* step = take(Step::kBlock, asked);
+  if (step == nullptr) {
+    return true;
+  }
+  const std::string path = step->what.at("for");
+  const bool is_same =
+      allocator == step->allocator &&
+      (allocator == Allocator::kStrdup ? json_of_text(text) == step->what.at("text")
+       : allocator == Allocator::kMalloc
+           ? size == bytes_in(step->what)
+           : count == step->what.value("count", size_t{1}) && count * size == bytes_in(step->what));
+  if (!is_same) {
+    problem("asked for " + asked + " instead of " + step->what.dump());
+    return true;
+  }
+  if (step->is_refused) {
+    // Where a list's block is missing, there is no place to store that of an element.
+    if (is_done() || course_.steps[next_].kind != Step::kFault) {
+      store(path, Json());
+    }
+  } else if (allocator == Allocator::kStrdup) {
+    store(path, step->what["text"]);
+  } else if (is_done() || course_.steps[next_].kind != Step::kFault) {
+    store(path, call_.blank(path, bytes_in(step->what),
+                            allocator == Allocator::kCalloc ? 0 : kFreshByte));
+  }
+  return !step->is_refused;
+}
+
+// A serializer's message is filled before anything is written. A deserializer allocates where its
+// message is parsed or copied.
+bool Run::on_new() {
+  ++news_;
+  if (!problems_.empty() || case_.value("flags", Json::array()).size() > 0) {
+    return true;
+  }
+  const Json got = outputs();
+  const Json before = model_;
+  bool fits = !course_.keeps_stream && got == model_;
+  for (size_t i = next_; i < course_.steps.size() && !fits; ++i) {
+    const Step& step = course_.steps[i];
+    if (step.kind == Step::kNews) {
+      fits = got == model_;
+    } else if (step.kind == Step::kWrite) {
+      apply(step);
+    } else {
+      break;
+    }
+  }
+  model_ = before;
+  if (!fits && !(is_done() && course_.end.contains("throws"))) {
+    problem("operator new is called where nothing is parsed or copied, the outputs being\n  " +
+            got.dump());
+  }
+  if (news_ == refused_new_) {
+    thrown_at_ = got;
+    return false;
+  }
+  return true;
+}
+
+void Run::on_block(Allocator allocator, void* block, size_t size) {
+  if (allocator == Allocator::kNew) {
+    objects_.insert(block);
+  } else {
+    blocks_.add(block, size);
+  }
+}
+
+void Run::on_release(Allocator allocator, void* block) {
+  if (allocator == Allocator::kNew) {
+    objects_.erase(block);
+  } else {
+    blocks_.remove(block);
+  }
+}
+
+void Run::check_thrown(const std::string& thrown) {
+  if (thrown_at_) {
+    if (thrown != std::bad_alloc().what()) {
+      problem("std::bad_alloc did not come through, but " + thrown);
+    }
+    if (outputs() != *thrown_at_) {
+      problem("outputs were written after operator new had refused:\n  " + outputs().dump());
+    }
+    return;
+  }
+  if (thrown != course_.end.value("throws", "")) {
+    problem(thrown.empty() ? "nothing is thrown" : "thrown: " + thrown);
+  }
+}
+
+void Run::check_return(std::optional<int> status) {
+  const Json returned = status ? Json(*status) : Json();
+  if (returned != course_.end.value("returns", Json())) {
+    problem("it returned " + returned.dump());
+  }
+  while (!is_done() &&
+         (course_.steps[next_].kind == Step::kWrite || course_.steps[next_].kind == Step::kNews)) {
+    if (course_.steps[next_].kind == Step::kWrite) {
+      apply(course_.steps[next_]);
+    }
+    ++next_;
+  }
+  if (!is_done()) {
+    problem("it returned before " + course_.steps[next_].what.dump());
+  }
+  compare_outputs("in the end");
+}
+
+// What was asked for is in an output, once, or was freed; but for the stream.
+void Run::check_blocks() {
+  Reader reader(blocks_);
+  call_.outputs(&reader);
+  for (const auto& [block, size] : blocks_.all()) {
+    const auto times = std::count(reader.seen().begin(), reader.seen().end(), block);
+    if (times != 1) {
+      problem("a block of " + std::to_string(size) + " bytes is in " + std::to_string(times) +
+              " outputs");
+    }
+  }
+  size_t kept = course_.keeps_stream.value_or(false) ? 1 : 0;
+  if (thrown_at_) {
+    kept = course_.keeps_stream && refused_new_ > 1 ? 1 : 0;  // the first is the stream itself
+  }
+  if (objects_.size() != kept) {
+    problem(std::to_string(objects_.size()) + " objects are kept instead of " +
+            std::to_string(kept));
+  }
+}
+
+void Run::execute() {
+  const Invocation invocation = invocation_of(function_, &call_);
+  for (const std::string& name : call_.unknown_names()) {
+    problem(function_ + " has no parameter " + name);
+  }
+  model_ = outputs();
+  std::optional<int> status;
+  std::string thrown;
+  {
+    const Observation observation(this);
+    is_called_ = true;
+    try {
+      status = invocation();
+      is_called_ = false;
+    } catch (const std::exception& exception) {
+      is_called_ = false;
+      thrown = exception.what();
+    }
+  }
+  if (!problems_.empty()) {
+    return;
+  }
+  if (thrown.empty() && !thrown_at_ && !course_.end.contains("throws")) {
+    check_return(status);
+  } else {
+    check_thrown(thrown);
+  }
+  check_blocks();
+  for (const auto& [block, size] : std::map<const void*, size_t>(blocks_.all())) {
+    std::free(const_cast<void*>(block));
+  }
+  for (void* object : objects_) {
+    operator delete(object);
+  }
+}
+
+void Run::execute_in_child() {
+  std::array<int, 2> ends = {};
+  if (pipe(ends.data()) != 0) {
+    problem("no pipe");
+    return;
+  }
+  std::fflush(nullptr);
+  const pid_t child = fork();
+  if (child == 0) {
+    dup2(ends[1], STDERR_FILENO);
+    execute();
+    for (const std::string& text : problems_) {
+      std::fprintf(stderr, "%s\n", text.c_str());
+    }
+    _exit(problems_.empty() ? kReturned : kProblem);
+  }
+  close(ends[1]);
+  std::string said;
+  std::array<char, 4096> buffer = {};
+  for (ssize_t n = 0; (n = read(ends[0], buffer.data(), buffer.size())) > 0;) {
+    said.append(buffer.data(), static_cast<size_t>(n));
+  }
+  close(ends[0]);
+  int status = 0;
+  waitpid(child, &status, 0);
+
+  const auto steps = std::count_if(course_.steps.begin(), course_.steps.end(), [](const Step& s) {
+    return s.kind == Step::kLine || s.kind == Step::kBlock;
+  });
+  const int signal = WIFSIGNALED(status) ? WTERMSIG(status) : 0;
+#ifdef __SANITIZE_ADDRESS__
+  const bool faults = signal != 0 || (WEXITSTATUS(status) != kProblem &&
+                                      WEXITSTATUS(status) != kReturned);  // in ways of its own
+#else
+  const bool faults = signal == SIGSEGV;
+#endif
+  if (course_.end.contains("aborts")
+          ? signal != SIGABRT || !says_assertion(said, course_.end["aborts"])
+          : !faults) {
+    problem("the process did not end as it should, but with status " + std::to_string(status) +
+            ", saying:\n" + said);
+  } else if (progress_->steps != steps || progress_->problems > 0) {
+    problem("the process ended after " + std::to_string(progress_->steps) +
+            " lines and blocks, with " + std::to_string(progress_->problems) + " problems");
+  }
+}
+
+}  // namespace contract

@@ -1,0 +1,101 @@
+// One call of the library beside what a case of the contract says that it does, step by step.
+#ifndef TESTS_CONTRACT_RUN_H
+#define TESTS_CONTRACT_RUN_H
+
+#include <optional>
+#include <set>
+#include <string>
+#include <vector>
+
+#include "call.h"
+#include "doubles.h"
+
+namespace contract {
+
+// What may be seen of a call, in order. Between two lines or blocks, outputs may be written.
+struct Step {
+  enum Kind {
+    kLine,   // is logged
+    kBlock,  // is asked for
+    kWrite,  // outputs hold this from here on
+    kSet,    // an output that somebody else changes while the line before is logged
+    kNews,   // the runtime may allocate: the message is parsed, or a part of it is copied
+    kFault,  // the process ends
+  };
+  Kind kind;
+  Json what = {};  // as the case has it
+  int priority = 0;
+  Allocator allocator = Allocator::kCalloc;
+  bool is_refused = false;
+};
+
+struct Course {
+  std::vector<Step> steps;
+  Json end =
+      Json::object();  // the case's returns, aborts, faults and throws, as far as it has them
+  std::optional<bool> keeps_stream = {};  // if there is one
+};
+
+Course course_of(const Json& contract_case);
+
+// How many blocks of calloc, malloc and strdup the course asks for.
+int blocks_of(const Course& course);
+
+// What is left of the course if the n-th of them, from 0, is refused.
+Course course_without_block(const Course& course, int n);
+
+class Run : public Observer {
+ public:
+  // With refused_new, the n-th block of operator new, from 1, is refused.
+  Run(const Json& contract_case, Course course, int refused_new = 0);
+
+  // Makes the call in this process and compares.
+  void execute();
+  // The same for a call that is meant to end the process, in a child.
+  void execute_in_child();
+
+  const std::vector<std::string>& problems() const { return problems_; }
+  // Whether it has come to the block of operator new that is refused.
+  bool has_refused_new() const { return thrown_at_.has_value(); }
+
+ private:
+  void on_line(const LogLine& line) override;
+  bool on_request(Allocator allocator, size_t count, size_t size, const char* text) override;
+  void on_block(Allocator allocator, void* block, size_t size) override;
+  void on_release(Allocator allocator, void* block) override;
+
+  bool on_new();
+  const Step* take(Step::Kind kind, const std::string& what);
+  void apply(const Step& step);
+  void store(const std::string& path, const Json& value);
+  void compare_outputs(const std::string& when);
+  Json outputs();
+  void check_thrown(const std::string& thrown);
+  void check_return(std::optional<int> status);
+  void check_blocks();
+  void problem(const std::string& text);
+  bool is_done() const { return next_ == course_.steps.size(); }
+
+  const Json& case_;
+  const Course course_;
+  const int refused_new_;
+  std::string function_;
+  Call call_;
+  Blocks blocks_;
+  std::set<void*> objects_;  // of operator new
+  size_t next_ = 0;          // step
+  Json model_;               // of the outputs
+  bool is_called_ = false;
+  int news_ = 0;
+  std::optional<Json> thrown_at_;  // the outputs when operator new refused
+  struct Progress {
+    int steps;  // lines and blocks that were as they should be
+    int problems;
+  };
+  std::shared_ptr<Progress> progress_;  // with a child
+  std::vector<std::string> problems_;
+};
+
+}  // namespace contract
+
+#endif
