@@ -52,19 +52,19 @@ def plain(value):
 def main():
     output, *families = map(pathlib.Path, sys.argv[1:])
     contract = {"format": FORMAT, "messages": {}, "cases": []}
-    names = set()
     for family in families:
-        source = yaml.safe_load(family.read_text())
-        contract["messages"].update(source["messages"])
-        for case in source["cases"]:
-            name = (case.get("call"), case.get("case"))
-            if name in names:
-                raise ValueError(f"{family}: two cases are named {name}")
-            names.add(name)
-            try:
-                contract["cases"].append({"family": family.stem, **plain(repeated(case))})
-            except ValueError as error:
-                raise ValueError(f"{family}, {name}: {error}") from error
+        for function in yaml.safe_load_all(family.read_text()):
+            call = function["call"]
+            if function["message"]:
+                contract["messages"][call] = function["message"]
+            names = [case["case"] for case in function["cases"]]
+            for case in function["cases"]:
+                if names.count(case["case"]) > 1:
+                    sys.exit(f"{family}: {call} has two cases: {case['case']}")
+                try:
+                    contract["cases"].append({"family": family.stem, "call": call, **plain(repeated(case))})
+                except ValueError as error:
+                    sys.exit(f"{family}: {case['case']}: {error}")
     schema = json.loads((pathlib.Path(__file__).parent / "schema.json").read_text())
     validator = jsonschema.Draft7Validator(schema)
     for error in validator.iter_errors(contract):
