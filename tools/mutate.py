@@ -130,14 +130,13 @@ class Worker:
 
     def stages(self, function):
         """The function's own tests first."""
-        stem = re.sub(r"_(request_|reply_|get_)?(de)?serialize$", "", function)
-        if stem != function:
-            suite = "".join(word.capitalize() for word in stem.split("_"))
-            yield from ((p, f"*{suite}*:*/{stem}_*") for p in self.build.programs)
+        if function.endswith("serialize"):
+            yield from ((p, f"{function}.*:{function}/*") for p in self.build.programs if p.endswith("/contract_tests"))
         yield from ((p, "*") for p in self.build.programs)
 
     def test(self, program, pattern, seconds):
-        environment = dict(os.environ, LD_LIBRARY_PATH=str(self.folder))
+        environment = dict(os.environ, LD_LIBRARY_PATH=str(self.folder),
+                           QEL_LIBRARY=str(self.folder / self.build.soname))
         return run([program, "--gtest_brief=1", "--gtest_fail_fast", f"--gtest_filter={pattern}"],
                    seconds, env=environment, cwd=self.folder)
 

@@ -2,8 +2,12 @@
 
 #include <gtest/gtest.h>
 
+#include <algorithm>
 #include <cctype>
+#include <fstream>
 #include <functional>
+#include <iterator>
+#include <set>
 #include <string>
 
 #include "cases.h"
@@ -11,20 +15,37 @@
 
 namespace {
 
+using contract::CaseRun;
 using contract::Course;
 using contract::Json;
-using contract::Run;
+using contract::Step;
 
+// Besides the log nothing is said, but that a text is no UTF-8: the runtime says so without the
+// text.
 class ContractTest : public ::testing::Test {
  public:
-  explicit ContractTest(std::function<void()> body) : body_(std::move(body)) {}
-  void TestBody() override { body_(); }
+  ContractTest(const Json& contract_case, std::function<void()> body)
+      : case_(contract_case), body_(std::move(body)) {}
+
+  void TestBody() override {
+    ::testing::internal::CaptureStderr();
+    body_();
+    const std::string said = ::testing::internal::GetCapturedStderr();
+    const Json flags = case_.value("flags", Json::array());
+    if (std::find(flags.begin(), flags.end(), "no-utf8") == flags.end()) {
+      EXPECT_EQ(said, "");
+    } else {
+      EXPECT_NE(said.find("invalid UTF-8"), std::string::npos);
+      EXPECT_EQ(said.find('\xff'), std::string::npos) << said;
+    }
+  }
 
  private:
-  std::function<void()> body_;
+  const Json& case_;
+  const std::function<void()> body_;
 };
 
-void expect_no_problems(const Run& run) {
+void expect_no_problems(const CaseRun& run) {
   for (const std::string& problem : run.problems()) {
     ADD_FAILURE() << problem;
   }
@@ -35,7 +56,7 @@ bool ends_process(const Course& course) {
 }
 
 void run(const Json& contract_case, const Course& course) {
-  Run run(contract_case, course);
+  CaseRun run(contract_case, course);
   if (ends_process(course)) {
     run.execute_in_child();
   } else {
@@ -55,11 +76,52 @@ void refuse_news(const Json& contract_case, const Course& course) {
   bool has_refused = true;
   for (int n = 1; has_refused; ++n) {
     SCOPED_TRACE("without block " + std::to_string(n) + " of operator new");
-    Run run(contract_case, course, n);
+    CaseRun run(contract_case, course, n);
     run.execute();
     expect_no_problems(run);
     has_refused = run.has_refused_new() && run.problems().empty();
   }
+}
+
+TEST(Contract, HasCasesOfTheFunctionsThatAreExported) {
+  std::set<std::string> with_cases;
+  for (const Json& contract_case : contract::cases()) {
+    with_cases.insert(contract_case.at("call"));
+  }
+  std::ifstream list(QEL_EXPORTED_FUNCTIONS);
+  const std::set<std::string> exported{std::istream_iterator<std::string>(list), {}};
+  EXPECT_EQ(with_cases, exported);
+}
+
+// The lines of all cases, and what has to be said of each.
+void for_each_line(const std::function<void(const std::string& function, const Step& line)>& look) {
+  for (const Json& contract_case : contract::cases()) {
+    for (const Step& step : contract::course_of(contract_case).steps) {
+      if (step.kind == Step::kLine) {
+        look(contract_case["call"], step);
+      }
+    }
+  }
+}
+
+TEST(Contract, LinesShowNoTextButTheFunctionsName) {
+  for_each_line([](const std::string& function, const Step& line) {
+    for (size_t i = 1; i < line.what.size(); ++i) {
+      EXPECT_TRUE(line.what[i].is_number() || line.what[i] == function) << line.what;
+    }
+  });
+}
+
+TEST(Contract, IdsInTheLog_AreThoseOfRefusedUsersAndOfOneRequest) {
+  std::set<std::string> functions;
+  for_each_line([&](const std::string& function, const Step& line) {
+    if (line.what[0].get<std::string>().find("%lld") != std::string::npos) {
+      functions.insert(function);
+    }
+  });
+  EXPECT_EQ(functions,
+            (std::set<std::string>{"create_chatroom_reply_deserialize", "invite_reply_deserialize",
+                                   "change_chatroom_meta_request_serialize"}));
 }
 
 std::string identifier(std::string name) {
@@ -75,8 +137,9 @@ void add_test(const std::string& suite, const Json& contract_case,
     body(contract_case, contract::course_of(contract_case));
   };
   ::testing::RegisterTest(suite.c_str(), identifier(contract_case.at("case")).c_str(), nullptr,
-                          nullptr, __FILE__, __LINE__,
-                          [=]() -> ContractTest* { return new ContractTest(test); });
+                          nullptr, __FILE__, __LINE__, [&contract_case, test]() -> ContractTest* {
+                            return new ContractTest(contract_case, test);
+                          });
 }
 
 }  // namespace

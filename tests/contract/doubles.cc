@@ -221,7 +221,7 @@ extern "C" long syscall(long number, ...) noexcept {
   }
   va_end(list);
   if (number == SYS_gettid && contract::active() != nullptr) {
-    contract::fresh_thread_id = contract::next_thread_id++;
+    contract::fresh_thread_id = contract::next_thread_id.fetch_add(1, std::memory_order_relaxed);
     return contract::fresh_thread_id;
   }
   return contract::real<long (*)(long, ...)>("syscall")(

@@ -133,16 +133,17 @@ bool is_in_frame(const LogLine& line, const std::string& function) {
          arguments[3] == line.fresh_thread_id;
 }
 
-// Whether the process has said this of its end. Compilers name a function's types in two ways.
-bool says_assertion(std::string said, const Json& aborts) {
+// Whether that is all that the process has said. Compilers name a function's types in two ways.
+bool says_assertion_alone(std::string said, const Json& aborts) {
   const std::string expected = ": " + aborts.at("in").get<std::string>() + ": Assertion `" +
-                               aborts.at("assertion").get<std::string>() + "' failed.";
+                               aborts.at("assertion").get<std::string>() + "' failed.\n";
   const size_t qualified = said.find("(::");
   if (qualified != std::string::npos) {
     said.erase(qualified + 1, 2);
   }
   return said.find(": proto-lib/msgspec_frontend.pb.h:") != std::string::npos &&
-         said.find(expected) != std::string::npos;
+         said.find('\n') == said.size() - 1 && said.size() > expected.size() &&
+         said.compare(said.size() - expected.size(), expected.size(), expected) == 0;
 }
 
 }  // namespace
@@ -203,7 +204,7 @@ Course course_without_block(const Course& course, int n) {
   return rest;
 }
 
-Run::Run(const Json& contract_case, Course course, int refused_new)
+CaseRun::CaseRun(const Json& contract_case, Course course, int refused_new)
     : case_(contract_case),
       course_(std::move(course)),
       refused_new_(refused_new),
@@ -214,21 +215,21 @@ Run::Run(const Json& contract_case, Course course, int refused_new)
                                             MAP_SHARED | MAP_ANONYMOUS, -1, 0)),
                 [](Progress* progress) { munmap(progress, sizeof *progress); }) {}
 
-void Run::problem(const std::string& text) {
+void CaseRun::problem(const std::string& text) {
   ++progress_->problems;
   problems_.push_back(text);
 }
 
-Json Run::outputs() {
+Json CaseRun::outputs() {
   Reader reader(blocks_);
   return call_.outputs(&reader);
 }
 
-void Run::store(const std::string& path, const Json& value) {
+void CaseRun::store(const std::string& path, const Json& value) {
   merge(&model_[pointer_of(path)], value);
 }
 
-void Run::apply(const Step& step) {
+void CaseRun::apply(const Step& step) {
   for (const auto& [path, value] : step.what.items()) {
     if (step.kind == Step::kSet) {
       call_.set(path, value);
@@ -237,7 +238,7 @@ void Run::apply(const Step& step) {
   }
 }
 
-void Run::compare_outputs(const std::string& when) {
+void CaseRun::compare_outputs(const std::string& when) {
   const Json got = outputs();
   if (got != model_) {
     problem(when + ", the outputs hold\n  " + got.dump() + "\ninstead of\n  " + model_.dump());
@@ -246,7 +247,7 @@ void Run::compare_outputs(const std::string& when) {
 
 // The step that comes next, if it is of this kind: until there the outputs are written as the case
 // says. After the first problem nothing more is compared.
-const Step* Run::take(Step::Kind kind, const std::string& what) {
+const Step* CaseRun::take(Step::Kind kind, const std::string& what) {
   if (!problems_.empty() || !is_called_) {
     return nullptr;
   }
@@ -272,7 +273,7 @@ const Step* Run::take(Step::Kind kind, const std::string& what) {
   return &step;
 }
 
-void Run::on_line(const LogLine& line) {
+void CaseRun::on_line(const LogLine& line) {
   const Step* step = take(Step::kLine, shown(line));
   if (step == nullptr) {
     return;
@@ -296,7 +297,7 @@ void Run::on_line(const LogLine& line) {
   }
 }
 
-bool Run::on_request(Allocator allocator, size_t count, size_t size, const char* text) {
+bool CaseRun::on_request(Allocator allocator, size_t count, size_t size, const char* text) {
   if (!is_called_) {
     return true;
   }
@@ -340,7 +341,7 @@ bool Run::on_request(Allocator allocator, size_t count, size_t size, const char*
 
 // A serializer's message is filled before anything is written. A deserializer allocates where its
 // message is parsed or copied.
-bool Run::on_new() {
+bool CaseRun::on_new() {
   ++news_;
   if (!problems_.empty() || case_.value("flags", Json::array()).size() > 0) {
     return true;
@@ -370,7 +371,7 @@ bool Run::on_new() {
   return true;
 }
 
-void Run::on_block(Allocator allocator, void* block, size_t size) {
+void CaseRun::on_block(Allocator allocator, void* block, size_t size) {
   if (allocator == Allocator::kNew) {
     objects_.insert(block);
   } else {
@@ -378,7 +379,7 @@ void Run::on_block(Allocator allocator, void* block, size_t size) {
   }
 }
 
-void Run::on_release(Allocator allocator, void* block) {
+void CaseRun::on_release(Allocator allocator, void* block) {
   if (allocator == Allocator::kNew) {
     objects_.erase(block);
   } else {
@@ -386,7 +387,7 @@ void Run::on_release(Allocator allocator, void* block) {
   }
 }
 
-void Run::check_thrown(const std::string& thrown) {
+void CaseRun::check_thrown(const std::string& thrown) {
   if (thrown_at_) {
     if (thrown != std::bad_alloc().what()) {
       problem("std::bad_alloc did not come through, but " + thrown);
@@ -401,7 +402,7 @@ void Run::check_thrown(const std::string& thrown) {
   }
 }
 
-void Run::check_return(std::optional<int> status) {
+void CaseRun::check_return(std::optional<int> status) {
   const Json returned = status ? Json(*status) : Json();
   if (returned != course_.end.value("returns", Json())) {
     problem("it returned " + returned.dump());
@@ -420,7 +421,7 @@ void Run::check_return(std::optional<int> status) {
 }
 
 // What was asked for is in an output, once, or was freed; but for the stream.
-void Run::check_blocks() {
+void CaseRun::check_blocks() {
   Reader reader(blocks_);
   call_.outputs(&reader);
   for (const auto& [block, size] : blocks_.all()) {
@@ -440,7 +441,7 @@ void Run::check_blocks() {
   }
 }
 
-void Run::execute() {
+void CaseRun::execute() {
   const Invocation invocation = invocation_of(function_, &call_);
   for (const std::string& name : call_.unknown_names()) {
     problem(function_ + " has no parameter " + name);
@@ -476,7 +477,7 @@ void Run::execute() {
   }
 }
 
-void Run::execute_in_child() {
+void CaseRun::execute_in_child() {
   std::array<int, 2> ends = {};
   if (pipe(ends.data()) != 0) {
     problem("no pipe");
@@ -512,8 +513,13 @@ void Run::execute_in_child() {
 #else
   const bool faults = signal == SIGSEGV;
 #endif
+#ifndef __SANITIZE_ADDRESS__
+  if (!course_.end.contains("aborts") && !said.empty()) {
+    problem("before it faulted, the process said:\n" + said);
+  }
+#endif
   if (course_.end.contains("aborts")
-          ? signal != SIGABRT || !says_assertion(said, course_.end["aborts"])
+          ? signal != SIGABRT || !says_assertion_alone(said, course_.end["aborts"])
           : !faults) {
     problem("the process did not end as it should, but with status " + std::to_string(status) +
             ", saying:\n" + said);

@@ -44,10 +44,10 @@ int blocks_of(const Course& course);
 // What is left of the course if the n-th of them, from 0, is refused.
 Course course_without_block(const Course& course, int n);
 
-class Run : public Observer {
+class CaseRun : public Observer {
  public:
   // With refused_new, the n-th block of operator new, from 1, is refused.
-  Run(const Json& contract_case, Course course, int refused_new = 0);
+  CaseRun(const Json& contract_case, Course course, int refused_new = 0);
 
   // Makes the call in this process and compares.
   void execute();
