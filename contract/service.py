@@ -55,4 +55,5 @@ def main():
     sys.exit(problems > 0)
 
 
-main()
+if __name__ == "__main__":
+    main()
