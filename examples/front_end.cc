@@ -3,8 +3,8 @@
 //   front_end [--port PORT] [--port-file FILE] [--timeout SECONDS]
 //
 // listens on 127.0.0.1, on a free port unless one is given, and writes the port's number to FILE.
-// It waits SECONDS at most for the plug-in to connect, and for each message. It exits with 0 after a
-// whole session, with 1 after a wrong exchange or if no plug-in connects, and with 2 if it was
+// It waits SECONDS at most for the plug-in to connect, and for each message. It exits with 0 after
+// a whole session, with 1 after a wrong exchange or if no plug-in connects, and with 2 if it was
 // called wrongly.
 
 #include <arpa/inet.h>
