@@ -1,4 +1,4 @@
-// The calls with the generated classes alone, as a careful user would write them. This file is built
+// The calls with the generated classes alone, as a careful user would write them. The file is built
 // with two versions of the classes; the build names each.
 
 #include <cstdlib>

@@ -7,7 +7,7 @@
 #include <stdint.h>
 #include <stdio.h>
 
-/* The part of QEMU's plug-in interface, version 1, that is used here: Debian has no header of it. */
+/* The part of QEMU's plug-in interface, version 1, used here. Debian has no header of it. */
 typedef uint64_t qemu_plugin_id_t;
 struct qemu_info_t;
 struct qemu_plugin_tb;

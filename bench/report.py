@@ -174,8 +174,9 @@ def measure_all(build, arm_builds, rounds):
         "rounds": rounds,
         "time": {case: {program: times.median((program, case)) for program in TIMED
                         if (program, case) in times.values} for case in measure.ALL_CASES},
-        "ratio": {case: {program: times.ratio((program, case), ("baseline", case)) for program in TIMED
-                         if (program, case) in times.values} for case in measure.ALL_CASES},
+        "ratio": {case: {program: times.ratio((program, case), ("baseline", case))
+                         for program in TIMED if (program, case) in times.values}
+                  for case in measure.ALL_CASES},
         "at_once": {case: {threads: times.median(("at_once", case, threads)) for threads in (1, 2)}
                     for case in ("chat_request/100", "chat_reply/1")},
         "parts": {name[1]: times.median(name) for name in times.values if name[0] == "part"},
@@ -232,8 +233,9 @@ def thresholds(results):
         allowed -= lines * THREAD_ID_NS
         if measure.is_parser(case):
             allowed += results["parts"]["kept_stream"] - STREAM_NS
-        yield Threshold(f"{CASE_NAMES[case]}: ns, with a thread id for free and this machine's stream",
-                        time["ours_no_kernel"], time["baseline"] + allowed)
+        yield Threshold(
+            f"{CASE_NAMES[case]}: ns, with a thread id for free and this machine's stream",
+            time["ours_no_kernel"], time["baseline"] + allowed)
     for case in measure.CASES:
         blocks = results["blocks"][case]
         kept = measure.kept_blocks(case)
