@@ -64,7 +64,7 @@ def prose(text, page, slugs):
     text = re.sub(r"^(#+) (.*)$", heading, text, flags=re.MULTILINE)
     text = IMAGE_OR_LINK.sub(lambda match: link(match, page), text)
     text = re.sub(r"(?<!\[)`(\w+_(?:de)?serialize)`", r"[\1](@ref \1)", text)
-    return re.sub(r"`([\w-]*)(::[\w-]+)`", r"<code>\1\\\2</code>", text)  # or Doxygen takes it for a name
+    return re.sub(r"`([\w-]*)(::[\w-]+)`", r"<code>\1\\\2</code>", text)  # no name to Doxygen
 
 
 def diagram(block):

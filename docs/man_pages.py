@@ -41,7 +41,7 @@ def functions(page):
         result, arguments, brief = re.search(
             rf'^\.RI "(\w+) \\fB{name}\\fP \((.*)\)"\n\.br\n\.RI "(.*?)(?:\\&\.)? "', page, re.M
         ).groups()
-        arguments = arguments.replace(" ", r"\ ").replace(r",\ ", ", ")  # lines break at commas only
+        arguments = arguments.replace(" ", r"\ ").replace(r",\ ", ", ")  # break at commas only
         yield name, (
             f'.TH "{name}" 3 "" "{project} {version}" " "\n.ad l\n.nh\n'
             f".SH NAME\n{name} \\- {brief}\n"

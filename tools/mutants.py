@@ -283,7 +283,7 @@ def _(part):
 
 @rule("order")
 def _(part):
-    """Swaps neighbours, except two that only fill fields or outputs, whose order does not matter."""
+    """Swaps neighbours, except two that only fill fields or outputs: their order is free."""
     fills = re.compile(rf"{SETTER}|{ASSIGNMENT}|\w+\* \w+ = \w+\.add_|copy_result(_msg)?\(|delete ",
                        re.S)
 
