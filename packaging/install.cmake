@@ -12,6 +12,10 @@ install(TARGETS qel-message-protosvc
 install(
   FILES proto-lib/qel-message-serialize.h "${PROJECT_BINARY_DIR}/proto-lib/msgspec_frontend.pb.h"
   DESTINATION "${_headers}" COMPONENT development)
+install(FILES "${QEL_CONTRACT}"
+  DESTINATION "${CMAKE_INSTALL_DATADIR}/${PROJECT_NAME}" COMPONENT development)
+install(FILES contract/schema.json RENAME contract.schema.json
+  DESTINATION "${CMAKE_INSTALL_DATADIR}/${PROJECT_NAME}" COMPONENT development)
 install(FILES proto-lib/msgspec_frontend.proto
   DESTINATION "${CMAKE_INSTALL_DATADIR}/${PROJECT_NAME}" COMPONENT development)
 

@@ -68,7 +68,7 @@ if(_runtime) # is installed with this component
 endif()
 
 # Builds what the packages contain.
-add_custom_target(packaged DEPENDS qel-message-protosvc)
+add_custom_target(packaged DEPENDS qel-message-protosvc contract)
 foreach(_target qel-wire docs)
   if(TARGET ${_target})
     add_dependencies(packaged ${_target})
