@@ -18,7 +18,7 @@ written) and a value. A number is a varint, seven bits a byte, the lowest first;
 message begin with their length. What a message does not have is not there.
 
 One example for each family of messages: the call, what it logs, and the bytes as
-[`qel-wire explain`](qel-wire.md) shows them. In log lines `...` stands for the thread. All of it is
+[`qel-wire explain`](../qel-wire/README.md) shows them. In log lines `...` stands for the thread. All of it is
 made by running [`examples/wire_format.c`](../examples/wire_format.c) (`./dev docs`), and a test
 compares.
 """
@@ -72,7 +72,7 @@ def example(tool, program, found):
 def main():
     build = pathlib.Path(sys.argv[1])
     source = (pathlib.Path(__file__).parent.parent / "examples/wire_format.c").read_text()
-    tool, program = build / "tools/qel-wire/qel-wire", build / "examples/wire_format"
+    tool, program = build / "qel-wire/qel-wire", build / "examples/wire_format"
     parts = [HEAD]
     found = sorted([*SECTION.finditer(source), *EXAMPLE.finditer(source)], key=lambda match: match.start())
     for match in found:
