@@ -54,7 +54,8 @@ void add_encode(const Json& encode, std::vector<Step>* steps) {
 std::vector<Step> steps_of(const Json& does) {
   std::vector<Step> steps;
   for (const Json& entry : does) {
-    const auto& [key, what] = *entry.items().begin();
+    const std::string& key = entry.begin().key();
+    const Json& what = entry.begin().value();
     if (kPriorities.count(key) > 0) {
       Step step = {Step::kLine, what.is_array() ? what : Json::array({what})};
       step.priority = kPriorities.at(key);
