@@ -41,6 +41,8 @@ def plain(value):
     """With the bytes of every message as digits, and a text in pieces as one."""
     if isinstance(value, dict):
         value = {key: plain(each) for key, each in value.items()}
+        if set(value) == {"hex"}:
+            value["hex"] = digits(value["hex"])
         if "bytes" in value:
             value["bytes"] = digits(value["bytes"])
             if isinstance(value.get("text"), list):

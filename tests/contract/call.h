@@ -177,21 +177,21 @@ T* Call::keep(std::vector<T> values) {
 
 template <typename T>
 T* Call::output(const std::string& name) {
+  names_.push_back(name);
+  if constexpr (std::is_pointer_v<T>) {
+    blanks_[name] = [](const void* block, size_t size, bool is_element) {
+      return Reader(Blocks()).read_new_block(static_cast<const std::remove_pointer_t<T>*>(block),
+                                             size, is_element);
+    };
+  }
   if (given_.contains(name) && given_[name].is_null()) {
-    names_.push_back(name);
     return nullptr;
   }
-  names_.push_back(name);
   const auto output = std::make_shared<Output<T>>();
   std::memset(output.get(), kFreshByte, sizeof *output);
   kept_.push_back(output);
   if constexpr (std::is_same_v<T, int>) {
     numbers_[name] = &output->value;
-  } else if constexpr (std::is_pointer_v<T>) {
-    blanks_[name] = [](const void* block, size_t size, bool is_element) {
-      return Reader(nullptr).read_new_block(static_cast<const std::remove_pointer_t<T>*>(block),
-                                            size, is_element);
-    };
   }
   outputs_.emplace_back(name, [this, name, output](Reader* reader, Json* shown) {
     Json value = reader->read(output->value);
