@@ -180,7 +180,7 @@ T* Call::output(const std::string& name) {
   names_.push_back(name);
   if constexpr (std::is_pointer_v<T>) {
     blanks_[name] = [](const void* block, size_t size, bool is_element) {
-      return Reader(Blocks()).read_new_block(static_cast<const std::remove_pointer_t<T>*>(block),
+      return Reader(nullptr).read_new_block(static_cast<const std::remove_pointer_t<T>*>(block),
                                              size, is_element);
     };
   }
