@@ -77,18 +77,28 @@ std::vector<Step> steps_of(const Json& does) {
     } else if (key == "meanwhile") {
       steps.push_back({Step::kSet, what});
     } else if (key == "for_each") {
-      const std::string pattern = what.at("does").dump();
-      for (int i = 0; i < what.at("times"); ++i) {
-        const std::string number = std::to_string(i);
-        const std::string numbered = replaced(replaced(pattern, "\"#\"", number), "#", number);
-        const std::vector<Step> next = steps_of(Json::parse(numbered));
-        steps.insert(steps.end(), next.begin(), next.end());
-      }
+      steps.push_back({Step::kRounds, what});
     } else {  // parse, copy
       steps.push_back({Step::kNews, what});
     }
   }
   return steps;
+}
+
+// Puts the steps of the next round before those of the others.
+void write_out_round(std::vector<Step>* steps, size_t at) {
+  Json rounds = (*steps)[at].what;
+  const int round = rounds.value("round", 0);
+  const std::string number = std::to_string(round);
+  const std::string does = rounds.at("does").dump();
+  std::vector<Step> next =
+      steps_of(Json::parse(replaced(replaced(does, "\"#\"", number), "#", number)));
+  if (round + 1 < rounds["times"]) {
+    rounds["round"] = round + 1;
+    next.push_back({Step::kRounds, rounds});
+  }
+  steps->erase(steps->begin() + static_cast<int>(at));
+  steps->insert(steps->begin() + static_cast<int>(at), next.begin(), next.end());
 }
 
 // Whether the path leads into the output of the root: "members[0].name" into "members".
@@ -174,7 +184,8 @@ Course course_of(const Json& contract_case) {
 }
 
 bool is_long(const Course& course) {
-  return course.steps.size() > size_t{kLong};
+  return std::any_of(course.steps.begin(), course.steps.end(),
+                     [](const Step& step) { return step.kind == Step::kRounds; });
 }
 
 int blocks_of(const Course& course) {
@@ -205,6 +216,11 @@ Course course_without_block(const Course& course, int n) {
   // Otherwise what is missing is written to.
   const std::string path = block.at("for");
   for (++step; step != rest.steps.end(); ++step) {
+    if (step->kind == Step::kRounds) {
+      const auto at = step - rest.steps.begin();
+      write_out_round(&rest.steps, static_cast<size_t>(at));
+      step = rest.steps.begin() + at;
+    }
     const bool is_slot = step->kind == Step::kBlock && step->what.at("for") != path &&
                          leads_into(step->what["for"], path);
     if (is_slot || writes_into(*step, path)) {
@@ -220,6 +236,7 @@ Course course_without_block(const Course& course, int n) {
 CaseRun::CaseRun(const Json& contract_case, Course course, int refused_new)
     : case_(contract_case),
       course_(std::move(course)),
+      is_long_(is_long(course_)),
       refused_new_(refused_new),
       function_(contract_case.at("call")),
       call_(contract_case.value("given", Json::object()),
@@ -258,6 +275,14 @@ void CaseRun::compare_outputs(const std::string& when) {
   }
 }
 
+// Of rounds, the next one is written out here.
+bool CaseRun::is_done() {
+  while (next_ < course_.steps.size() && course_.steps[next_].kind == Step::kRounds) {
+    write_out_round(&course_.steps, next_);
+  }
+  return next_ == course_.steps.size();
+}
+
 // The step that comes next, if it is of this kind: until there the outputs are written as the case
 // says. After the first problem nothing more is compared.
 const Step* CaseRun::take(Step::Kind kind, const std::string& what) {
@@ -279,13 +304,13 @@ const Step* CaseRun::take(Step::Kind kind, const std::string& what) {
     }
     return nullptr;
   }
-  const Step& step = course_.steps[next_];
-  if (!is_long(course_) || progress_->steps % kLong == 0) {
+  if (!is_long_ || progress_->steps % kMany == 0) {
     compare_outputs("when it comes to: " + what);
   }
   ++next_;
   ++progress_->steps;
-  return &step;
+  is_done();  // before a step is pointed to
+  return &course_.steps[next_ - 1];
 }
 
 void CaseRun::on_line(const LogLine& line) {
@@ -358,7 +383,7 @@ bool CaseRun::on_request(Allocator allocator, size_t count, size_t size, const c
 // message is parsed or copied.
 bool CaseRun::on_new() {
   ++news_;
-  if (!problems_.empty() || news_ > kLong || case_.value("flags", Json::array()).size() > 0) {
+  if (!problems_.empty() || news_ > kMany || case_.value("flags", Json::array()).size() > 0) {
     return true;
   }
   const Json got = outputs();
@@ -387,6 +412,9 @@ bool CaseRun::on_new() {
 }
 
 void CaseRun::on_block(Allocator allocator, void* block, size_t size) {
+  if (!is_called_) {
+    return;
+  }
   if (allocator == Allocator::kNew) {
     objects_.insert(block);
   } else {

@@ -15,12 +15,13 @@ namespace contract {
 // What may be seen of a call, in order. Between two lines or blocks, outputs may be written.
 struct Step {
   enum Kind {
-    kLine,   // is logged
-    kBlock,  // is asked for
-    kWrite,  // outputs hold this from here on
-    kSet,    // an output that somebody else changes while the line before is logged
-    kNews,   // the runtime may allocate: the message is parsed, or a part of it is copied
-    kFault,  // the process ends
+    kLine,    // is logged
+    kBlock,   // is asked for
+    kWrite,   // outputs hold this from here on
+    kSet,     // an output that somebody else changes while the line before is logged
+    kNews,    // the runtime may allocate: the message is parsed, or a part of it is copied
+    kRounds,  // the same steps several times
+    kFault,   // the process ends
   };
   Kind kind;
   Json what = {};  // as the case has it
@@ -38,8 +39,7 @@ struct Course {
 
 Course course_of(const Json& contract_case);
 
-// Whether the course has more steps than all outputs can be looked at, at each of them.
-constexpr int kLong = 1000;
+// Whether it has rounds of steps: too many to look at all outputs at each step.
 bool is_long(const Course& course);
 
 // How many blocks of calloc, malloc and strdup the course asks for.
@@ -78,10 +78,14 @@ class CaseRun : public Observer {
   void check_return(std::optional<int> status);
   void check_blocks();
   void problem(const std::string& text);
-  bool is_done() const { return next_ == course_.steps.size(); }
+  bool is_done();
+
+  // So often, or so many, all is looked at where there are very many steps or blocks.
+  static constexpr int kMany = 1000;
 
   const Json& case_;
-  const Course course_;
+  Course course_;
+  const bool is_long_;
   const int refused_new_;
   std::string function_;
   Call call_;
