@@ -119,8 +119,12 @@ qel_message_inboxentry_t Call::inbox_entry(const Json& fields) {
 template <>
 qel_message_inboxentry_t** Call::argument<qel_message_inboxentry_t**>(const std::string& name) {
   names_.push_back(name);
+  const bool is_given = given_.contains(name);  // null, or {to: null}: a pointer to NULL
+  if (is_given && given_[name].is_null()) {
+    return nullptr;
+  }
   qel_message_inboxentry_t* record = nullptr;
-  if (!given_.contains(name) || !given_[name].is_null()) {
+  if (!is_given) {
     record = keep(std::vector<qel_message_inboxentry_t>(1));
     std::memset(record, kFreshByte, sizeof *record);
   }
