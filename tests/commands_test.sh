@@ -12,7 +12,7 @@ entries() { grep -v '^#' "$list" | grep .; }
 field() { entries | awk -F ' => ' -v n="$1" '{ print $n }'; }
 
 documented() {
-  (cd "$source" && find README.md CONTRIBUTING.md SECURITY.md docs fuzz/README.md -maxdepth 1 -name '*.md' \
+  (cd "$source" && find README.md CONTRIBUTING.md SECURITY.md docs fuzz/README.md qel-wire/README.md -maxdepth 1 -name '*.md' \
     -exec awk -f tests/commands.awk {} +) | sort -u
 }
 

@@ -1,15 +1,5 @@
 # What the tests need of the machine that they run on.
 
-# GoogleTest. Debian has its library for this machine alone, and its source.
-if(CMAKE_CROSSCOMPILING)
-  set(QEL_GOOGLETEST_SOURCE /usr/src/googletest CACHE PATH
-    "Source of GoogleTest, to be built for the target")
-  add_subdirectory("${QEL_GOOGLETEST_SOURCE}/googletest" googletest EXCLUDE_FROM_ALL SYSTEM)
-  target_compile_options(gtest PRIVATE -O0) # run less than it is built
-else()
-  find_package(GTest REQUIRED)
-endif()
-
 # In the emulator the two threads' calls take a minute, if what counts them is not optimised.
 if(CMAKE_CROSSCOMPILING)
   set_source_files_properties(support/heap.cc support/log_capture.cc PROPERTIES COMPILE_OPTIONS -O2)

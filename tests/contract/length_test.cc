@@ -77,7 +77,7 @@ void for_each_encoding(Check check) {
   int encodings = 0;
   for (const Json& contract_case : contract::cases()) {
     Course course = contract::course_of(contract_case);
-    if (length_in(&course) != course.steps.end()) {
+    if (length_in(&course) != course.steps.end() && !course.end.contains("faults")) {
       ++encodings;
       check(contract_case, course);
     }

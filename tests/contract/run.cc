@@ -80,7 +80,8 @@ Json numbered(const Json& pattern, int number) {
 std::vector<Step> steps_of(const Json& does) {
   std::vector<Step> steps;
   for (const Json& entry : does) {
-    const auto& [key, what] = *entry.items().begin();
+    const std::string& key = entry.begin().key();
+    const Json& what = entry.begin().value();
     if (kPriorities.count(key) > 0) {
       Step step = {Step::kLine, what.is_array() ? what : Json::array({what})};
       step.priority = kPriorities.at(key);
