@@ -6,6 +6,7 @@
 #
 # shellcheck shell=bats disable=SC2034,SC2154 # variables of the tests and of bats
 bats_require_minimum_version 1.5.0
+BATS_PRINT_OUTPUT_ON_FAILURE=1 # of 'run'
 export LC_ALL=C
 # shellcheck source=/dev/null
 . "${QEL_BUILD:-${BASH_SOURCE[0]%/*}/../build/release}/tests/build.bash"
@@ -28,7 +29,7 @@ fail() {
 none() { ! grep . >&2; }
 
 # says TEXT: what the last command of 'run' has said, however its lines are broken.
-says() { [[ $(tr -s ' \n' ' ' <<<"$output") == *"$1"* ]] || fail "expected: $1" "said: $output"; }
+says() { [[ $(tr -s ' \n' ' ' <<<"$output") == *"$1"* ]] || fail "expected: $1"; }
 
 # refused TEXT COMMAND...: the command fails and says that.
 refused() {
@@ -80,7 +81,7 @@ prints() {
   local emulator=()
   [ -z "$TOOLCHAIN" ] || emulator=(qemu-arm -L "${2%/usr}")
   DLOG_STANDIN_PRIORITY=S run -0 "${emulator[@]}" "${@:3}"
-  [ "$output" = "$1" ] || fail "expected: $1" "printed: $output"
+  [ "$output" = "$1" ] || fail "expected: $1"
 }
 
 # c_plugin_runs TREE

@@ -5,13 +5,13 @@ load build
 # has OPTION PATTERN: readelf says so about the library.
 has() {
   run -0 "$READELF" -W "$1" "$LIBRARY"
-  grep -Eq "$2" <<<"$output" || fail "not $2: $output"
+  grep -Eq "$2" <<<"$output"
 }
 
 @test "relocations are read-only" { has -l GNU_RELRO; }
 @test "symbols are bound when it is loaded" { has -d 'FLAGS_1.*NOW'; }
 @test "the stack is not executable" { has -l 'GNU_STACK .* RW +0x'; }
-@test "the text has no relocations" { run ! has -d TEXTREL && has -d SONAME; }
+@test "the text has no relocations" { has -d SONAME && [[ $output != *TEXTREL* ]]; }
 @test "stacks are protected" { has --dyn-syms 'UND __stack_chk_fail'; }
 @test "assertions are compiled in" { has --dyn-syms 'UND __assert_fail'; }
 
