@@ -1,4 +1,4 @@
-/* Two requests without any library: what an encoder of one message costs at least. */
+/* Two requests encoded without any library: the lowest cost that is possible. */
 
 #include <stdlib.h>
 #include <string.h>

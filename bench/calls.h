@@ -1,6 +1,6 @@
 /*
- * What is measured: five calls of the interface, done by different means. A program has one
- * implementation of them, and aborts where a call fails.
+ * What is measured: five calls. Each program has one implementation of them, and aborts if a call
+ * fails.
  */
 #ifndef BENCH_CALLS_H
 #define BENCH_CALLS_H
@@ -11,7 +11,7 @@
 extern "C" {
 #endif
 
-/* The values that a parser found, as one number: to see that all found the same. */
+/* A checksum of the values that a parser found, to compare the implementations. */
 struct digest {
   uint64_t value;
 };
@@ -28,7 +28,7 @@ static inline void digest_text(struct digest* digest, const char* text) {
   digest_number(digest, 256);
 }
 
-/* What the requests carry, besides what the calls are given. */
+/* The values that all requests carry. */
 enum { kRequestId = 123456789, kMessageTtl = 86400, kMessageType = 0 /* TEXT */ };
 static const int64_t kChatroomId = INT64_C(1234567890123);
 static const int64_t kMessageId = INT64_C(1419876543210123);
@@ -36,9 +36,9 @@ static const int64_t kMessageId = INT64_C(1419876543210123);
 /*
  * The serializers hand out a block with the encoding, which the caller frees, and its length.
  *
- * The parsers turn the bytes into plain data of C that does not need them any more, and release it.
- * In between, unless the digest is NULL, they add every value to it, in the order given here. All
- * values are present, and a number that is not named is none of the interface's.
+ * The parsers turn the bytes into plain C data that does not point into the bytes, and release it.
+ * Before that they add each value to the digest, unless it is NULL, in the order given here. All
+ * values are present.
  */
 struct implementation {
   const char* name;
@@ -47,7 +47,7 @@ struct implementation {
   unsigned char* (*echo_reply)(int64_t request_id, int* size);
 
   /* ChatRequest: requestId, chatroomId, and one of chatMessageParams: msgId, msgType, chatMsg,
-   * msgTtl; of the constants but for the text */
+   * msgTtl. Apart from the text these are the constants above. */
   unsigned char* (*chat_request)(const char* text, int* size);
 
   /* ChatReply: requestId, chatroomId, result.code, result.msg; the number of
@@ -65,7 +65,7 @@ struct implementation {
   void (*chatroom_entry)(const unsigned char* data, int size, struct digest* digest);
 };
 
-/* The program's own. What an implementation leaves out is NULL. */
+/* The program's implementation. A call that it does not have is NULL. */
 extern const struct implementation implementation;
 
 #ifdef __cplusplus

@@ -12,7 +12,7 @@ namespace {
 
 using Block = std::unique_ptr<unsigned char, decltype(&free)>;
 
-// The calls by name, with what is asked of each.
+// A call, and the amounts of its cases: bytes of text, or entries of a list.
 struct Call {
   std::string name;
   bool is_implemented;

@@ -1,4 +1,4 @@
-// check_calls: do the implementation's calls hand out what they should, in every case?
+// check_calls: checks in every case that the implementation's call hands out what it should.
 
 #include <cstdio>
 

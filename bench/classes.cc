@@ -1,5 +1,5 @@
-// The calls with the generated classes and nothing else, as a careful user of them writes it. It is
-// built with each of two versions of them, under the name that the build gives.
+// The calls with the generated classes alone, as a careful user would write them. The file is built
+// with two versions of the classes; the build names each.
 
 #include <cstdlib>
 #include <cstring>
@@ -18,7 +18,7 @@ T* checked(T* block) {
   return block;
 }
 
-// Elements may be pointers to records.
+// T may be a pointer to a record.
 template <typename T>
 T* allocate(int count) {
   // NOLINTNEXTLINE(bugprone-sizeof-expression)
@@ -73,7 +73,7 @@ unsigned char* chat_request(const char* text, int* size) {
   return encode(request, size);
 }
 
-// ---- Received messages. As with the interface, the message is gone when its data is released.
+// ---- Received messages. As in the library, the message is destroyed before its data is used.
 
 struct ReplyHead {
   int64_t request_id;

@@ -1,7 +1,7 @@
-// count_calls CASE CALLS: makes so many calls, after some that bring the heap and the caches of the
-// C library into their usual state, and prints what they took: allocations, those kept, and log
-// lines. 0 stands for what the program cannot count. Who counts instructions from outside compares
-// runs of different length.
+// count_calls CASE CALLS: makes so many calls and prints what they took: blocks allocated, blocks
+// kept, and log lines; 0 for what the program is not linked to count. Some calls before them bring
+// the heap and the C library's caches into their usual state. To count instructions, compare runs
+// of different length.
 
 #include <cstdio>
 #include <cstdlib>

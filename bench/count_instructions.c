@@ -1,13 +1,13 @@
 /*
- * A plug-in of QEMU, whose user-mode emulator runs a program for another processor: at its end, the
- * number of instructions that it executed goes to standard error.
+ * A plug-in of QEMU's user-mode emulator: when the emulated program ends, it prints the number of
+ * executed instructions on standard error.
  */
 #include <inttypes.h>
 #include <stddef.h>
 #include <stdint.h>
 #include <stdio.h>
 
-/* What is used of QEMU's interface for plug-ins, version 1: Debian has no header of it. */
+/* The part of QEMU's plug-in interface, version 1, used here. Debian has no header of it. */
 typedef uint64_t qemu_plugin_id_t;
 struct qemu_info_t;
 struct qemu_plugin_tb;
@@ -27,7 +27,7 @@ int qemu_plugin_install(qemu_plugin_id_t id, const struct qemu_info_t* info, int
 
 static uint64_t instructions;
 
-/* A block of instructions is left early only by a signal, of which there are none. */
+/* Only a signal could end a block before its last instruction, and there are no signals. */
 static void count_block(qemu_plugin_id_t id, struct qemu_plugin_tb* block) {
   (void)id;
   qemu_plugin_register_vcpu_tb_exec_inline(block, QEMU_PLUGIN_INLINE_ADD_U64, &instructions,

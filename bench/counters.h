@@ -1,4 +1,4 @@
-/* What a program counts of itself, if it is linked with what counts it. */
+/* Counters of a program. Each is NULL unless the program is linked with the file that has it. */
 #ifndef BENCH_COUNTERS_H
 #define BENCH_COUNTERS_H
 

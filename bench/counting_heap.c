@@ -1,9 +1,9 @@
-/* A heap that counts the blocks that the program, of one thread, takes from it and gives back. */
+/* A heap that counts the blocks that a program of one thread allocates and releases. */
 #include <stddef.h>
 
 #include "counters.h"
 
-/* glibc's own, under the names by which it lets others build on them. */
+/* The functions of glibc that do the work, under the names that glibc exports for this. */
 void* __libc_malloc(size_t size);
 void* __libc_calloc(size_t count, size_t size);
 void* __libc_realloc(void* block, size_t size);
@@ -27,7 +27,7 @@ void* calloc(size_t elements, size_t size) {
   return count(__libc_calloc(elements, size));
 }
 
-/* A block that grows is a new one in place of the old. */
+/* Counts as a new block in place of the old one. */
 void* realloc(void* block, size_t size) {
   if (block != NULL) {
     --counted.kept;

@@ -1,10 +1,10 @@
-/* A log service that counts each thread's lines and does nothing else. */
+/* A log service that only counts the lines of each thread. */
 
 #include "counters.h"
 
 static _Thread_local long lines;
 
-/* What comes after these it does not take. */
+/* The format and its arguments are not looked at. */
 int __dlog_print(int log_id, int priority, const char* tag);
 
 int __dlog_print(int log_id, int priority, const char* tag) {

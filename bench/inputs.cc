@@ -9,7 +9,7 @@ void put_varint(std::string* out, uint64_t value) {
   out->push_back(static_cast<char>(value));
 }
 
-// A message in the making: its fields are written in the order of the calls.
+// Writes a message: its fields stand in the order of the calls.
 class Message {
  public:
   void number(int field, int64_t value) {
@@ -27,7 +27,7 @@ class Message {
   std::string bytes_;
 };
 
-// Ids and times as the service gives them out.
+// Ids and times of the size that the service uses.
 constexpr int64_t kFirstUser = 1000000007;
 constexpr int64_t kFirstMessage = 1419876543210000;
 constexpr int64_t kFirstTime = 1419876543210;
@@ -134,7 +134,7 @@ Received message_page_of(int messages) {
   return {push.encoding(), digest};
 }
 
-// The schema's order of fields differs from that of the digest.
+// The fields stand in the order of their numbers, which is not that of the digest.
 Received chatroom_entry_of(int members) {
   struct digest digest = {0};
   const auto number = [&](Message* to, int field, int64_t value) {

@@ -1,4 +1,4 @@
-// What the calls are given, and what has to come out: written byte by byte, by none of the
+// The inputs of the calls and the expected outputs, written byte by byte, without any of the
 // implementations.
 #ifndef BENCH_INPUTS_H
 #define BENCH_INPUTS_H
@@ -14,15 +14,15 @@ struct Received {
   struct digest digest;
 };
 
-// A text of so many bytes.
+// A text of length bytes.
 std::string text_of(int length);
 
 // The encodings that the serializers hand out.
 std::string echo_reply_bytes();
 std::string chat_request_bytes(const std::string& text);
 
-// What the parsers are given: with so many entries, messages of 100 bytes, or members with a read
-// and a delivery mark each.
+// The inputs of the parsers, with a number of entries, of messages with a text of 100 bytes, or of
+// members with a read mark and a delivery mark each.
 Received chat_reply_of(int entries);
 Received message_page_of(int messages);
 Received chatroom_entry_of(int members);

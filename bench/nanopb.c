@@ -1,5 +1,5 @@
-/* The calls with nanopb. Its decoded messages are plain data of C already: with the options here,
- * lists and texts are blocks of their own. */
+/* The calls with nanopb. Its decoded messages are plain C data. With nanopb.options, lists and
+ * texts are blocks of their own. */
 
 #include <pb_decode.h>
 #include <pb_encode.h>
@@ -50,7 +50,7 @@ static unsigned char* chat_request(const char* text, int* size) {
   param.msgId = kMessageId;
   param.has_msgType = true;
   param.msgType = (MsgType)kMessageType;
-  param.chatMsg = (char*)text; /* which encoding only reads */
+  param.chatMsg = (char*)text; /* encoding does not write to it */
   param.has_msgTtl = true;
   param.msgTtl = kMessageTtl;
   request.has_requestId = true;

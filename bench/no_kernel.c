@@ -1,5 +1,5 @@
-/* A thread id that costs nothing, to see what the kernel's costs: a call into the kernel also
- * empties caches and predictions that the code after it would have used. */
+/* A thread id that costs nothing, to see what asking the kernel costs. A call into the kernel also
+ * slows down the code after it, because it disturbs the processor's caches and predictions. */
 
 #include <errno.h>
 #include <sys/syscall.h>
@@ -10,6 +10,6 @@ long syscall(long number, ...) {
   if (number == SYS_gettid) {
     return 1;
   }
-  errno = ENOSYS; /* nobody here calls another */
+  errno = ENOSYS; /* the library makes no other system call by this function */
   return -1;
 }

@@ -1,4 +1,4 @@
-# plot.gp FOLDER SVG: the report's plot of what report.py has written to the folder.
+# plot.gp FOLDER SVG: draws the report's plot from the data that report.py wrote to the folder.
 folder = ARG1
 set terminal svg size 1100,1150 font "sans-serif,13" background "white" name "benchmark"
 set output ARG2
@@ -13,7 +13,7 @@ set grid ytics lc rgb "#dddddd"
 set tics nomirror
 set border 3
 
-# Each case's bars, in the order of the report's columns.
+# The histogram: a bar for each column of the report's table.
 set origin 0,0.56
 set size 1,0.44
 set title "Time of a call, as a ratio to the generated classes used directly"
@@ -29,7 +29,7 @@ array names[6] = ["this library", "generated classes", "by hand", "Protocol Buff
 set xtics scale 0
 plot for [i = 1:6] folder."/cases.txt" using (column(i + 1)):xtic(1) linestyle i title names[i]
 
-# Growth: both axes logarithmic, so that what grows in proportion is a line of slope 1.
+# The plots of growth: both axes are logarithmic, so that proportional growth is a line of slope 1.
 array calls[4] = ["chat_request", "chat_reply", "message_page", "chatroom_entry"]
 array titles[4] = ["chat request", "chat reply", "page of messages", "room"]
 set style data linespoints

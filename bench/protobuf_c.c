@@ -1,4 +1,4 @@
-/* The calls with protobuf-c, whose unpacked messages are plain data of C already. */
+/* The calls with protobuf-c. Its unpacked messages are plain C data. */
 
 #include <stdlib.h>
 
@@ -37,7 +37,7 @@ static unsigned char* chat_request(const char* text, int* size) {
   param.msgid = kMessageId;
   param.has_msgtype = 1;
   param.msgtype = (MsgType)kMessageType;
-  param.chatmsg = (char*)text; /* which packing only reads */
+  param.chatmsg = (char*)text; /* packing does not write to it */
   param.has_msgttl = 1;
   param.msgttl = kMessageTtl;
   params[0] = &param;

@@ -1,6 +1,6 @@
 /*
- * The lists that the interface hands out, and the floor as it does: each function adds the list to
- * the digest, unless that is NULL, and releases it.
+ * The lists that the library hands out, and the baseline in the same form. Each function adds the
+ * list to the digest, unless that is NULL, and releases the list.
  */
 #ifndef BENCH_RECORDS_H
 #define BENCH_RECORDS_H

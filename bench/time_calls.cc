@@ -20,7 +20,7 @@ int main(int argc, char** argv) {
   for (const std::string& name : names) {
     benchmark::RegisterBenchmark(name.c_str(), time_case, name);
   }
-  // Those that threads of their own call at once.
+  // Cases that several threads call at once.
   for (const std::string& name : names) {
     if (name == "chat_request/100" || name == "chat_reply/1") {
       benchmark::RegisterBenchmark(("at_once/" + name).c_str(), time_case, name)

@@ -1,6 +1,5 @@
-// time_loading LIBRARY: how long this process takes to load the library, with the runtime it needs
-// and all that its start does, in nanoseconds. The C++ library is there before, as in any process
-// that has a module in C++.
+// time_loading LIBRARY: prints how many nanoseconds it takes to load the library and its runtime,
+// initialisers included. The C++ standard library is loaded already, as in all C++ processes.
 
 #include <dlfcn.h>
 

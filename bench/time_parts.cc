@@ -1,6 +1,6 @@
-// Times what a chat request of 100 bytes is made of, each step with all those before it, and what
-// the interface adds to the generated classes: the thread id in a log line, the stream that parsers
-// keep. The arguments are those of Google Benchmark.
+// Times the parts of a chat request of 100 bytes, each step together with those before it, and two
+// things that the library adds to the generated classes: the thread id of a log line, and the
+// stream that parsers keep. The arguments are those of Google Benchmark.
 
 #include <benchmark/benchmark.h>
 #include <google/protobuf/io/coded_stream.h>

@@ -1,5 +1,5 @@
-# The log service that __dlog_print comes from: the target device-log. The device's dlog where the
-# build finds it or is told where it is, the workstation's stand-in otherwise.
+# The target device-log: the log service with __dlog_print. It is the dlog that QEL_DLOG_LIBRARY
+# names or that CMake finds, otherwise the workstation's stand-in.
 
 set(QEL_DLOG_LIBRARY "" CACHE FILEPATH "The device's dlog library (empty: look for it)")
 

@@ -1,5 +1,5 @@
-# For tests that start programs themselves: what to put in front, in the variable emulator. Empty where
-# programs run as they are. ctest does that by itself.
+# The variable emulator: the command that tests put in front of the programs that they start. It is
+# empty if this machine runs them itself. For the tests' own programs ctest uses the emulator.
 set(emulator "")
 if(CMAKE_CROSSCOMPILING_EMULATOR)
   set(emulator "${PROJECT_BINARY_DIR}/emulate")

@@ -1,10 +1,10 @@
-# The symbols that other modules see: the C interface and all that the schema's compiler generates.
-# Templates and inline functions of others, which are compiled into the library too, stay inside.
+# The symbols that the library exports: the C interface and all that the schema's compiler
+# generates. Templates and inline functions of other libraries are compiled in, but not exported.
 
 # qel_write_version_script(OUTPUT FUNCTIONS SCHEMA): FUNCTIONS lists the C interface, a name a line.
 function(qel_write_version_script output functions schema)
   set_property(DIRECTORY APPEND PROPERTY CMAKE_CONFIGURE_DEPENDS "${functions}" "${schema}")
-  set(script "{\nglobal:\n") # a node without a name: the symbols have no version
+  set(script "{\nglobal:\n") # without a name, so that the symbols have no version
 
   file(STRINGS "${functions}" names)
   foreach(name IN LISTS names)

@@ -1,16 +1,15 @@
-# Where things are installed, in the prefix.
+# The folders of an installation.
 
-# Debian's layout, so that what is installed in /usr serves as a package of any machine; but a device
-# has its SDK's.
+# Debian's layout, which the packages need. A device has the layout of its SDK.
 if(CMAKE_LIBRARY_ARCHITECTURE AND NOT CMAKE_SYSROOT)
-  # As PATH, a name that is given for it would become absolute.
+  # Not of the type PATH, which would make a relative name absolute.
   set(CMAKE_INSTALL_LIBDIR "lib/${CMAKE_LIBRARY_ARCHITECTURE}" CACHE STRING
     "Folder of libraries in the prefix")
 endif()
 include(GNUInstallDirs)
 
-# CMake makes folders as the umask has it. Those that an installation makes are for all to read;
-# those that were there stay as they are.
+# CMake makes folders with the permissions of the umask. An installation makes those that it adds
+# readable for all, and leaves alone those that were there.
 set(_folders
   "${CMAKE_INSTALL_BINDIR}"
   "${CMAKE_INSTALL_INCLUDEDIR}/${PROJECT_NAME}"

@@ -1,4 +1,4 @@
-# What every piece of our own code is built with.
+# The language versions, options and warnings of all code of this repository.
 
 set(CMAKE_C_STANDARD 99)
 set(CMAKE_CXX_STANDARD 17)
@@ -24,18 +24,18 @@ if(QEL_SANITIZE)
   add_compile_options(${QEL_SANITIZE_FLAGS} -fno-sanitize-recover=all -fno-omit-frame-pointer)
   add_link_options(${QEL_SANITIZE_FLAGS})
   if(QEL_SANITIZE MATCHES "undefined" AND CMAKE_CXX_COMPILER_ID MATCHES "Clang")
-    add_compile_options(-fno-sanitize=vptr) # whose runtime clang does not link into C programs
+    add_compile_options(-fno-sanitize=vptr) # clang does not link its runtime into C programs
   endif()
 endif()
 
-# Fuzzing is guided by the paths that an input takes through our code and the generated one.
+# The fuzzer sees which paths an input takes through our code and the generated code.
 option(QEL_FUZZ "Build the fuzz targets (clang, with QEL_SANITIZE)" OFF)
 if(QEL_FUZZ)
   add_compile_options(-fsanitize=fuzzer-no-link)
 endif()
 
-# Aborts name files as they lie in the tree, wherever the build folder is: generated ones as if
-# beside their sources. The last map that fits wins.
+# Aborts name files relative to the tree, wherever it and the build folder are. A generated file is
+# named as if it lay beside its source. If both options fit, the compiler takes the last one.
 add_compile_options(
   "-fmacro-prefix-map=${PROJECT_SOURCE_DIR}/="
   "-fmacro-prefix-map=${PROJECT_BINARY_DIR}/=")

@@ -1,7 +1,6 @@
-# Protocol Buffers, 2.6 series, 2.6.1 at least: the target protobuf26 (headers and shared library) and
-# the compiler of the schema, QEL_PROTOC. ./dev setup builds one in .deps; an existing installation, a
-# device SDK's for example, is used where QEL_PROTOBUF_ROOT names it. When cross-compiling, the
-# target's runtime is the one of ./dev arm, and its compiler the one of this machine.
+# Protocol Buffers 2.6.1, or a later one of the series: the target protobuf26 (headers and shared
+# library) and the compiler of the schema, QEL_PROTOC_COMMAND. They are those that ./dev builds in
+# .deps, for ARM and for this machine, unless QEL_PROTOBUF_ROOT and QEL_PROTOC name others.
 
 set(QEL_PROTOBUF_ROOT "" CACHE PATH "Installation of Protocol Buffers 2.6.1 (empty: the one of ./dev)")
 set(QEL_PROTOC "" CACHE FILEPATH "Compiler of the schema (empty: the installation's, or the one of ./dev when cross-compiling)")
@@ -53,7 +52,7 @@ if(NOT _protoc_version MATCHES "^2\\.6\\.[1-9]")
 endif()
 set(QEL_PROTOC_COMMAND "${_protoc}")
 
-# Multiarch folders too: that is where a device SDK's sysroot keeps it.
+# A device SDK's sysroot has the library in a multiarch folder.
 find_library(QEL_PROTOBUF_LIBRARY NAMES libprotobuf.so
   HINTS "${QEL_PROTOBUF_PREFIX}" PATH_SUFFIXES lib lib64 "lib/${CMAKE_LIBRARY_ARCHITECTURE}"
   NO_DEFAULT_PATH NO_CACHE NO_CMAKE_FIND_ROOT_PATH)
@@ -68,5 +67,5 @@ set_target_properties(protobuf26 PROPERTIES
   INTERFACE_INCLUDE_DIRECTORIES "${QEL_PROTOBUF_PREFIX}/include"
   INTERFACE_LINK_LIBRARIES Threads::Threads)
 
-# The runtime's own checks name its headers as they are included.
+# Failed checks in the runtime's headers name them as they are included.
 add_compile_options("-fmacro-prefix-map=${QEL_PROTOBUF_PREFIX}/include/=")

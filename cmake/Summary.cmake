@@ -1,4 +1,4 @@
-# What this build is made of.
+# The last lines of the configuration: what the build uses.
 message(STATUS "qel-message-protosvc ${PROJECT_VERSION}: ${CMAKE_BUILD_TYPE}, ${CMAKE_SYSTEM_PROCESSOR}")
 message(STATUS "  compiler           ${CMAKE_CXX_COMPILER_ID} ${CMAKE_CXX_COMPILER_VERSION}")
 message(STATUS "  Protocol Buffers   ${QEL_PROTOBUF_VERSION} (${QEL_PROTOBUF_LIBRARY})")

@@ -1,11 +1,10 @@
-# What the toolchains for 32-bit ARM have in common. The file that includes this one names the
-# target's triple in CMAKE_LIBRARY_ARCHITECTURE and its processor in CMAKE_C_FLAGS_INIT. Debian's
-# cross compiler is used unless CC and CXX in the environment, or CMAKE_C_COMPILER and
-# CMAKE_CXX_COMPILER, name a device SDK's.
+# The common part of the toolchains for 32-bit ARM. The file that includes this one sets
+# CMAKE_LIBRARY_ARCHITECTURE to the target's triple and CMAKE_C_FLAGS_INIT to its processor.
+# README.md explains the settings for a device SDK.
 
 set(CMAKE_SYSTEM_NAME Linux)
 set(CMAKE_SYSTEM_PROCESSOR armv7-a)
-set(CMAKE_CXX_FLAGS_INIT "${CMAKE_C_FLAGS_INIT} -Wno-psabi") # which tells of compilers before GCC 7
+set(CMAKE_CXX_FLAGS_INIT "${CMAKE_C_FLAGS_INIT} -Wno-psabi") # notes about compilers before GCC 7
 
 if(NOT CMAKE_C_COMPILER AND "$ENV{CC}" STREQUAL "")
   set(CMAKE_C_COMPILER "${CMAKE_LIBRARY_ARCHITECTURE}-gcc")
@@ -14,8 +13,8 @@ if(NOT CMAKE_CXX_COMPILER AND "$ENV{CXX}" STREQUAL "")
   set(CMAKE_CXX_COMPILER "${CMAKE_LIBRARY_ARCHITECTURE}-g++")
 endif()
 
-# Where the target's files lie: the SDK's CMAKE_SYSROOT, or Debian's folder, whose compiler finds it
-# by itself.
+# The folder of the target's files: the SDK's sysroot, or Debian's folder, which Debian's compiler
+# finds itself.
 if(CMAKE_SYSROOT)
   set(_target_root "${CMAKE_SYSROOT}")
 else()
@@ -27,7 +26,7 @@ set(CMAKE_FIND_ROOT_PATH_MODE_LIBRARY ONLY)
 set(CMAKE_FIND_ROOT_PATH_MODE_INCLUDE ONLY)
 set(CMAKE_FIND_ROOT_PATH_MODE_PACKAGE ONLY)
 
-# ctest runs the target's programs with it.
+# ctest runs the target's programs with this emulator.
 if(NOT CMAKE_CROSSCOMPILING_EMULATOR)
   set(CMAKE_CROSSCOMPILING_EMULATOR qemu-arm -L "${_target_root}")
 endif()

@@ -1,14 +1,14 @@
 #!/usr/bin/env python3
-"""A Markdown page or the header as Doxygen takes it, while others have it as it is.
+"""Prints a Markdown page or the header in the form that Doxygen needs.
 
 usage: doxygen_filter.py FILE
 
-In a page, Mermaid's sequence diagrams become PlantUML's, whose language is the same but for the
-participants. Headings get names, and links go to these; functions are links. A file that is not in
-the reference is named, not linked.
+In a page, Mermaid's sequence diagrams become PlantUML's; only the lines of participants differ.
+Headings get names, to which links then lead, and names of functions become links. A link to a file
+that is not in the reference becomes plain text.
 
-In the header, each function gets what its caller frees, from the table of docs/interface.md, and
-what to see also: the other functions of its section, and the notes that hold for all.
+In the header, two paragraphs are added to each function: what its caller frees, from the table of
+docs/interface.md, and "see also" with the other functions of its section.
 """
 
 import collections
@@ -20,20 +20,20 @@ IMAGE_OR_LINK = re.compile(r"(!?)\[((?:[^][]|\[[^][]*\])*)\]\(([^()\s]+)\)")
 
 
 def slug(heading):
-    """The anchor that viewers of Markdown give a heading, if it is the first of its kind."""
+    """The anchor that viewers of Markdown give a heading that is on the page once."""
     plain = IMAGE_OR_LINK.sub(r"\2", heading).lower()
     return re.sub(r"[^\w\- ]", "", plain).replace(" ", "-")
 
 
 def name_of(page, anchor=""):
-    """The name of a page, or of a heading on it, among those of all pages."""
+    """The name by which all pages can link to a page, or to a heading on it."""
     name = re.sub(r"\W", "_", os.path.splitext(page)[0])
-    name = "mainpage" if name == "README" else f"page_{name}"  # which is Doxygen's for the first
+    name = "mainpage" if name == "README" else f"page_{name}"  # Doxygen's name of the first page
     return f"{name}_{anchor}" if anchor else name
 
 
 def sources():
-    """Those in the reference: the header, and the examples."""
+    """The sources in the reference: the header, and the examples."""
     with open("docs/examples.dox", encoding="utf-8") as file:
         examples = re.findall(r"@example (\S+)", file.read())
     return ["proto-lib/qel-message-serialize.h"] + [f"examples/{name}" for name in examples]
@@ -43,7 +43,7 @@ def link(match, page):
     image, text, target = match.groups()
     if image or re.match(r"\w+:", target):
         return match[0]
-    plain = " ".join(text.replace("`", "").split())  # as Doxygen wants the text of a link to a name
+    plain = " ".join(text.replace("`", "").split())  # Doxygen needs a link's text so
     path, _, anchor = target.partition("#")
     path = os.path.normpath(os.path.join(os.path.dirname(page), path)) if path else page
     if path.endswith(".md"):
@@ -64,18 +64,18 @@ def prose(text, page, slugs):
     text = re.sub(r"^(#+) (.*)$", heading, text, flags=re.MULTILINE)
     text = IMAGE_OR_LINK.sub(lambda match: link(match, page), text)
     text = re.sub(r"(?<!\[)`(\w+_(?:de)?serialize)`", r"[\1](@ref \1)", text)
-    return re.sub(r"`([\w-]*)(::[\w-]+)`", r"<code>\1\\\2</code>", text)  # or Doxygen looks for it
+    return re.sub(r"`([\w-]*)(::[\w-]+)`", r"<code>\1\\\2</code>", text)  # no name to Doxygen
 
 
 def diagram(block):
     block = re.sub(r"^```mermaid\nsequenceDiagram$", "\n@startuml", block, flags=re.MULTILINE)
     block = re.sub(r"^```$", "@enduml", block, flags=re.MULTILINE)
     block = re.sub(r"participant (\w+) as (.+)", r'participant "\2" as \1', block)
-    return f"<center>{block}\n</center>"  # which scrolls by itself where the window is too narrow
+    return f"<center>{block}\n</center>"  # scrolls in a narrow window
 
 
 def owners():
-    """What the caller of each function frees."""
+    """What the caller of each function frees, by the function."""
     with open("docs/interface.md", encoding="utf-8") as file:
         rows = [re.split(r" *\| *", line.strip("| \n")) for line in file if line.startswith("|")]
     column = rows[0].index("Caller frees")
@@ -90,7 +90,7 @@ def header(text, name):
 
         def end_of_comment(match):
             others = [function for function in functions if function != match[1]]
-            # In one line, so that line numbers stay those of the file.
+            # All in one line, so that line numbers stay the same.
             return (
                 f" * @par Who frees what @newline The caller frees {frees[match[1]]}."
                 f" What holds for all functions is in {name}."

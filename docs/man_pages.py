@@ -1,10 +1,10 @@
 #!/usr/bin/env python3
-"""The man pages, in the shape that man pages have, of those that Doxygen writes.
+"""Rewrites the man pages that Doxygen makes in the usual form of man pages.
 
 usage: man_pages.py FOLDER-OF-DOXYGENS FOLDER
 
-Doxygen has a page for each section of the header; here each function has its own, and other pages,
-the Markdown ones, have none.
+Doxygen writes one page for each section of the header. Here each function gets a page of its own.
+The Markdown pages get none.
 """
 
 import pathlib
@@ -15,9 +15,9 @@ INCLUDE = ".nf\n.B #include <qel\\-message\\-serialize.h>\n.fi\n"
 
 
 def description(body):
-    """A function's text, with sections and tagged paragraphs instead of bold and italic words."""
+    """A function's text, with sections and tagged paragraphs for bold and italic words."""
     body = re.sub(r"^\n\.PP\n\\fC#include .*\n\.PP\n", "", body)
-    body = re.sub(r"\.PP\n\\fBExamples\\fP\n.*\n.*\n", "", body)  # which are web pages
+    body = re.sub(r"\.PP\n\\fBExamples\\fP\n.*\n.*\n", "", body)  # they are web pages
     body = re.sub(r"^(\\fI.*?\\fP) (.*?) *\n(\.br\n)?", r".TP\n\1\n\2\n", body, flags=re.M)
     body = re.sub(
         r"\.PP\n\\fB(Who frees what|See also) *\\fP\n\.RS 4\n(.*?) *\n\.RE\n",
@@ -41,7 +41,7 @@ def functions(page):
         result, arguments, brief = re.search(
             rf'^\.RI "(\w+) \\fB{name}\\fP \((.*)\)"\n\.br\n\.RI "(.*?)(?:\\&\.)? "', page, re.M
         ).groups()
-        arguments = arguments.replace(" ", r"\ ").replace(r",\ ", ", ")  # to break lines at commas
+        arguments = arguments.replace(" ", r"\ ").replace(r",\ ", ", ")  # break at commas only
         yield name, (
             f'.TH "{name}" 3 "" "{project} {version}" " "\n.ad l\n.nh\n'
             f".SH NAME\n{name} \\- {brief}\n"

@@ -1,8 +1,8 @@
 /*
  * framing.h - how the example's two ends put messages on a TCP connection.
  *
- * The library hands out and takes bare messages. Telling where one ends and which message it is is
- * the caller's business; this example's frames are
+ * The library hands out and takes bare messages. The caller has to tell where a message ends and
+ * which one it is. In this example each message travels in a frame of
  *
  *   1 byte    length of the message's name
  *   n bytes   the name, as in the schema, for example "ChatRequest"
@@ -35,7 +35,7 @@ int frame_send(int socket, const char* name, const unsigned char* message, int s
 
 /*
  * Receives one message. Returns 1, or 0 if the other end closed the connection between two frames,
- * or -1 if it did so within one, sent a frame that is none, or sent nothing in time.
+ * or -1 if it closed it within a frame, sent no valid frame, or sent nothing in time.
  */
 int frame_receive(int socket, frame_t* frame);
 

@@ -2,10 +2,10 @@
 //
 //   front_end [--port PORT] [--port-file FILE] [--timeout SECONDS]
 //
-// listens on 127.0.0.1, on a free port unless one is given, writes the port's number to FILE, and
-// gives the plug-in so long to come and for each message.
-// Exits with 0 after a whole session, with 1 after a wrong exchange or when nobody comes, and with
-// 2 if it was called wrongly.
+// listens on 127.0.0.1, on a free port unless one is given, and writes the port's number to FILE.
+// It waits SECONDS at most for the plug-in to connect, and for each message. It exits with 0 after
+// a whole session, with 1 after a wrong exchange or if no plug-in connects, and with 2 if it was
+// called wrongly.
 
 #include <arpa/inet.h>
 #include <google/protobuf/stubs/common.h>
@@ -27,7 +27,7 @@ namespace {
 
 constexpr int kSessionSeconds = 60;  // at most, whatever the plug-in does
 
-// A number of least to most; ends the program if the text is none.
+// The number in the text, least to most; ends the program if it is no such number.
 int parse_number(const char* what, const char* text, long least, long most) {
   char* end = nullptr;
   const long number = std::strtol(text, &end, 10);
@@ -70,7 +70,7 @@ int port_of(int listener) {
   return ntohs(address.sin_port);
 }
 
-// Whoever waits for the file sees it whole or not at all.
+// Writes another file and renames it, so that nobody reads a part of the file.
 void write_port_file(const std::string& path, int port) {
   const std::string unfinished = path + ".unfinished";
   std::FILE* file = std::fopen(unfinished.c_str(), "w");

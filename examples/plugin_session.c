@@ -1,14 +1,14 @@
 /*
  * A message plug-in's day with the service, in plain C: it authenticates its channel, reads the
- * service's clock, creates a chatroom, enters it, sends and receives messages, fetches those that
- * were stored meanwhile, reports what the user read, typed and spoke, changes and leaves chatrooms,
+ * service's clock, creates a chatroom, enters it, sends and receives messages, fetches stored ones,
+ * reports what the user has read, that the user types, and a call, changes and leaves chatrooms,
  * and takes the service's pushes whenever they come.
  *
  *   plugin_session PORT [--access-token TEXT] [--timeout SECONDS]
  *
- * talks to the front end that listens on that port of 127.0.0.1, and gives it so long for each
- * reply. Exits with 0 if every exchange went as it should, with 1 otherwise, and with 2 if it was
- * called wrongly.
+ * talks to the front end that listens on that port of 127.0.0.1, and waits SECONDS at most for each
+ * reply. Exits with 0 if every exchange succeeded, with 1 otherwise, and with 2 if it was called
+ * wrongly.
  */
 #define _POSIX_C_SOURCE 200809L
 #include <arpa/inet.h>
@@ -203,7 +203,7 @@ static int enter_chatroom(session_t* session, int64_t chatroom) {
   return status;
 }
 
-/* Changes the title, or else the lifetime: the one that is not NULL. */
+/* Changes the title or the lifetime: the one that is not NULL. */
 static int change_chatroom(session_t* session, int64_t chatroom, const char* title,
                            const int* lifetime) {
   unsigned char* message = NULL;
@@ -286,7 +286,7 @@ static int end_chats(session_t* session, int64_t chatroom) {
 
   entries[0].chatroomId = chatroom;
   entries[0].denyInvitation = false;
-  entries[1].chatroomId = 41; /* from another day */
+  entries[1].chatroomId = 41; /* of an earlier day */
   entries[1].denyInvitation = true;
   status = end_chat_request_serialize(++session->last_request_id, entries, 2, &message, &size);
   if (send_message(session, "EndChatRequest", status, message, size) != 0 ||
@@ -497,7 +497,7 @@ static int type_together(session_t* session, int64_t chatroom) {
   int typed_content = NOT_WRITTEN;
   int typed_refresh = NOT_WRITTEN;
 
-  /* The one serializer without a status: the buffer tells. */
+  /* This serializer returns no status: the buffer tells whether it failed. */
   is_typing_request_serialize(++session->last_request_id, chatroom, "typing", &content_type,
                               &refresh, &message, &size);
   if (send_message(session, "IsTyping", message != NULL ? 0 : -1, message, size) != 0 ||
@@ -587,7 +587,7 @@ static void usage(void) {
   exit(2);
 }
 
-/* A number of 1 to most; ends the program if the text is none. */
+/* The number in the text, 1 to most; ends the program if it is no such number. */
 static int parse_number(const char* text, long most) {
   char* end = NULL;
   const long number = strtol(text, &end, 10);

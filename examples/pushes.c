@@ -21,8 +21,8 @@ static int answer_echo(session_t* session, const frame_t* push) {
   return send_message(session, "ClientEchoReply", status, message, size);
 }
 
-/* A message for the user. The record that receives it is ours; the service names the chatroom
-   beside it. */
+/* A message for the user. The call fills our record, but for the chatroom, which is an output of
+   its own. */
 static int take_online_message(session_t* session, const frame_t* push) {
   int64_t request_id = NOT_WRITTEN;
   int64_t chatroom = 0;

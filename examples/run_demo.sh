@@ -1,10 +1,10 @@
 #!/usr/bin/env bash
-# Lets the example's plug-in talk to its front end. Exits with 0 only if both ends are content.
+# Lets the example's plug-in talk to its front end. Exits with 0 only if both succeed.
 #
 #   run_demo.sh FOLDER [--log] [--port PORT] [--access-token TEXT] [--emulator COMMAND]
 #
-# FOLDER holds the two programs. --log shows the library's log lines too. COMMAND, an emulator, runs
-# the programs.
+# FOLDER holds the two programs. --log shows the library's log lines too. COMMAND is an emulator that
+# runs the programs.
 set -u
 
 usage() {

@@ -31,7 +31,7 @@ constexpr int64_t kStart = 1700000000000;  // of what happened before the sessio
 
 enum ResultCode { kOk = 0, kSomeRefused = 1001, kBadToken = 2001, kSomeNotInvited = 3003 };
 
-// What a session of this example consists of, and what the plug-in does with it.
+// The requests of a session, and what the plug-in does with each.
 constexpr struct {
   const char* name;
   const char* title;
@@ -65,7 +65,7 @@ bool is_plain_field(const std::string& line) {
   return line.back() != '{' && line.back() != '}';
 }
 
-// Puts fields that stand one a line side by side, as far as a terminal is wide.
+// Joins lines of one field each, as long as the result fits on a terminal.
 std::string side_by_side(const std::string& fields) {
   std::vector<std::string> lines;
   std::istringstream input(fields);
@@ -115,7 +115,7 @@ std::string text_form(const Message& message) {
 }
 
 void print_message(const char* direction, const Message& message, int size) {
-  std::ostringstream text;  // whole, as the plug-in prints too
+  std::ostringstream text;  // printed in one piece, as the plug-in prints too
   for (const auto& request : kRequests) {
     if (message.GetTypeName() == request.name) {
       text << "\n== " << request.title << "\n";

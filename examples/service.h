@@ -13,7 +13,7 @@
 
 #include "msgspec_frontend.pb.h"
 
-// Anything that a front end of this service must not be sent.
+// The plug-in sent something that it must not send, or the connection failed.
 struct WrongExchange : std::runtime_error {
   using std::runtime_error::runtime_error;
 };
@@ -24,7 +24,7 @@ class Service {
  public:
   explicit Service(int connection) : connection_(connection) {}
 
-  // Until the plug-in closes the connection. Throws WrongExchange.
+  // Serves the plug-in until it closes the connection. Throws WrongExchange.
   void run();
 
  private:
@@ -57,7 +57,7 @@ class Service {
   void end_chats(const EndChatRequest& request);
 
   void probe();
-  // The user's chat partner writes.
+  // Sends a message that the user's chat partner has written.
   void push_message(int64_t id, const std::string& text, bool skip_reply);
   void push_page(ForwardUnreadMessage page);
 

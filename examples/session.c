@@ -41,8 +41,8 @@ const char* shown_text(const qel_message_inboxentry_t* message) {
   return message->msgType == 0 ? message->chatMsg : "(no text)";
 }
 
-/* The outputs tell how the parse went: an id that is not written means that it failed, and a text
-   that is not that the reply has no whole result. */
+/* If the id was not written, the reply could not be parsed. If the text was not written, the reply
+   has no result, or one without a text. */
 int check_result(const session_t* session, const char* what, int64_t request_id, int code,
                  const char* text, int expected_code) {
   if (request_id == NOT_WRITTEN) {

@@ -9,17 +9,17 @@
 #include "framing.h"
 #include "qel-message-serialize.h"
 
-/* What an output is set to before a call, to see whether the call wrote it: no id or code of the
-   service's. */
+/* Outputs are set to this before a call, to see whether the call wrote them. The service uses it
+   neither as an id nor as a code. */
 enum { NOT_WRITTEN = -4711 };
 
-/* The service's codes: for success, and for success but for some of the users that were named. */
+/* The service's codes: success, and two for success except for some of the users. */
 enum { RESULT_OK = 0, RESULT_SOME_REFUSED = 1001, RESULT_SOME_NOT_INVITED = 3003 };
 
 typedef struct {
   int socket;
   int64_t last_request_id;
-  qel_message_inboxentry_t last_message; /* the last that was pushed alone; its chatMsg is ours */
+  qel_message_inboxentry_t last_message; /* the last that was pushed; its chatMsg is ours */
 } session_t;
 
 int failed(const char* what);
@@ -41,7 +41,7 @@ int check_result(const session_t* session, const char* what, int64_t request_id,
    reads as TEXT too, so nothing more is done with the text than to show it. */
 const char* shown_text(const qel_message_inboxentry_t* message);
 
-/* Takes a message that the service sends of its own accord. Fails if it is none. */
+/* Takes a message that the service sends of its own accord. Fails if it is another message. */
 int take_push(session_t* session, const frame_t* push);
 
 #endif

@@ -44,11 +44,17 @@ void fail(const std::string& finding) {
   std::abort();
 }
 
+std::unique_ptr<google::protobuf::Message> new_message(const std::string& name) {
+  const auto* file = ConnectionStatus::descriptor()->file();
+  return std::unique_ptr<google::protobuf::Message>(
+      google::protobuf::MessageFactory::generated_factory()
+          ->GetPrototype(file->FindMessageTypeByName(name))
+          ->New());
+}
+
 std::unique_ptr<google::protobuf::Message> new_message(unsigned char choice) {
   const auto* file = ConnectionStatus::descriptor()->file();
-  const auto* type = file->message_type(choice % file->message_type_count());
-  return std::unique_ptr<google::protobuf::Message>(
-      google::protobuf::MessageFactory::generated_factory()->GetPrototype(type)->New());
+  return new_message(file->message_type(choice % file->message_type_count())->name());
 }
 
 }  // namespace fuzz

@@ -11,7 +11,7 @@ here=$(cd "$(dirname "${BASH_SOURCE[0]}")" && pwd -P)
 run_target() {
   local target=$1 log=$corpus/$1.log folders inputs artifact
   mkdir -p "$corpus/$target"
-  folders=("$corpus/$target" "$here/seeds/$target")
+  folders=("$corpus/$target" "$programs/seeds/$target")
   [ ! -d "$here/regressions/$target" ] || folders+=("$here/regressions/$target")
   inputs=$(find "${folders[@]}" -type f | wc -l)
   if ! "$programs/$target" "$limit" -print_final_stats=1 -rss_limit_mb=1024 -timeout=10 \
@@ -32,7 +32,7 @@ run_target() {
     END { printf "%-42s %4d replayed, %9d runs, %5d edges\n", target, inputs, runs, edges }' "$log"
 }
 
-[ $# -gt 0 ] || mapfile -t targets < <(ls "$here/seeds")
+[ $# -gt 0 ] || mapfile -t targets < <(ls "$programs/seeds")
 [ $# -eq 0 ] || targets=("$@")
 mkdir -p "$corpus"
 export programs corpus limit here

@@ -1,5 +1,5 @@
-# Before cpack makes a package: its folders are for all to read, those of cpack's own included,
-# whatever the umask.
+# cpack runs this before it makes a package: all folders become readable for all, whatever the umask
+# is.
 file(GLOB_RECURSE paths LIST_DIRECTORIES true "${CPACK_TEMPORARY_INSTALL_DIRECTORY}/*")
 foreach(path IN LISTS paths)
   if(IS_DIRECTORY "${path}" AND NOT IS_SYMLINK "${path}")

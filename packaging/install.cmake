@@ -1,4 +1,4 @@
-# What 'cmake --install' puts where. Each component is a package of packages.cmake.
+# What 'cmake --install' installs, and where. Each component is a package of packages.cmake.
 
 include(CMakePackageConfigHelpers)
 set(_made "${CMAKE_CURRENT_BINARY_DIR}/packaging")
@@ -15,8 +15,9 @@ install(
 install(FILES proto-lib/msgspec_frontend.proto
   DESTINATION "${CMAKE_INSTALL_DATADIR}/${PROJECT_NAME}" COMPONENT development)
 
-# The input streams that deserializers keep on purpose, for valgrind: operator new makes them, while
-# what is handed out comes from malloc and calloc. LeakSanitizer is told by the library itself.
+# Tells valgrind which blocks the deserializers keep on purpose: their input streams, which are the
+# only ones of operator new. Outputs come from malloc and calloc. The library itself tells
+# LeakSanitizer.
 set(_valgrind "# Memcheck: what libqel-message-protosvc keeps allocated on purpose.\n")
 file(STRINGS proto-lib/exported-functions.txt _deserializers REGEX "_deserialize$")
 foreach(_function IN LISTS _deserializers)
@@ -27,7 +28,7 @@ file(CONFIGURE OUTPUT "${_made}/valgrind.supp" CONTENT "${_valgrind}" @ONLY)
 install(FILES "${_made}/valgrind.supp"
   DESTINATION "${CMAKE_INSTALL_DATADIR}/${PROJECT_NAME}" COMPONENT development)
 
-# From the .pc files back to the prefix, wherever that is.
+# The .pc files name the prefix relative to themselves, so that an installed tree may be moved.
 set(_prefix_from_pc "/prefix")
 cmake_path(RELATIVE_PATH _prefix_from_pc BASE_DIRECTORY "/prefix/${_pkgconfig}")
 foreach(_name ${PROJECT_NAME} ${PROJECT_NAME}-classes)
@@ -35,8 +36,8 @@ foreach(_name ${PROJECT_NAME} ${PROJECT_NAME}-classes)
   install(FILES "${_made}/${_name}.pc" DESTINATION "${_pkgconfig}" COMPONENT development)
 endforeach()
 
-# Written by hand, as an exported target would name the runtime and the log service, which are the
-# library's own matter.
+# Not made by install(EXPORT): such a target would also name the runtime and the log service, with
+# which users of the library do not link.
 configure_package_config_file(packaging/${PROJECT_NAME}-config.cmake.in
   "${_made}/${PROJECT_NAME}-config.cmake"
   INSTALL_DESTINATION "${_cmake_package}"
@@ -47,8 +48,8 @@ install(
   FILES "${_made}/${PROJECT_NAME}-config.cmake" "${_made}/${PROJECT_NAME}-config-version.cmake"
   DESTINATION "${_cmake_package}" COMPONENT development)
 
-# What Debian has not, for machines without the device's log service: an installed tree runs in any
-# folder. On a device both are the system's.
+# Workstations have neither this runtime nor the log service. So both are installed beside the
+# library, which finds them in its own folder. A device has both.
 if(TARGET dlog-standin)
   set_target_properties(qel-message-protosvc PROPERTIES INSTALL_RPATH "$ORIGIN")
   if(TARGET qel-wire)
@@ -56,14 +57,14 @@ if(TARGET dlog-standin)
   endif()
   install(TARGETS dlog-standin LIBRARY COMPONENT workstation)
   cmake_path(GET QEL_PROTOBUF_LIBRARY PARENT_PATH _folder)
-  file(GLOB _runtime "${_folder}/libprotobuf.so.9*") # none where the runtime is laid out otherwise
+  file(GLOB _runtime "${_folder}/libprotobuf.so.9*") # an SDK may keep it elsewhere
   install(FILES ${_runtime} DESTINATION "${CMAKE_INSTALL_LIBDIR}" COMPONENT workstation)
   install(FILES "${QEL_PROTOBUF_PREFIX}/share/doc/protobuf/LICENSE"
     DESTINATION "${CMAKE_INSTALL_DATADIR}/doc/${PROJECT_NAME}-workstation"
     RENAME LICENSE.protobuf COMPONENT workstation OPTIONAL)
   if(_runtime)
     install(CODE "
-      if(CMAKE_INSTALL_DO_STRIP) # as is done with targets
+      if(CMAKE_INSTALL_DO_STRIP) # CMake strips only its own targets
         file(GLOB runtime \"\$ENV{DESTDIR}\${CMAKE_INSTALL_PREFIX}/${CMAKE_INSTALL_LIBDIR}/libprotobuf.so.9.*\")
         execute_process(COMMAND \"${CMAKE_STRIP}\" \${runtime} COMMAND_ERROR_IS_FATAL ANY)
       endif()" COMPONENT workstation)

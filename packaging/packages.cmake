@@ -1,17 +1,16 @@
-# What 'cpack' makes: a Debian package of each component that something is installed with, and an
-# archive of all. ./dev package calls it.
+# What 'cpack' makes: a Debian package of each component, and an archive of all. ./dev package calls
+# it.
 
 set(CPACK_GENERATOR DEB TGZ)
-set(CPACK_PACKAGE_CONTACT "The maintainers <maintainers@example.invalid>") # a project has its own here
+set(CPACK_PACKAGE_CONTACT "The maintainers <maintainers@example.invalid>") # to be replaced
 set(CPACK_PACKAGE_DESCRIPTION_SUMMARY "${PROJECT_DESCRIPTION}")
 set(CPACK_PACKAGE_FILE_NAME "${PROJECT_NAME}-${PROJECT_VERSION}-${CMAKE_LIBRARY_ARCHITECTURE}")
-# Five sixths of the library are debug information, which takes a device's space and names the
-# build's folders. The build folder keeps it: a core dump is read with the library there, which has the
-# same build id.
+# Packages have no debug information: it is five sixths of the library and names the build's
+# folders. To read a core dump, use the build folder's library, which has the same build id.
 set(CPACK_STRIP_FILES ON)
 set(CPACK_PRE_BUILD_SCRIPTS "${PROJECT_SOURCE_DIR}/packaging/folder_permissions.cmake")
 get_cmake_property(CPACK_COMPONENTS_ALL COMPONENTS)
-list(REMOVE_ITEM CPACK_COMPONENTS_ALL Unspecified) # what is done with each component
+list(REMOVE_ITEM CPACK_COMPONENTS_ALL Unspecified) # has no files, only steps of all components
 
 set(CPACK_DEB_COMPONENT_INSTALL ON)
 set(CPACK_DEBIAN_FILE_NAME DEB-DEFAULT)
@@ -20,9 +19,10 @@ if(CMAKE_LIBRARY_ARCHITECTURE STREQUAL "arm-linux-gnueabihf")
   set(CPACK_DEBIAN_PACKAGE_ARCHITECTURE armhf)
 elseif(CMAKE_LIBRARY_ARCHITECTURE STREQUAL "arm-linux-gnueabi")
   set(CPACK_DEBIAN_PACKAGE_ARCHITECTURE armel)
-endif() # else this machine's
+endif() # otherwise cpack takes this machine's
 
-# Of the base libraries the lowest versions that have what is linked with are asked for; tests compare.
+# The dependencies name the lowest versions of the base libraries that have all needed symbols.
+# Tests compare.
 
 set(_library_package libqel-message-protosvc${PROJECT_VERSION_MAJOR})
 configure_file(packaging/shlibs.in packaging/shlibs @ONLY)
@@ -37,7 +37,7 @@ set(CPACK_COMPONENT_RUNTIME_DESCRIPTION "The shared library that message plug-in
 set(CPACK_DEBIAN_DEVELOPMENT_PACKAGE_NAME libqel-message-protosvc-dev)
 set(CPACK_DEBIAN_DEVELOPMENT_PACKAGE_SECTION libdevel)
 set(CPACK_DEBIAN_DEVELOPMENT_PACKAGE_DEPENDS "${_library_package} (= ${PROJECT_VERSION})")
-# The runtime's headers, for users of the classes.
+# Users of the classes need the runtime's headers.
 set(CPACK_DEBIAN_DEVELOPMENT_PACKAGE_SUGGESTS "libprotobuf-dev (>= 2.6.1), libprotobuf-dev (<< 2.7)")
 set(CPACK_COMPONENT_DEVELOPMENT_DESCRIPTION
   "Headers, schema, pkg-config files and CMake package, for authors of plug-ins in C and of modules
@@ -50,7 +50,7 @@ set(CPACK_DEBIAN_TOOLS_PACKAGE_DEPENDS
 ${_library_package} (= ${PROJECT_VERSION})")
 set(CPACK_COMPONENT_TOOLS_DESCRIPTION "A command that shows and makes the protocol's messages.")
 
-# Debian's last package of this runtime was libprotobuf9.
+# libprotobuf9 was Debian's last package of this runtime.
 set(CPACK_DEBIAN_WORKSTATION_PACKAGE_NAME ${PROJECT_NAME}-workstation)
 set(CPACK_DEBIAN_WORKSTATION_PACKAGE_SECTION libs)
 set(CPACK_DEBIAN_WORKSTATION_PACKAGE_DEPENDS "libc6 (>= 2.17), libgcc-s1 (>= 3.5), libstdc++6 (>= 11)")
@@ -61,13 +61,13 @@ ${QEL_PROTOBUF_VERSION} and a stand-in for the device's log service.")
 if(TARGET dlog-standin)
   string(APPEND CPACK_DEBIAN_RUNTIME_PACKAGE_DEPENDS ", ${PROJECT_NAME}-workstation")
 endif()
-if(_runtime) # is installed with it
+if(_runtime) # is installed with this component
   set(CPACK_DEBIAN_WORKSTATION_PACKAGE_PROVIDES "libprotobuf9 (= ${QEL_PROTOBUF_VERSION})")
   set(CPACK_DEBIAN_WORKSTATION_PACKAGE_CONFLICTS libprotobuf9)
   set(CPACK_DEBIAN_WORKSTATION_PACKAGE_REPLACES libprotobuf9)
 endif()
 
-# What they are made of, to be built.
+# Builds what the packages contain.
 add_custom_target(packaged DEPENDS qel-message-protosvc)
 foreach(_target qel-wire docs)
   if(TARGET ${_target})

@@ -1,4 +1,4 @@
-// The log line: one shape for every line of the module.
+// How the module writes its log lines, which all have the same form.
 #ifndef QEL_LOG_LINE_H
 #define QEL_LOG_LINE_H
 
@@ -12,30 +12,29 @@ extern "C" int __dlog_print(int log_id, int priority, const char* tag, const cha
 
 namespace {
 
-// Where a line says that it was logged: the exported function, and the line in the module of the
-// step concerned.
+// The place that a log line names: an exported function, and a line number in the module.
 struct CallSite {
   const char* function;
   int line;
 };
 
-// The caller's own place. As a default argument: the place of the call that leaves it out. In a
-// lambda it names the lambda, so log from the exported function's own body.
+// The place of the call. As a default argument it is the place of the call that leaves the argument
+// out. Do not log in a lambda: the line would not name the exported function.
 constexpr CallSite here(const char* function = __builtin_FUNCTION(), int line = __builtin_LINE()) {
   return {function, line};
 }
 
-// Asked of the kernel for each line: a cached id would be wrong in a forked process.
+// The kernel is asked each time, because a remembered id would be wrong after a fork.
 int thread_id() {
   return static_cast<int>(syscall(SYS_gettid));
 }
 
 constexpr int kMainLogBuffer = 0;
 
-// A level's dlog priority; its colour is bound to it.
+// The dlog priority of each level. The level's colour is below.
 enum LogPriority { kLogDebug = 3, kLogInfo = 4, kLogWarn = 5, kLogError = 6 };
 
-// An id as %lld takes it: int64_t is another type on some machines.
+// An id for %lld: int64_t is long on some machines and long long on others.
 constexpr long long lld(int64_t id) {
   return id;
 }
@@ -47,11 +46,11 @@ constexpr long long lld(int64_t id) {
 #define QEL_COLOUR_kLogWarn "\033[33m"
 #define QEL_COLOUR_kLogError "\033[31m"
 
-// Logs a line of the exported function in which it stands. A macro, so that the whole format is one
-// literal and the compiler checks it against the arguments.
+// Logs a line that names the place where the macro stands. A macro makes the whole format one
+// literal, which the compiler checks against the arguments.
 #define QEL_LOG(PRIORITY, TEXT, ...) QEL_LOG_AT(PRIORITY, here(), TEXT __VA_OPT__(, ) __VA_ARGS__)
 
-// The same for a shared step, which knows its call's place.
+// The same with the place as an argument, for the steps that functions share.
 #define QEL_LOG_AT(PRIORITY, SITE, TEXT, ...)                               \
   __dlog_print(kMainLogBuffer, PRIORITY, "MESSAGE_PLUGIN",                  \
                "%s: %s(%d) > " QEL_COLOUR_##PRIORITY "[%d]" TEXT "\033[0m", \

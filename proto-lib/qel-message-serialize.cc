@@ -1,13 +1,12 @@
-// The exchanges of the message plug-in, one function each way, in the order of the interface's
-// table. Every function is read top-down in the order in which things happen: that order, the log
-// texts and what is not tested are all part of the interface. So are the differences between
-// functions that look alike: none is a slip to be mended.
+// The functions of the public header, in the same order. The order of the steps in a function, the
+// log texts and what is not checked are part of the interface. So are differences between functions
+// that look alike: do not make them the same.
 
 #include "qel-message-serialize.h"
 
 #include <string.h>
 
-#include "call-frame.h"
+#include "encode-and-parse.h"
 #include "log-line.h"
 #include "msgspec_frontend.pb.h"
 #include "record-layout.h"
@@ -20,18 +19,19 @@ namespace {
 
 constexpr int kMaxPageSize = 500;
 
-// Zero and negative numbers count as too large.
+// Whether count is 1 to 500. As an unsigned number, what is below 1 becomes too large.
 constexpr bool is_page_size(int count) {
   return static_cast<unsigned>(count) - 1 < kMaxPageSize;
 }
 
-// MsgType ends at 30, with gaps; negative numbers count as too large.
+// Whether type is 0 to 30. Not all of these are members of MsgType. The log text of those who call
+// this says 0~6: both the check and the text are part of the interface.
 constexpr bool is_in_msg_type_range(int type) {
   return static_cast<unsigned>(type) <= 30;
 }
 
-// What a caller means by a bool: its byte is 0 or something else. Any other way the compiler takes
-// for granted that it is 0 or 1, drops a test of it, and sends what it is.
+// Whether the byte of a caller's bool is not 0. A bool is not simply tested, because the compiler
+// assumes that its byte is 0 or 1 and would send any other number as it is.
 bool is_true(const bool& flag) {
   return *reinterpret_cast<const volatile unsigned char*>(&flag) != 0;
 }
@@ -77,7 +77,7 @@ void channel_auth_reply_deserialize(const unsigned char* data, int size, int64_t
     return;
   }
 
-  // Unlike in the other replies, the outcome is always written.
+  // Unlike other replies, this one writes both outputs even if there is no result.
   *requestId = reply.requestid();
   *resultCode = reply.result().code();
   *resultMsg = reply.result().has_msg() ? copy_text(reply.result().msg()) : nullptr;
@@ -159,15 +159,15 @@ void create_chatroom_reply_deserialize(const unsigned char* data, int size, int6
   }
   copy_result(reply, resultCode, resultMsg);
 
-  // The code is read back through the caller's pointer, which is required by now and not tested.
+  // The code is read through the caller's pointer, which must not be NULL here and is not tested.
   if (reply.result().has_wrongreceiverdetail() &&
       // NOLINTNEXTLINE(clang-analyzer-core.NullDereference)
       (*resultCode == 1000 || *resultCode == 1001 || *resultCode == 3009)) {
-    // Copied first: if memory runs out here, every list is as it was.
+    // Copied before any list is written: if memory runs out here, all lists are as they were.
     detail.CopyFrom(reply.result().wrongreceiverdetail());
 
     *invalidReceiversCount = detail.invalidreceivers_size();
-    if (*invalidReceiversCount != 0 && *resultCode == 1001) {  // else the count stands alone
+    if (*invalidReceiversCount != 0 && *resultCode == 1001) {  // otherwise the count alone
       *invalidReceivers = allocate_zeroed<int64_t>(*invalidReceiversCount);
       QEL_LOG(kLogWarn, "%d invalidReceivers are detected", *invalidReceiversCount);
       for (int i = 0; i < *invalidReceiversCount; ++i) {
@@ -232,7 +232,6 @@ int chat_request_serialize(int64_t requestId, int64_t chatroomId, int64_t msgId,
   param->set_msgid(msgId);
   param->set_msgttl(msgTtl);
 
-  // The text has kept an older bound.
   if (!is_in_msg_type_range(msgType)) {
     QEL_LOG(kLogError, "msgType is out of range(0~6)");
     return -1;
@@ -282,7 +281,7 @@ void chat_reply_deserialize(const unsigned char* data, int size, int64_t* reques
     if (sentTimes != nullptr) {
       *sentTimes = allocate_zeroed<int64_t>(entries);
     }
-    // Required by now, and not tested. NOLINTNEXTLINE(clang-analyzer-core.NullDereference)
+    // Must not be NULL here, not tested. NOLINTNEXTLINE(clang-analyzer-core.NullDereference)
     if (*msgIds == nullptr || *sentTimes == nullptr) {
       QEL_LOG(kLogError, "memory allocation error(msgId, sentTime)");
       *count = 0;  // an array that was allocated stays with the caller
@@ -372,7 +371,7 @@ void allow_chat_reply_deserialize(const unsigned char* data, int size, int64_t* 
   *requestId = reply.requestid();
   *chatroomId = reply.chatroomid();
   if (reply.has_result()) {
-    *resultCode = reply.result().code();  // not tested, unlike in most replies
+    *resultCode = reply.result().code();  // not tested for NULL, unlike in most replies
     copy_result_msg(reply.result(), resultMsg);
   }
 
@@ -460,7 +459,7 @@ void forward_online_message_get_deserialize(const unsigned char* data, int size,
                                             int64_t* chatroomId, int* chatType,
                                             qel_message_inboxentry_t** inboxEntry, bool* skipReply,
                                             int* errorCode, char** errorMsg) {
-  // Most of this push's traces are at error level, although nothing has failed.
+  // Most of this function's traces are at error level, although nothing has failed.
   QEL_LOG(kLogError, "check ");
   QEL_LOG(kLogWarn, "%s: start", __func__);
 
@@ -481,15 +480,15 @@ void forward_online_message_get_deserialize(const unsigned char* data, int size,
     *skipReply = false;
   }
 
-  // Copied first: if memory runs out here, the record is as it was. Not by the class's copy
-  // constructor: what that has allocated until then would never be released.
+  // Copied before the record is written: if memory runs out here, the record is as it was. The copy
+  // constructor is not used, because it loses what it has allocated when memory runs out.
   InboxEntry entry;
   entry.CopyFrom(push.inboxentry());
-  if (*inboxEntry == nullptr) {  // the caller's record
+  if (*inboxEntry == nullptr) {  // the caller gave no record
     *errorCode = 18;
     *errorMsg = strdup("inboxentry memory allocation failed");
   } else {
-    // chatroomId and chatType of the record stay as they are: the push itself names its chatroom.
+    // The record's chatroomId and chatType stay as they are: both are outputs of their own.
     qel_message_inboxentry_t* record = *inboxEntry;
     record->msgId = entry.msgid();
     record->msgType = entry.msgtype();
@@ -596,7 +595,6 @@ int read_message_request_serialize(int64_t requestId, int64_t chatroomId,
   if (inboxEntry != nullptr) {
     InboxEntry* entry = request.mutable_inboxentry();
     entry->set_msgid(inboxEntry->msgId);
-    // The text has kept an older bound.
     if (!is_in_msg_type_range(inboxEntry->msgType)) {
       QEL_LOG(kLogError, "msgType is out of range(0~6)");
       return -1;
@@ -698,8 +696,8 @@ void invite_reply_deserialize(
   }
   copy_result(reply, resultCode, resultMsg);
 
-  // The code is read back through the caller's pointer, which is required by now and not tested.
-  // Of the lists, only the last two are zeroed, and only the last has no count line.
+  // The code is read through the caller's pointer, which must not be NULL here and is not tested.
+  // Only the last two lists are zeroed, and all but the last log their count.
   if (reply.result().has_wrongreceiverdetail() &&
       // NOLINTNEXTLINE(clang-analyzer-core.NullDereference)
       (*resultCode == 1000 || *resultCode == 1001 || *resultCode == 3003 || *resultCode == 3009)) {
@@ -893,7 +891,7 @@ void is_typing_request_serialize(int64_t requestId, int64_t chatroomId, const ch
     notice.set_refresh(*refresh);
   }
 
-  // Not the frame's encode(): no status, no check of the length, no error line.
+  // Not encode(): there is no status, the length is not checked, and no line is at error level.
   *size = notice.ByteSize();
   *serialized_data = allocate_zeroed<unsigned char>(*size);
   if (*serialized_data == nullptr) {

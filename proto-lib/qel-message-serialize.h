@@ -4,90 +4,91 @@
  *
  * For each exchange that the plug-in takes part in, a ..._serialize function turns arguments into
  * the bytes of one protocol message, and a ..._deserialize function turns received bytes into
- * outputs. What follows holds for all of them; the notes at each function say only what it adds or
- * does differently.
+ * outputs. What follows holds for all functions. The notes at a function say only what is different
+ * there.
  *
  * @par Transport
- * The library opens no connection. How buffers travel, any framing around them, and which reply
- * belongs to which request (by requestId) are the caller's business. The transport must carry the
- * kind of each message: bytes do not say it, and many a function succeeds with those of another.
+ * The library opens no connection. The caller sends and receives the buffers, with any framing
+ * around them, and finds the request of a reply by its requestId. The transport must carry the kind
+ * of each message: the bytes do not say it, and many functions succeed with those of another kind.
  *
  * @par Types
- * Identifiers and times are int64_t, times in milliseconds; 32-bit values, counts and lengths are
- * int; received bytes are data and size, their length in bytes. A bool that is handed in is false
- * if its byte is 0, else true. Text is NUL-terminated, UTF-8, and measured in bytes; text that is
- * not UTF-8 passes through unchanged, after a line of the protocol runtime on standard error.
+ * Identifiers and times are int64_t; times are in milliseconds. 32-bit values, counts and lengths
+ * are int. Received bytes are data, and size is their number. A bool that the caller passes is
+ * false if its byte is 0, and true otherwise. Text is UTF-8 and NUL-terminated; its length is in
+ * bytes. Text that is not UTF-8 passes through unchanged, and the protocol runtime writes a line
+ * about it on standard error.
  *
  * @par
- * What result codes mean, the unit of lifetimes (msgTtl), and the point in time that times count
- * from, are the service's matter.
+ * The service defines what result codes mean, the unit of lifetimes (msgTtl), and the moment from
+ * which times count.
  *
  * @par Serializers
  * They return 0, or -1 after one error line in the log. The last two arguments receive the encoded
- * message: its first byte and its length. The buffer has exactly that length, no terminating NUL
- * and no length prefix; release it with free(). A failed check of an argument leaves both outputs
- * as they were. If the buffer cannot be allocated, *size holds the length and *serialized_data is
- * NULL. If the length is below 1, as that of more than 2 GiB is by overflow, *size holds it and
- * *serialized_data is as it was.
+ * message: a pointer to its first byte, and its length. The buffer has exactly that length, without
+ * a terminating NUL or a length prefix; release it with free(). A failed check of an argument
+ * leaves both outputs as they were. If the buffer cannot be allocated, *size holds the length and
+ * *serialized_data is NULL. If the length is below 1, *size holds it and *serialized_data is as it
+ * was; this happens to messages of more than 2 GiB, whose length overflows.
  *
  * @par
- * Values passed by value are always put on the wire, 0 and "" included. A number or a bool that is
- * passed by pointer is optional: NULL leaves the field out. A text is required unless the function
- * says that it may be NULL. userId and deviceId of a message stay unset unless the function takes
- * them.
+ * What is passed by value is always sent, 0 included. A number or a bool that is passed by pointer
+ * is optional: NULL leaves the field out. A text is required unless the function says that it may
+ * be NULL; the empty text "" is sent. A message's userId and deviceId stay unset unless the
+ * function takes them.
  *
  * @par Deserializers
- * They return nothing. An output is written only after the bytes were parsed and consumed whole;
- * otherwise every output keeps what the caller left in it, and the log has the reason. To tell the
- * two apart, set an output before the call to a value that the service never sends. Fields that are
- * absent from the message read as 0 unless the function says otherwise; empty input (size 0) is a
- * valid message without fields, and so is one that was cut between two fields: only the transport
- * can tell that a message is whole. Input of more than 64 MiB (67108864 bytes) or of more than 100
- * nested levels fails.
+ * They return nothing. An output is written only if the bytes could be parsed to their end.
+ * Otherwise every output keeps what the caller left in it, and the log has the reason. To notice a
+ * failure, set an output before the call to a value that the service never sends. A field that is
+ * absent from the message reads as 0 unless the function says otherwise. Empty input (size 0) is a
+ * valid message without fields. A message that was cut between two fields is valid too: only the
+ * transport can tell that a message is whole. Input of more than 64 MiB (67108864 bytes) or of more
+ * than 100 nested levels fails.
  *
  * @par
  * Strings, arrays and records that are written belong to the caller; release each with free(). A
- * string ends at the first NUL of the received text. A string that cannot be allocated is NULL; an
- * array or a record that cannot be is written through all the same, and the call faults, unless the
- * function says otherwise.
+ * string ends at the first NUL of the received text. If there is no memory for a string, the output
+ * is NULL. If there is none for an array or a record, the call faults unless the function says
+ * otherwise.
  *
  * @par Lists
- * A list comes as an array and its count. The count is written even if it is 0; the array is
- * written only if it has elements, so set it to NULL before the call.
+ * A list is an array and its count. The count is written even if it is 0. The array is written only
+ * if it has elements, so set it to NULL before the call.
  *
  * @par Results
- * A reply's outcome comes back as resultCode and resultMsg. Unless the function says otherwise
- * either pointer may be NULL, *resultCode is written only if the reply has a result, and *resultMsg
- * only if that result has a text: set both before the call.
+ * The result of a reply is written to *resultCode and *resultMsg. Unless the function says
+ * otherwise, either pointer may be NULL, *resultCode is written only if the reply has a result, and
+ * *resultMsg only if that result has a text. So set both before the call.
  *
  * @par Pointers
- * None may be NULL unless these notes say so, and none is tested: a NULL pointer faults as soon as
- * the call reads or writes through it.
+ * No pointer may be NULL unless these notes say so. The others are not tested: the call faults when
+ * it reads or writes through NULL.
  *
  * @par Memory
- * Each call of a deserializer leaves one small block (its input stream) allocated for good, except
- * where the function says that it is released: a process that receives grows with each message.
+ * Each call of a deserializer leaves one small block (its input stream) allocated for good, unless
+ * the function says that it is released. So a process grows with each message that it receives.
  *
  * @par Enumerations
- * A value outside the message's enumeration ends the process with an assertion failure (SIGABRT),
- * unless the function says that it checks the range. A number that the service sends and that is
- * outside the enumeration reads as if the field were absent: a message of a type that is newer than
- * this library has the msgType 0, and cannot be told from a TEXT.
+ * An argument that is no member of its enumeration ends the process with an assertion failure
+ * (SIGABRT), unless the function says that it checks the range. A received number that is no member
+ * reads as if the field were absent. So a message whose type is newer than this library has the
+ * msgType 0 and cannot be told from a TEXT.
  * - ChatType: SINGLE 0, GROUP 1, BROADCAST 2, SECURE 3, MONOLOGUE 4
  * - MsgType: TEXT 0, MEDIA 1, CUSTOM 2, RECALL 3, NOTI 4, READ_ACK 5, DELIVERY_ACK 6, UNSEAL 10,
  *   VOIP_CALL_SETUP 30
  * - IsTypingContentType: CONTENT_TEXT 0, CONTENT_IMAGE 1, CONTENT_VIDEO 2, CONTENT_AUDIO 3
  *
  * @par Exceptions
- * C++ exceptions out of the protocol runtime, for example std::bad_alloc while a text is copied,
- * are not caught: called from C, they end the process.
+ * C++ exceptions of the protocol runtime are not caught, for example std::bad_alloc while a text is
+ * copied. If the caller is written in C, they end the process.
  *
  * @par Threads
  * Any thread may call any function at any time.
  *
  * @par Log
  * Each call logs its entry, its exit and its failures through __dlog_print, with the tag
- * MESSAGE_PLUGIN and the calling thread's id. Lines at error level are not always failures. The
+ * MESSAGE_PLUGIN and the calling thread's id. A line at error level is not always a failure. The
  * access token is never logged.
  */
 #ifndef QEL_MESSAGE_SERIALIZE_H
@@ -103,34 +104,34 @@ extern "C" {
 /** @defgroup qel_records Records
  *  @{ */
 
-/** Two users whose combination the service refuses. An id that it left out is 0. */
+/** Two users whose combination the service refuses. An id that the service left out is 0. */
 typedef struct qel_message_didviolationuser_t {
   int64_t userA; /**< one of the two */
   int64_t userB; /**< the other */
 } qel_message_didviolationuser_t;
 
-/** How far a member of a chatroom has acknowledged, as read or as delivered. */
+/** The last message that a member of a chatroom has acknowledged, as read or as delivered. */
 typedef struct qel_message_watermarkentry_t {
   int64_t userId;    /**< the member */
-  int64_t msgId;     /**< the last message that the member acknowledged */
-  int64_t timestamp; /**< when */
+  int64_t msgId;     /**< the message */
+  int64_t timestamp; /**< when the member acknowledged it */
 } qel_message_watermarkentry_t;
 
 /** A member of a chatroom. */
 typedef struct qel_message_chatroommember_t {
   int64_t userId;    /**< the member */
   int64_t available; /**< 1 or 0 */
-  char* name;        /**< as handed out: "" without a name */
+  char* name;        /**< the member's name, "" if there is none */
 } qel_message_chatroommember_t;
 
 /** A message in the inbox. */
 typedef struct qel_message_inboxentry_t {
   int64_t msgId;      /**< the message */
-  int32_t msgType;    /**< a MsgType; as handed out, TEXT may also be a type not known here */
+  int32_t msgType;    /**< a MsgType; a received TEXT may be of a type unknown here */
   int64_t sender;     /**< who sent it */
   int64_t receiver;   /**< whom it is for */
   int64_t sentTime;   /**< when it was sent */
-  char* chatMsg;      /**< as handed out: "" without a text */
+  char* chatMsg;      /**< the text; in a received message "" if there is none */
   int64_t chatroomId; /**< the message's chatroom */
   int32_t chatType;   /**< a ChatType */
   int32_t msgTtl;     /**< the message's lifetime */
@@ -139,7 +140,7 @@ typedef struct qel_message_inboxentry_t {
 /** A chat to end. */
 typedef struct qel_message_endchatentry_t {
   int64_t chatroomId;  /**< the chatroom */
-  bool denyInvitation; /**< refuse further invitations into it */
+  bool denyInvitation; /**< whether to refuse further invitations into it */
 } qel_message_endchatentry_t;
 
 /** @} */
@@ -173,7 +174,7 @@ void forward_stored_message_deserialize(const unsigned char* data, int size, int
 /**
  * ChannelAuthRequest: authenticates the channel after connecting.
  *
- * @param requestId             the request
+ * @param requestId             the request's id
  * @param userId,deviceId       the user, and the user's device
  * @param appId                 the calling application
  * @param accessToken           the user's credential
@@ -186,13 +187,13 @@ int channel_auth_request_serialize(int64_t requestId, int64_t userId, int64_t de
 
 /**
  * ChannelAuthReply. All three outputs are written on success, and none of the pointers may be
- * NULL: without a result *resultCode is 0, and without a text *resultMsg is NULL. So empty bytes
- * and most other messages read as a reply with the code 0: besides the message's kind compare
- * *requestId with the request's, and give no request the id 0.
+ * NULL. Without a result *resultCode is 0, and without a text *resultMsg is NULL. So empty bytes
+ * and most other messages read as a reply with the code 0. Check the message's kind, compare
+ * *requestId with the request's id, and give no request the id 0.
  *
  * @param data,size             the received bytes
- * @param requestId             the request that is answered
- * @param resultCode,resultMsg  the outcome
+ * @param requestId             the id of the request that is answered
+ * @param resultCode,resultMsg  the result
  *
  * Logs no exit line. The input stream is released on success and kept on failure.
  */
@@ -207,7 +208,7 @@ void channel_auth_reply_deserialize(const unsigned char* data, int size, int64_t
 /**
  * ClientEchoReply.
  *
- * @param requestId             that of the ClientEcho which is answered
+ * @param requestId             the id of the ClientEcho that is answered
  * @param serialized_data,size  the encoded message
  * @return 0, or -1 after an error
  */
@@ -217,7 +218,7 @@ int client_echo_reply_serialize(int64_t requestId, unsigned char** serialized_da
  * ClientEcho. The input stream is released on success and kept on failure.
  *
  * @param data,size  the received bytes
- * @param requestId  the probe, for the answer
+ * @param requestId  the probe's id, for the answer
  */
 void client_echo_deserialize(const unsigned char* data, int size, int64_t* requestId);
 
@@ -229,12 +230,12 @@ void client_echo_deserialize(const unsigned char* data, int size, int64_t* reque
 /**
  * CreateChatroomRequest.
  *
- * @param requestId             the request
+ * @param requestId             the request's id
  * @param chatType              a ChatType; any other value ends the process
- * @param receivers             whom to bring into it: receiversCount ids, in order. With NULL the
- *                              call fails, whatever the count.
+ * @param receivers             the users to bring into it: receiversCount ids, in order. With NULL
+ *                              the call fails, whatever receiversCount is.
  * @param receiversCount        0 or less sends no receivers
- * @param chatroomTitle         may be NULL: no title is sent
+ * @param chatroomTitle         may be NULL; no title is sent then
  * @param serialized_data,size  the encoded message
  * @return 0, or -1 after an error
  */
@@ -246,18 +247,18 @@ int create_chatroom_request_serialize(int64_t requestId, int chatType, const int
  * CreateChatroomReply: the new chatroom, and the receivers whom the service refused.
  *
  * @param data,size             the received bytes
- * @param requestId             the request that is answered
+ * @param requestId             the id of the request that is answered
  * @param chatroomId            the new chatroom
  * @param msgTtl                the lifetime of its messages. Not written if the reply has none.
- * @param resultCode,resultMsg  the outcome. resultCode must not be NULL if the result carries
- *                              details of refused receivers: their gate reads the code back through
- *                              this pointer.
+ * @param resultCode,resultMsg  the result. resultCode must not be NULL if the result carries
+ *                              details of refused receivers: whether they are written depends on
+ *                              the code, which is read through this pointer.
  *
  * The details are four lists. They are written, counts included, only if the reply carries details
  * and its code is 1000, 1001 or 3009:
  *
- * @param invalidReceivers,invalidReceiversCount    ids that are no receivers. Under 1000 and 3009
- *                                                  their number alone is written, and no array.
+ * @param invalidReceivers,invalidReceiversCount    ids that are no receivers. With the codes 1000
+ *                                                  and 3009 only their count is written.
  * @param disabledReceivers,disabledReceiversCount  users who are disabled
  * @param didViolationUsers,didViolationUsersCount  pairs of users that are a DID violation
  * @param invitationDenied,invitationDeniedCount    users who deny invitations
@@ -279,13 +280,13 @@ void create_chatroom_reply_deserialize(const unsigned char* data, int size, int6
 /**
  * ChatRequest: sends one message into a chatroom.
  *
- * @param requestId             the request
+ * @param requestId             the request's id
  * @param chatroomId            the chatroom
  * @param msgId                 the caller's id of the message; the reply confirms it by this id
  * @param msgType               a MsgType: 0 to 6, 10 or 30. Below 0 or above 30 the call fails; 7,
  *                              8, 9 and 11 to 29 end the process.
- * @param chatMsg               at most 40000 bytes, or the call fails. May be empty. With NULL the
- *                              call fails; msgType is looked at first.
+ * @param chatMsg               at most 40000 bytes; it may be empty. With more, or with NULL, the
+ *                              call fails. msgType is checked before it.
  * @param msgTtl                the message's lifetime
  * @param reserved              ignored
  * @param serialized_data,size  the encoded message
@@ -296,20 +297,20 @@ int chat_request_serialize(int64_t requestId, int64_t chatroomId, int64_t msgId,
                            unsigned char** serialized_data, int* size);
 
 /**
- * ChatReply: the service's verdict, and the messages that it processed.
+ * ChatReply: the result, and the messages that the service processed.
  *
  * @param data,size             the received bytes
- * @param requestId,chatroomId  the request that is answered, and its chatroom; may be NULL
- * @param resultCode,resultMsg  the outcome
+ * @param requestId,chatroomId  the id of the request that is answered, and its chatroom; both may
+ *                              be NULL
+ * @param resultCode,resultMsg  the result
  * @param count                 the number of processed messages, 0 if there are none
- * @param msgIds,sentTimes      two arrays of *count elements, index by index about the same
- *                              message: its id, and the time at which the service recorded it (0
- *                              where absent). Not written if there are none. Both are required as
- *                              soon as there are any.
+ * @param msgIds,sentTimes      two arrays of *count elements: each message's id, and the time at
+ *                              which the service recorded it (0 where absent). Not written if there
+ *                              are no messages. If there are any, neither pointer may be NULL.
  *
- * If an array cannot be allocated *count is 0, the outputs before it have been written, and no exit
- * line is logged. One of the two arrays may have been allocated all the same: set both to NULL
- * before the call and release both after it, whatever *count says.
+ * If an array cannot be allocated, *count is 0, the outputs before it have been written, and no
+ * exit line is logged. The other array may have been allocated: set both to NULL before the call
+ * and release both after it, whatever *count says.
  */
 void chat_reply_deserialize(const unsigned char* data, int size, int64_t* requestId,
                             int64_t* chatroomId, int* resultCode, char** resultMsg, int* count,
@@ -323,19 +324,19 @@ void chat_reply_deserialize(const unsigned char* data, int size, int64_t* reques
 /**
  * AllowChatRequest: enters a chatroom and asks for its state. No argument is refused.
  *
- * @param requestId                      the request
+ * @param requestId                      the request's id
  * @param chatroomId                     the chatroom
  * @param isAutoAllow                    may be NULL
- * @param maxCount                       how many entries at most: 1 to 500; any other number is
- *                                       sent as 500
- * @param needDeliveryAck                whether to send delivery marks
- * @param lastDeliveryAckTimestamp       those that are newer than this, which is sent only with
- *                                       needDeliveryAck
- * @param needReadAck                    whether to send read marks
- * @param lastReadAckTimestamp           those that are newer than this, which is sent only with
- *                                       needReadAck
- * @param needOrderedChatroomMemberList  whether to send the members
- * @param needChatroomMeta               whether to send title and lifetime
+ * @param maxCount                       the most entries to reply with: 1 to 500; any other number
+ *                                       is sent as 500
+ * @param needDeliveryAck                whether to reply with delivery marks
+ * @param lastDeliveryAckTimestamp       reply with newer ones than this; sent only if
+ *                                       needDeliveryAck is true
+ * @param needReadAck                    whether to reply with read marks
+ * @param lastReadAckTimestamp           reply with newer ones than this; sent only if
+ *                                       needReadAck is true
+ * @param needOrderedChatroomMemberList  whether to reply with the members
+ * @param needChatroomMeta               whether to reply with title and lifetime
  * @param serialized_data,size           the encoded message
  * @return 0, or -1 after an error
  */
@@ -349,9 +350,9 @@ int allow_chat_request_serialize(int64_t requestId, int64_t chatroomId, const bo
  * AllowChatReply: the chatroom's state.
  *
  * @param data,size                            the received bytes
- * @param requestId                            the request that is answered
+ * @param requestId                            the id of the request that is answered
  * @param chatroomId                           the chatroom
- * @param resultCode,resultMsg                 the outcome. resultCode must not be NULL if the reply
+ * @param resultCode,resultMsg                 the result. resultCode must not be NULL if the reply
  *                                             has a result.
  * @param deliveryAckEntries,deliveryAckCount  deliveryAckCount pointers to one record each
  * @param lastDeliveryAckTimestamp             not written if the reply has none
@@ -362,7 +363,7 @@ int allow_chat_request_serialize(int64_t requestId, int64_t chatroomId, const bo
  * @param title,msgTtl                         not written if the reply has none
  *
  * Each of the three arrays, each record that it points to and each member's name is a block of its
- * own: release names, records and array, in this order.
+ * own. Release names, records and array, in this order.
  */
 void allow_chat_reply_deserialize(const unsigned char* data, int size, int64_t* requestId,
                                   int64_t* chatroomId, int* resultCode, char** resultMsg,
@@ -379,11 +380,11 @@ void allow_chat_reply_deserialize(const unsigned char* data, int size, int64_t* 
  *  @{ */
 
 /**
- * GetAllUnreadMessageRequest: asks for the messages that were stored meanwhile; the service pushes
- * them as ForwardUnreadMessage.
+ * GetAllUnreadMessageRequest: asks for the messages that the service has stored. It pushes them as
+ * ForwardUnreadMessage.
  *
- * @param requestId             the request
- * @param maxCount              messages in a page at most, may be NULL: 1 to 500; any other number
+ * @param requestId             the request's id
+ * @param maxCount              the most messages in a page, may be NULL: 1 to 500; any other number
  *                              is sent as 500
  * @param serialized_data,size  the encoded message
  * @return 0, or -1 after an error
@@ -395,8 +396,8 @@ int get_all_unread_message_request_serialize(int64_t requestId, const int* maxCo
  * GetAllUnreadMessageReply.
  *
  * @param data,size             the received bytes
- * @param requestId             the request that is answered
- * @param resultCode,resultMsg  the outcome
+ * @param requestId             the id of the request that is answered
+ * @param resultCode,resultMsg  the result
  */
 void get_all_unread_message_reply_deserialize(const unsigned char* data, int size,
                                               int64_t* requestId, int* resultCode,
@@ -410,7 +411,7 @@ void get_all_unread_message_reply_deserialize(const unsigned char* data, int siz
 /**
  * ForwardOnlineMessageReply.
  *
- * @param requestId             that of the ForwardOnlineMessage which is acknowledged
+ * @param requestId             the id of the ForwardOnlineMessage that is acknowledged
  * @param chatroomId            the chatroom
  * @param markAsRead            may be NULL
  * @param serialized_data,size  the encoded message
@@ -424,20 +425,19 @@ int forward_online_message_reply_serialize(int64_t requestId, int64_t chatroomId
  * ForwardOnlineMessage.
  *
  * @param data,size            the received bytes
- * @param requestId            the push, for the acknowledgement
+ * @param requestId            the push's id, for the acknowledgement
  * @param chatroomId,chatType  the message's chatroom
- * @param inboxEntry           *inboxEntry points to a record of the caller's, which is filled:
- *                             msgId, msgType, sentTime and chatMsg always, sender, receiver and
- *                             msgTtl only if the message has them, chatroomId and chatType never.
- *                             What is not filled keeps what the caller put there; a chatMsg that
- *                             was there is overwritten, not released. Release the new one.
- * @param skipReply            whether to leave out the acknowledgement; false if the message does
- *                             not say
- * @param errorCode,errorMsg   written only if *inboxEntry is NULL: 18, and a text to release.
- *                             requestId, chatroomId, chatType and skipReply have been written all
- *                             the same.
+ * @param inboxEntry           *inboxEntry points to a record of the caller. Its msgId, msgType,
+ *                             sentTime and chatMsg are always written; sender, receiver and msgTtl
+ *                             only if the message has them; chatroomId and chatType never. What is
+ *                             not written keeps its value. A chatMsg that was there is overwritten,
+ *                             not released. Release the new one.
+ * @param skipReply            whether to send no acknowledgement; false if the message does not say
+ * @param errorCode,errorMsg   written only if *inboxEntry is NULL: 18, and a text to release. In
+ *                             this case requestId, chatroomId, chatType and skipReply are written
+ *                             too.
  *
- * Logs values at error level too, in calls that succeed.
+ * Logs some values at error level even if the call succeeds.
  */
 void forward_online_message_get_deserialize(const unsigned char* data, int size, int64_t* requestId,
                                             int64_t* chatroomId, int* chatType,
@@ -452,11 +452,11 @@ void forward_online_message_get_deserialize(const unsigned char* data, int size,
 /**
  * ForwardUnreadMessageReply: acknowledges the page and asks for the next one.
  *
- * @param requestId             that of the ForwardUnreadMessage which is acknowledged
- * @param nextPaginationKey     points to the key that came with the page, or to NULL, or is NULL:
- *                              no key is sent then
- * @param maxCount              messages in a page at most, may be NULL: 1 to 500; any other number
- *                              is sent as 500. Logged in both cases.
+ * @param requestId             the id of the ForwardUnreadMessage that is acknowledged
+ * @param nextPaginationKey     points to the key that came with the page. If it is NULL or points
+ *                              to NULL, no key is sent.
+ * @param maxCount              the most messages in a page, may be NULL: 1 to 500; any other number
+ *                              is sent as 500. The number is logged.
  * @param serialized_data,size  the encoded message
  * @return 0, or -1 after an error
  */
@@ -468,13 +468,13 @@ int forward_unread_message_reply_serialize(int64_t requestId, const char** nextP
  * ForwardUnreadMessage.
  *
  * @param data,size           the received bytes
- * @param requestId           the push, for the acknowledgement
+ * @param requestId           the push's id, for the acknowledgement
  * @param inboxEntries,count  count pointers to one record each; chatroomId, chatType and msgTtl of
  *                            a record are 0 where the message has none
  * @param nextPaginationKey   may be NULL. Not written if the service sent none.
  *
  * Each record's chatMsg, each record and the array is a block of its own. If the array cannot be
- * allocated *inboxEntries is NULL, *requestId and *count have been written, *nextPaginationKey has
+ * allocated, *inboxEntries is NULL, *requestId and *count have been written, *nextPaginationKey has
  * not, and no exit line is logged.
  */
 void forward_unread_message_deserialize(const unsigned char* data, int size, int64_t* requestId,
@@ -489,11 +489,12 @@ void forward_unread_message_deserialize(const unsigned char* data, int size, int
 /**
  * ReadMessageRequest: tells that a message was read.
  *
- * @param requestId             the request
+ * @param requestId             the request's id
  * @param chatroomId            the chatroom
- * @param inboxEntry            the message, may be NULL: none is named then. Its msgId, msgType,
- *                              sender and sentTime are sent, nothing else. A msgType below 0 or
- *                              above 30 makes the call fail; 7, 8, 9 and 11 to 29 end the process.
+ * @param inboxEntry            the message; may be NULL, the request names none then. Of the record
+ *                              only msgId, msgType, sender and sentTime are sent. A msgType below 0
+ *                              or above 30 makes the call fail; 7, 8, 9 and 11 to 29 end the
+ *                              process.
  * @param serialized_data,size  the encoded message
  * @return 0, or -1 after an error
  */
@@ -505,8 +506,8 @@ int read_message_request_serialize(int64_t requestId, int64_t chatroomId,
  * ReadMessageReply.
  *
  * @param data,size             the received bytes
- * @param requestId,chatroomId  the request that is answered, and its chatroom
- * @param resultCode,resultMsg  the outcome
+ * @param requestId,chatroomId  the id of the request that is answered, and its chatroom
+ * @param resultCode,resultMsg  the result
  */
 void read_message_reply_deserialize(const unsigned char* data, int size, int64_t* requestId,
                                     int64_t* chatroomId, int* resultCode, char** resultMsg);
@@ -519,8 +520,8 @@ void read_message_reply_deserialize(const unsigned char* data, int size, int64_t
 /**
  * EndChatRequest: leaves chatrooms.
  *
- * @param requestId             the request
- * @param entries               count records, in order. May be NULL if there are none.
+ * @param requestId             the request's id
+ * @param entries               count records, in order. May be NULL if count is 0 or less.
  * @param count                 0 or less sends no entries
  * @param serialized_data,size  the encoded message
  * @return 0, or -1 after an error
@@ -532,8 +533,8 @@ int end_chat_request_serialize(int64_t requestId, const qel_message_endchatentry
  * EndChatReply.
  *
  * @param data,size             the received bytes
- * @param requestId             the request that is answered
- * @param resultCode,resultMsg  the outcome
+ * @param requestId             the id of the request that is answered
+ * @param resultCode,resultMsg  the result
  */
 void end_chat_reply_deserialize(const unsigned char* data, int size, int64_t* requestId,
                                 int* resultCode, char** resultMsg);
@@ -546,11 +547,11 @@ void end_chat_reply_deserialize(const unsigned char* data, int size, int64_t* re
 /**
  * InviteRequest: invites further users into a chatroom.
  *
- * @param requestId             the request
+ * @param requestId             the request's id
  * @param chatroomId            the chatroom
- * @param invitingMembers       the invited: *invitingMembersCount ids, in order. May be NULL if
- *                              there are none.
- * @param invitingMembersCount  may be NULL: nobody is sent then. So it is with 0 or less.
+ * @param invitingMembers       the users to invite: *invitingMembersCount ids, in order. May be
+ *                              NULL if nobody is sent.
+ * @param invitingMembersCount  may be NULL. With NULL, and with 0 or less, nobody is sent.
  * @param serialized_data,size  the encoded message
  * @return 0, or -1 after an error
  */
@@ -562,11 +563,11 @@ int invite_chat_request_serialize(int64_t requestId, int64_t chatroomId,
  * InviteReply: when the invitations were sent, and the users whom the service refused.
  *
  * @param data,size             the received bytes
- * @param requestId,chatroomId  the request that is answered, and its chatroom
+ * @param requestId,chatroomId  the id of the request that is answered, and its chatroom
  * @param sentTime              may be NULL. Not written if the reply has none.
- * @param resultCode,resultMsg  the outcome. resultCode must not be NULL if the result carries
- *                              details of refused users: their gate reads the code back through
- *                              this pointer.
+ * @param resultCode,resultMsg  the result. resultCode must not be NULL if the result carries
+ *                              details of refused users: whether they are written depends on the
+ *                              code, which is read through this pointer.
  *
  * The details are six lists. They are written, counts included, only if the reply carries details
  * and its code is 1000, 1001, 3003 or 3009:
@@ -594,7 +595,7 @@ void invite_reply_deserialize(
 /**
  * CurrentTimeRequest.
  *
- * @param requestId             the request
+ * @param requestId             the request's id
  * @param serialized_data,size  the encoded message
  * @return 0, or -1 after an error
  */
@@ -604,9 +605,9 @@ int current_time_request_serialize(int64_t requestId, unsigned char** serialized
  * CurrentTimeReply.
  *
  * @param data,size             the received bytes
- * @param requestId             the request that is answered
+ * @param requestId             the id of the request that is answered
  * @param currentTimeMillis     the service's clock in milliseconds, -1 if the reply has none
- * @param resultCode,resultMsg  the outcome
+ * @param resultCode,resultMsg  the result
  */
 void current_time_deserialize(const unsigned char* data, int size, int64_t* requestId,
                               int64_t* currentTimeMillis, int* resultCode, char** resultMsg);
@@ -619,9 +620,9 @@ void current_time_deserialize(const unsigned char* data, int size, int64_t* requ
 /**
  * UnsealMessageRequest: asks for a sealed message to be opened.
  *
- * @param requestId             the request
+ * @param requestId             the request's id
  * @param chatroomId            the chatroom
- * @param sender,msgId          which message, and whose
+ * @param sender,msgId          the message's sender, and its id
  * @param msgDetail             may be NULL
  * @param serialized_data,size  the encoded message
  * @return 0, or -1 after an error
@@ -634,8 +635,8 @@ int unseal_message_request_serialize(int64_t requestId, int64_t chatroomId, int6
  * UnsealMessageReply.
  *
  * @param data,size             the received bytes
- * @param requestId,chatroomId  the request that is answered, and its chatroom
- * @param resultCode,resultMsg  the outcome
+ * @param requestId,chatroomId  the id of the request that is answered, and its chatroom
+ * @param resultCode,resultMsg  the result
  */
 void unseal_message_reply_deserialize(const unsigned char* data, int size, int64_t* requestId,
                                       int64_t* chatroomId, int* resultCode, char** resultMsg);
@@ -648,11 +649,11 @@ void unseal_message_reply_deserialize(const unsigned char* data, int size, int64
 /**
  * SaveCallLogRequest: stores the record of a call in a chatroom.
  *
- * @param requestId             the request
+ * @param requestId             the request's id
  * @param chatroomId            the chatroom
  * @param callId                the call
- * @param callLogType           what the two ends agreed to call its kind
- * @param sender,receiver       who called, and whom
+ * @param callLogType           the kind of call, in a word that client and service agree on
+ * @param sender,receiver       the users who called and who was called
  * @param conversationSeconds   its duration in seconds
  * @param serialized_data,size  the encoded message
  * @return 0, or -1 after an error
@@ -666,8 +667,8 @@ int save_call_log_request_serialize(int64_t requestId, int64_t chatroomId, const
  * SaveCallLogReply.
  *
  * @param data,size             the received bytes
- * @param requestId             the request that is answered
- * @param resultCode,resultMsg  the outcome
+ * @param requestId             the id of the request that is answered
+ * @param resultCode,resultMsg  the result
  */
 void save_call_log_reply_deserialize(const unsigned char* data, int size, int64_t* requestId,
                                      int* resultCode, char** resultMsg);
@@ -680,16 +681,17 @@ void save_call_log_reply_deserialize(const unsigned char* data, int size, int64_
 /**
  * IsTyping: tells that the user is typing. There is no reply.
  *
- * @param requestId             the message
+ * @param requestId             the message's id
  * @param chatroomId            the chatroom
- * @param state                 may be NULL; what the two ends agreed to call the state
+ * @param state                 may be NULL; a word that client and service agree on
  * @param contentType           may be NULL, else points to an IsTypingContentType; any other value
  *                              ends the process
  * @param refresh               may be NULL
  * @param serialized_data,size  the encoded message
  *
- * Returns nothing: set *serialized_data to NULL before the call. If the buffer cannot be allocated,
- * *serialized_data is NULL, *size holds the length, and the log line is at debug level.
+ * Returns nothing. To notice a failure, set *serialized_data to NULL before the call. If the buffer
+ * cannot be allocated, *serialized_data is NULL, *size holds the length, and the log line is at
+ * debug level.
  */
 void is_typing_request_serialize(int64_t requestId, int64_t chatroomId, const char* state,
                                  const int* contentType, const int* refresh,
@@ -699,7 +701,7 @@ void is_typing_request_serialize(int64_t requestId, int64_t chatroomId, const ch
  * TypingUpdated: the service's push that another member is typing.
  *
  * @param data,size                         the received bytes
- * @param requestId                         the push
+ * @param requestId                         the push's id
  * @param chatroomId                        the chatroom
  * @param sender,state,contentType,refresh  not written if the message has none
  */
@@ -715,15 +717,15 @@ void typing_updated_deserialize(const unsigned char* data, int size, int64_t* re
 /**
  * ChangeChatroomMetaRequest: changes one of the two.
  *
- * @param requestId             the request
+ * @param requestId             the request's id
  * @param chatroomId            the chatroom
- * @param title                 may be NULL or empty: no title then
- * @param msgTtl                the lifetime of the chatroom's messages. May be NULL or point to a
- *                              negative number: no lifetime then.
+ * @param title                 may be NULL or empty; no title is sent then
+ * @param msgTtl                the lifetime of the chatroom's messages; may be NULL or point to a
+ *                              negative number, no lifetime is sent then
  * @param serialized_data,size  the encoded message
  * @return 0, or -1 after an error
  *
- * With both the title alone is sent, and a warning is logged. With neither the call fails.
+ * With both, only the title is sent, and a warning is logged. With neither, the call fails.
  */
 int change_chatroom_meta_request_serialize(int64_t requestId, int64_t chatroomId, const char* title,
                                            const int* msgTtl, unsigned char** serialized_data,
@@ -733,8 +735,8 @@ int change_chatroom_meta_request_serialize(int64_t requestId, int64_t chatroomId
  * ChangeChatroomMetaReply.
  *
  * @param data,size             the received bytes
- * @param requestId,chatroomId  the request that is answered, and its chatroom
- * @param resultCode,resultMsg  the outcome
+ * @param requestId,chatroomId  the id of the request that is answered, and its chatroom
+ * @param resultCode,resultMsg  the result
  */
 void change_chatroom_meta_reply_deserialize(const unsigned char* data, int size, int64_t* requestId,
                                             int64_t* chatroomId, int* resultCode, char** resultMsg);

@@ -1,5 +1,5 @@
-// The layout of the records is part of the binary interface, and the same on 32-bit ARM as on a
-// 64-bit workstation: only a pointer's own width differs.
+// Checks the layout of the records when the library is compiled, as it is part of the binary
+// interface. On 32-bit ARM and on 64-bit workstations only the size of pointers differs.
 #ifndef QEL_RECORD_LAYOUT_H
 #define QEL_RECORD_LAYOUT_H
 

@@ -1,6 +1,6 @@
-// The whole library in one translation unit, so that the module's calls of the small functions of
-// generated code can be inlined. Link-time optimisation would do the same, but drops inline
-// functions of the classes that other modules may have been linked with.
+// The whole library in one translation unit, so that the compiler can inline small functions of the
+// generated code into the module. Link-time optimisation would do that too, but it removes inline
+// functions of the classes from the library, which other modules may be linked with.
 
 #include "msgspec_frontend.pb.cc"    // NOLINT(bugprone-suspicious-include)
 #include "qel-message-serialize.cc"  // NOLINT(bugprone-suspicious-include)

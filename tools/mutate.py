@@ -1,11 +1,11 @@
 #!/usr/bin/env python3
-"""Changes the module in many small ways, one at a time, and sees whether the tests notice.
+"""Changes the module in many small ways, one at a time, and checks that the tests notice.
 
 usage: mutate.py BUILD [--list | --all] [PATTERN]
 
-BUILD is a folder of the coverage preset, built. A mutant is compiled aside and linked to a library
-of its own, and the programs of BUILD take that one: neither the tree nor BUILD is touched. PATTERN
-is a regular expression for which the mutants' names are searched: all that have it are taken.
+BUILD is a folder of the coverage preset, built. Each mutant is compiled and linked in another
+folder, and the test programs of BUILD load that library: neither the tree nor BUILD changes. With
+PATTERN, a regular expression, only mutants whose names match it are tried, and all of them.
 """
 
 import argparse
@@ -28,11 +28,11 @@ import mutants
 
 ROOT = pathlib.Path(__file__).resolve().parent.parent
 MODULE = "proto-lib/qel-message-serialize.cc"
-LIBRARY = "proto-lib/libqel-message-protosvc.so"  # a link to the file that is linked
-SOURCES = ["log-line.h", "call-frame.h", "qel-message-serialize.cc"]
+LIBRARY = "proto-lib/libqel-message-protosvc.so"  # a symbolic link
+SOURCES = ["log-line.h", "encode-and-parse.h", "qel-message-serialize.cc"]
 EQUIVALENT = ROOT / "tools" / "equivalent_mutants.txt"
-SAMPLE = 1000  # what two idle cores do in less than twenty minutes
-MOST_MEMORY = 6 << 30  # a loop without end must not take the machine's
+SAMPLE = 1000  # takes two idle cores less than twenty minutes
+MOST_MEMORY = 6 << 30  # so that an endless loop does not take all memory of the machine
 
 
 def limit():
@@ -41,7 +41,7 @@ def limit():
 
 
 def run(command, seconds, **settings):
-    """Whether the command ends well, in that time; with its output."""
+    """Whether the command succeeds within the time, and its output."""
     process = subprocess.Popen(command, stdin=subprocess.DEVNULL, stdout=subprocess.PIPE,
                                stderr=subprocess.STDOUT, start_new_session=True,
                                preexec_fn=limit, **settings)
@@ -76,7 +76,7 @@ class Build:
 
 
 class Worker:
-    """A folder with a copy of the module, where mutants are built and tested one by one."""
+    """A folder with a copy of the module, in which mutants are built and tested one by one."""
 
     def __init__(self, build, folder):
         self.build = build
@@ -97,7 +97,7 @@ class Worker:
         self._precompile(head, prelude)
 
     def _precompile(self, head, prelude):
-        """What the module includes of others', once for all mutants."""
+        """Compiles the headers that do not change, once for all mutants."""
         text = "".join((self.source / name).read_text() for name in SOURCES)
         includes = re.findall(r'^#include (?:<.*>|".*\.pb\.h")$', text, re.M)
         prelude.write_text("\n".join(dict.fromkeys(includes)) + "\n")
@@ -108,7 +108,7 @@ class Worker:
         (self.source / name).write_text((ROOT / "proto-lib" / name).read_text())
 
     def outcome(self, mutant, limits):
-        """'caught', 'survived' or 'not compiled', and by what it was caught."""
+        """'caught', 'survived' or 'not compiled', and the test that caught it."""
         file = self.source / mutant.file
         text = file.read_text()
         file.write_text(text[:mutant.start] + mutant.text + text[mutant.end:])
@@ -129,9 +129,10 @@ class Worker:
         return built and run(self.link, 120, cwd=self.build.folder, shell=True)[0]
 
     def stages(self, function):
-        """The function's own tests first."""
+        """The programs with patterns of tests: the function's own cases come first."""
         if function.endswith("serialize"):
-            yield from ((p, f"{function}.*:{function}/*") for p in self.build.programs if p.endswith("/contract_tests"))
+            yield from ((program, f"{function}.*:{function}/*") for program in self.build.programs
+                        if program.endswith("/contract_tests"))
         yield from ((p, "*") for p in self.build.programs)
 
     def test(self, program, pattern, seconds):
@@ -142,8 +143,8 @@ class Worker:
 
 
 def time_limits(worker):
-    """The module as it is passes; and how long each program may take with a mutant. The shortest
-    comes first from now on."""
+    """How long each program may take with a mutant. Without one all tests must pass. Sorts the
+    programs: the fastest comes first."""
     if not worker.library():
         sys.exit("mutate: the module itself does not compile")
     took = {}
@@ -159,14 +160,14 @@ def time_limits(worker):
 
 
 def read_equivalent():
-    """Names of mutants that nobody can tell from the module; the reasons stand above them."""
+    """The names of the mutants that behave like the module."""
     lines = EQUIVALENT.read_text().splitlines()
     return {line for line in lines if line and not line.startswith("#")}
 
 
 def sample(found, most):
-    """As many of each function and kind, spread over it, as together are no more than most, but
-    one at least."""
+    """A part of the mutants: the same number of each function and kind, spread evenly, at least one
+    of each; no more than most in all, if that is possible."""
     groups = collections.defaultdict(list)
     for mutant in found:
         groups[mutant.function, mutant.kind].append(mutant)
@@ -179,7 +180,7 @@ def sample(found, most):
 
 
 def try_all(chosen, build, folder):
-    """Yields each mutant with its outcome, as they are known."""
+    """Yields each mutant with its outcome as soon as it is known."""
     workers = queue.SimpleQueue()
     first = Worker(build, folder / "1")
     limits = time_limits(first)
@@ -224,7 +225,7 @@ def main():
     else:
         chosen = found if given.all or given.list else sample(
             [mutant for mutant in found if mutant.name not in equivalent], SAMPLE)
-    chosen.sort(key=lambda mutant: zlib.crc32(mutant.name.encode()))  # of every function soon
+    chosen.sort(key=lambda mutant: zlib.crc32(mutant.name.encode()))  # mixes the functions
     if not chosen:
         sys.exit(f"mutate: no mutant's name has '{given.pattern}'; see --list")
     if given.list:

@@ -4,12 +4,13 @@
  *   10:31:07.251 W MESSAGE_PLUGIN P1234 T1234: text
  *
  * with the local time, the priority's letter, the tag, the process and the thread. Colour escapes
- * stay on a terminal, unless NO_COLOR is set and not empty, and are removed elsewhere; line breaks
- * inside the text are shown as "\n", so that a call stays a line. What does not fit in a line of
- * 4096 bytes is cut off, as on the device.
+ * are printed on a terminal, unless NO_COLOR is set and not empty, and removed elsewhere. A line
+ * break inside the text is shown as "\n", so that each call prints one line. What does not fit in a
+ * line of 4096 bytes is cut off, as on the device.
  *
- * DLOG_STANDIN_PRIORITY in the environment, one of the letters below, is the least priority that is
- * printed; S silences all. Where it is empty or begins otherwise all is printed.
+ * The environment variable DLOG_STANDIN_PRIORITY may hold one of the letters below: the lowest
+ * priority that is printed, or S to print nothing. If it is empty or begins with another character,
+ * everything is printed.
  */
 #define _GNU_SOURCE
 #include <stdarg.h>
@@ -73,7 +74,7 @@ static size_t append_text(char* line, size_t at, const char* text, int with_colo
       line[at++] = *text++;
     }
   }
-  if (*text != '\0' && with_colours) { /* what is cut off had the colour's end */
+  if (*text != '\0' && with_colours) { /* the end of the colour was cut off */
     memcpy(line + at, end_of_colour, sizeof end_of_colour - 1);
     at += sizeof end_of_colour - 1;
   }

@@ -31,37 +31,61 @@ void* address(const std::string& function) {
 template <typename T>
 using Passed = std::conditional_t<std::is_same_v<T, bool>, unsigned char, T>;
 
-using Bind = std::function<Invocation(const std::string& function, Call* call)>;
+template <typename T>
+Kind kind_of() {
+  // clang-format off
+  return std::is_same_v<T, int64_t>                             ? Kind::kId
+       : std::is_same_v<T, int>                                 ? Kind::kNumber
+       : std::is_same_v<T, bool>                                ? Kind::kFlag
+       : std::is_same_v<T, const char*>                         ? Kind::kText
+       : std::is_same_v<T, const char**>                        ? Kind::kTextPointer
+       : std::is_same_v<T, const int*>                          ? Kind::kNumberPointer
+       : std::is_same_v<T, const bool*>                         ? Kind::kFlagPointer
+       : std::is_same_v<T, const int64_t*>                      ? Kind::kIds
+       : std::is_same_v<T, const qel_message_endchatentry_t*>   ? Kind::kChats
+       : std::is_same_v<T, const qel_message_inboxentry_t*>     ? Kind::kEntry
+       : std::is_same_v<T, const unsigned char*>                ? Kind::kReceived
+                                                                : Kind::kOutput;
+  // clang-format on
+}
+
+struct Adapter {
+  std::vector<Parameter> parameters;
+  std::function<Invocation(const std::string& function, Call* call)> bind;
+};
 
 template <typename R, typename... A>
-Bind adapter(R (* /*declared*/)(A...), const std::string& parameters) {
-  return [=](const std::string& function, Call* call) -> Invocation {
-    std::istringstream names(parameters);
-    std::string name;
-    // In braces, so that they are made in order.
-    const std::tuple<Passed<A>...> arguments{(names >> name, call->argument<Passed<A>>(name))...};
-    R (*called)(Passed<A>...) = nullptr;
-    void* found = address(function);
-    std::memcpy(&called, &found, sizeof called);
-    return [=]() -> std::optional<int> {
-      if constexpr (std::is_void_v<R>) {
-        std::apply(called, arguments);
-        return std::nullopt;
-      } else {
-        return std::apply(called, arguments);
-      }
-    };
-  };
+Adapter adapter(R (* /*declared*/)(A...), const std::string& names) {
+  std::istringstream words(names);
+  std::string word;
+  std::vector<Parameter> parameters{(words >> word, Parameter{word, kind_of<A>()})...};
+  return {
+      parameters, [parameters](const std::string& function, Call* call) -> Invocation {
+        auto parameter = parameters.begin();
+        // In braces, so that they are made in order.
+        const std::tuple<Passed<A>...> arguments{call->argument<Passed<A>>((parameter++)->name)...};
+        R (*called)(Passed<A>...) = nullptr;
+        void* found = address(function);
+        std::memcpy(&called, &found, sizeof called);
+        return [=]() -> std::optional<int> {
+          if constexpr (std::is_void_v<R>) {
+            std::apply(called, arguments);
+            return std::nullopt;
+          } else {
+            return std::apply(called, arguments);
+          }
+        };
+      }};
 }
 
 // Nothing of the library is linked with this program: of the functions, only the types are used.
 template <typename F>
-Bind adapter(const std::string& parameters) {
-  return adapter(static_cast<F*>(nullptr), parameters);
+Adapter adapter(const std::string& names) {
+  return adapter(static_cast<F*>(nullptr), names);
 }
 
-const std::map<std::string, Bind>& adapters() {
-  static const std::map<std::string, Bind> all = {
+const std::map<std::string, Adapter>& adapters() {
+  static const std::map<std::string, Adapter> all = {
       {"forward_stored_message_reply_serialize",
        adapter<decltype(forward_stored_message_reply_serialize)>(
            "requestId nextPaginationKey maxCount serialized_data size")},
@@ -171,14 +195,30 @@ const std::map<std::string, Bind>& adapters() {
   return all;
 }
 
-}  // namespace
-
-Invocation invocation_of(const std::string& function, Call* call) {
+const Adapter& adapter_of(const std::string& function) {
   const auto found = adapters().find(function);
   if (found == adapters().end()) {
     throw std::runtime_error("no adapter for " + function);
   }
-  return found->second(function, call);
+  return found->second;
+}
+
+}  // namespace
+
+std::vector<std::string> function_names() {
+  std::vector<std::string> names;
+  for (const auto& [name, adapter] : adapters()) {
+    names.push_back(name);
+  }
+  return names;
+}
+
+const std::vector<Parameter>& parameters_of(const std::string& function) {
+  return adapter_of(function).parameters;
+}
+
+Invocation invocation_of(const std::string& function, Call* call) {
+  return adapter_of(function).bind(function, call);
 }
 
 }  // namespace contract

@@ -5,10 +5,36 @@
 #include <functional>
 #include <optional>
 #include <string>
+#include <vector>
 
 #include "call.h"
 
 namespace contract {
+
+enum class Kind {
+  kId,             // int64_t
+  kNumber,         // int
+  kFlag,           // bool
+  kText,           // const char*
+  kTextPointer,    // const char**
+  kNumberPointer,  // const int*
+  kFlagPointer,    // const bool*
+  kIds,            // const int64_t*
+  kChats,          // const qel_message_endchatentry_t*
+  kEntry,          // const qel_message_inboxentry_t*
+  kReceived,       // const unsigned char*
+  kOutput,
+};
+
+struct Parameter {
+  std::string name;
+  Kind kind;
+};
+
+// All functions, by name.
+std::vector<std::string> function_names();
+
+const std::vector<Parameter>& parameters_of(const std::string& function);
 
 // The call itself, which allocates nothing of its own. The status, if the function has one.
 using Invocation = std::function<std::optional<int>()>;

@@ -50,11 +50,6 @@ Json json_of_text(const std::string& text) {
   return is_utf8(text) ? Json(text) : Json({{"hex", hex_of(text)}});
 }
 
-std::optional<size_t> Blocks::size_of(const void* block) const {
-  const auto found = sizes_.find(block);
-  return found == sizes_.end() ? std::nullopt : std::optional<size_t>(found->second);
-}
-
 bool Reader::is_fresh(const void* memory, size_t size) {
   const auto* bytes = static_cast<const unsigned char*>(memory);
   return std::all_of(bytes, bytes + size, [](unsigned char byte) { return byte == kFreshByte; });

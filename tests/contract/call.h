@@ -28,23 +28,13 @@ std::string hex_of(const std::string& bytes);
 std::string text_of(const Json& value);
 Json json_of_text(const std::string& text);
 
-// The blocks of calloc, malloc and strdup that the call has asked for and nobody has freed.
-class Blocks {
- public:
-  void add(void* block, size_t size) { sizes_[block] = size; }
-  void remove(void* block) { sizes_.erase(block); }
-  // Its size, if it is such a block.
-  std::optional<size_t> size_of(const void* block) const;
-  const std::map<const void*, size_t>& all() const { return sizes_; }
-
- private:
-  std::map<const void*, size_t> sizes_;
-};
+// The size of a block of calloc, malloc or strdup that is in use, if it is one.
+using SizeOf = std::function<std::optional<size_t>(const void* block)>;
 
 // Shows what memory holds as the contract writes it. Blocks that are pointed to are looked up.
 class Reader {
  public:
-  explicit Reader(const Blocks& blocks) : blocks_(blocks) {}
+  explicit Reader(SizeOf size_of) : size_of_(std::move(size_of)) {}
 
   // "unwritten" if every byte is as it was handed out; elements of a record that are so, are left
   // out.
@@ -100,7 +90,7 @@ class Reader {
   template <typename T>
   Json read_block(T* block) {
     seen_.push_back(block);
-    const std::optional<size_t> size = blocks_.size_of(block);
+    const std::optional<size_t> size = size_of_(block);
     if (!size) {
       return "a pointer to no block of calloc, malloc or strdup";
     }
@@ -122,7 +112,7 @@ class Reader {
   Json read_record(const qel_message_chatroommember_t& member);
   Json read_record(const qel_message_inboxentry_t& entry);
 
-  const Blocks& blocks_;
+  const SizeOf size_of_;
   std::vector<const void*> seen_;
 };
 
@@ -199,8 +189,8 @@ T* Call::output(const std::string& name) {
     numbers_[name] = &output->value;
   } else if constexpr (std::is_pointer_v<T>) {
     blanks_[name] = [](const void* block, size_t size, bool is_element) {
-      return Reader(Blocks()).read_new_block(static_cast<const std::remove_pointer_t<T>*>(block),
-                                             size, is_element);
+      return Reader(nullptr).read_new_block(static_cast<const std::remove_pointer_t<T>*>(block),
+                                            size, is_element);
     };
   }
   outputs_.emplace_back(name, [this, name, output](Reader* reader, Json* shown) {

@@ -9,6 +9,9 @@ namespace contract {
 // All of them, in the contract's order.
 const nlohmann::json& cases();
 
+// The name of the message that each function makes or takes.
+const nlohmann::json& messages();
+
 }  // namespace contract
 
 #endif

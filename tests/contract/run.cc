@@ -220,9 +220,16 @@ void CaseRun::problem(const std::string& text) {
   problems_.push_back(text);
 }
 
-Json CaseRun::outputs() {
-  Reader reader(blocks_);
-  return call_.outputs(&reader);
+Reader CaseRun::reader() const {
+  return Reader([this](const void* block) {
+    const auto found = blocks_.find(block);
+    return found == blocks_.end() ? std::nullopt : std::optional<size_t>(found->second);
+  });
+}
+
+Json CaseRun::outputs() const {
+  Reader shows = reader();
+  return call_.outputs(&shows);
 }
 
 void CaseRun::store(const std::string& path, const Json& value) {
@@ -375,7 +382,7 @@ void CaseRun::on_block(Allocator allocator, void* block, size_t size) {
   if (allocator == Allocator::kNew) {
     objects_.insert(block);
   } else {
-    blocks_.add(block, size);
+    blocks_[block] = size;
   }
 }
 
@@ -383,7 +390,7 @@ void CaseRun::on_release(Allocator allocator, void* block) {
   if (allocator == Allocator::kNew) {
     objects_.erase(block);
   } else {
-    blocks_.remove(block);
+    blocks_.erase(block);
   }
 }
 
@@ -422,10 +429,10 @@ void CaseRun::check_return(std::optional<int> status) {
 
 // What was asked for is in an output, once, or was freed; but for the stream.
 void CaseRun::check_blocks() {
-  Reader reader(blocks_);
-  call_.outputs(&reader);
-  for (const auto& [block, size] : blocks_.all()) {
-    const auto times = std::count(reader.seen().begin(), reader.seen().end(), block);
+  Reader shows = reader();
+  call_.outputs(&shows);
+  for (const auto& [block, size] : blocks_) {
+    const auto times = std::count(shows.seen().begin(), shows.seen().end(), block);
     if (times != 1) {
       problem("a block of " + std::to_string(size) + " bytes is in " + std::to_string(times) +
               " outputs");
@@ -469,7 +476,7 @@ void CaseRun::execute() {
     check_thrown(thrown);
   }
   check_blocks();
-  for (const auto& [block, size] : std::map<const void*, size_t>(blocks_.all())) {
+  for (const auto& [block, size] : blocks_) {
     std::free(const_cast<void*>(block));
   }
   for (void* object : objects_) {

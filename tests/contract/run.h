@@ -2,6 +2,8 @@
 #ifndef TESTS_CONTRACT_RUN_H
 #define TESTS_CONTRACT_RUN_H
 
+#include <map>
+#include <memory>
 #include <optional>
 #include <set>
 #include <string>
@@ -69,7 +71,8 @@ class CaseRun : public Observer {
   void apply(const Step& step);
   void store(const std::string& path, const Json& value);
   void compare_outputs(const std::string& when);
-  Json outputs();
+  Reader reader() const;
+  Json outputs() const;
   void check_thrown(const std::string& thrown);
   void check_return(std::optional<int> status);
   void check_blocks();
@@ -81,10 +84,10 @@ class CaseRun : public Observer {
   const int refused_new_;
   std::string function_;
   Call call_;
-  Blocks blocks_;
-  std::set<void*> objects_;  // of operator new
-  size_t next_ = 0;          // step
-  Json model_;               // of the outputs
+  std::map<const void*, size_t> blocks_;  // of calloc, malloc and strdup
+  std::set<void*> objects_;               // of operator new
+  size_t next_ = 0;                       // step
+  Json model_;                            // of the outputs
   bool is_called_ = false;
   int news_ = 0;
   std::optional<Json> thrown_at_;  // the outputs when operator new refused

@@ -33,9 +33,9 @@ std::string run_peer(const std::string& schema, const std::string& mode, const s
   }
   write_file(base + "/schema.proto", schema);
   write_file(base + "/in", input);
-  const std::string command = "'" QEL_PEER_PROTOC "' --proto_path='" + base + "' --" + mode + "=" +
-                              message + " schema.proto <'" + base + "/in' >'" + base + "/out' 2>'" +
-                              base + "/messages'";
+  const std::string command = "'" QEL_REFERENCE_PROTOC "' --proto_path='" + base + "' --" + mode +
+                              "=" + message + " schema.proto <'" + base + "/in' >'" + base +
+                              "/out' 2>'" + base + "/messages'";
   const int status = std::system(command.c_str());
   std::string output = read_file(base + "/out");
   const std::string messages = read_file(base + "/messages");
