@@ -17,12 +17,12 @@
 #include <vector>
 
 #include "../examples/framing.h"
-#include "support/wire.h"
+#include "support/fields.h"
 
 namespace {
 
 using support::hex;
-using support::Wire;
+using support::Fields;
 
 // For each message, in seconds: long for a busy machine, short for the tests of silence.
 const char kTimeout[] = "3";
@@ -98,8 +98,8 @@ std::string receive_message(int connection) {
 }
 
 // A Result with a text.
-Wire result(int code) {
-  return Wire().number(1, code).text(2, "text");
+Fields result(int code) {
+  return Fields().number(1, code).text(2, "text");
 }
 
 // ---- The plug-in against a front end that misbehaves
@@ -128,21 +128,21 @@ class PluginSession : public ::testing::Test {
   // Answers the authentication, as it should be.
   void welcome() {
     send_message(connection_, "ChannelAuthReply",
-                 Wire().number(1, 1).message(2, result(0)).bytes());
+                 Fields().number(1, 1).message(2, result(0)).bytes());
     ASSERT_EQ(receive_message(connection_), "CurrentTimeRequest");
   }
   // A reply about chatroom 42 that says that all is well.
   static std::string reply(int64_t request) {
-    return Wire().number(11, request).number(12, 42).message(13, result(0)).bytes();
+    return Fields().number(11, request).number(12, 42).message(13, result(0)).bytes();
   }
   // The session up to the answer to its request for a chatroom.
   void create_chatroom(int code) {
     welcome();
     send_message(connection_, "CurrentTimeReply",
-                 Wire().number(11, 2).message(12, result(0)).bytes());
+                 Fields().number(11, 2).message(12, result(0)).bytes());
     ASSERT_EQ(receive_message(connection_), "CreateChatroomRequest");
     send_message(connection_, "CreateChatroomReply",
-                 Wire().number(11, 3).number(12, 42).message(13, result(code)).bytes());
+                 Fields().number(11, 3).number(12, 42).message(13, result(code)).bytes());
   }
   // ... up to its first chat message.
   void enter_chatroom() {
@@ -155,15 +155,15 @@ class PluginSession : public ::testing::Test {
   void fetch_unread() {
     enter_chatroom();
     for (int64_t message = 1; message <= 2; ++message) {
-      const Wire entry = Wire().number(1, 9000 + message).number(2, 1);
+      const Fields entry = Fields().number(1, 9000 + message).number(2, 1);
       send_message(connection_, "ChatReply",
-                   reply(4 + message) + Wire().message(14, entry).bytes());
+                   reply(4 + message) + Fields().message(14, entry).bytes());
       ASSERT_EQ(receive_message(connection_), message == 1 ? "ChatRequest" : "ReadMessageRequest");
     }
     send_message(connection_, "ReadMessageReply", reply(7));
     ASSERT_EQ(receive_message(connection_), "GetAllUnreadMessageRequest");
     send_message(connection_, "GetAllUnreadMessageReply",
-                 Wire().number(11, 8).message(12, result(0)).bytes());
+                 Fields().number(11, 8).message(12, result(0)).bytes());
   }
   void expect_failure(const std::string& reason) {
     EXPECT_EQ(program_->exit_status(), 1);
@@ -181,19 +181,19 @@ TEST_F(PluginSession, WhenTheReplyCannotBeParsed_Fails) {
 }
 
 TEST_F(PluginSession, WhenTheReplyHasNoResult_Fails) {
-  send_message(connection_, "ChannelAuthReply", Wire().number(1, 1).bytes());
+  send_message(connection_, "ChannelAuthReply", Fields().number(1, 1).bytes());
   expect_failure("the reply does not say how it went");
 }
 
 TEST_F(PluginSession, WhenTheReplyIsForAnotherRequest_Fails) {
   send_message(connection_, "ChannelAuthReply",
-               Wire().number(1, 999).message(2, result(0)).bytes());
+               Fields().number(1, 999).message(2, result(0)).bytes());
   expect_failure("the reply belongs to another request");
 }
 
 TEST_F(PluginSession, WhenTheServiceRefuses_Fails) {
   send_message(connection_, "ChannelAuthReply",
-               Wire().number(1, 1).message(2, result(2001)).bytes());
+               Fields().number(1, 1).message(2, result(2001)).bytes());
   expect_failure("the service refused the request");
 }
 
@@ -326,8 +326,8 @@ class FrontEnd : public ::testing::Test {
   }
   void TearDown() override { close(connection_); }
 
-  static Wire auth() {
-    return Wire().number(1, 1).number(2, 2).number(3, 3).text(5, "app").text(
+  static Fields auth() {
+    return Fields().number(1, 1).number(2, 2).number(3, 3).text(5, "app").text(
         6, "example-access-token");
   }
   void authenticate() {
@@ -388,56 +388,56 @@ TEST_F(FrontEnd, WhenTheTokenIsWrong_Fails) {
 }
 
 TEST_F(FrontEnd, WhenARequestComesBeforeTheAuthentication_Fails) {
-  send_message(connection_, "CurrentTimeRequest", Wire().number(11, 1).bytes());
+  send_message(connection_, "CurrentTimeRequest", Fields().number(11, 1).bytes());
   expect_failure("a message before the authentication: CurrentTimeRequest");
 }
 
 TEST_F(FrontEnd, WhenARequestIdIsUsedAgain_Fails) {
   authenticate();
-  send_message(connection_, "CurrentTimeRequest", Wire().number(11, 1).bytes());
+  send_message(connection_, "CurrentTimeRequest", Fields().number(11, 1).bytes());
   expect_failure("a request id that is not above the one before");
 }
 
 TEST_F(FrontEnd, WhenTheProbeIsAnsweredWithAnotherId_Fails) {
   authenticate();
-  send_message(connection_, "CurrentTimeRequest", Wire().number(11, 2).bytes());
+  send_message(connection_, "CurrentTimeRequest", Fields().number(11, 2).bytes());
   ASSERT_EQ(receive_message(connection_), "ClientEcho");
-  send_message(connection_, "ClientEchoReply", Wire().number(1, 5).bytes());
+  send_message(connection_, "ClientEchoReply", Fields().number(1, 5).bytes());
   expect_failure("an answer to another echo probe");
 }
 
 TEST_F(FrontEnd, WhenAChatMessageLacksItsLifetime_Fails) {
   authenticate();
-  const Wire param = Wire().number(1, 3).number(2, 0).text(3, "x");
+  const Fields param = Fields().number(1, 3).number(2, 0).text(3, "x");
   send_message(connection_, "ChatRequest",
-               Wire().number(11, 2).number(12, 42).message(13, param).bytes());
+               Fields().number(11, 2).number(12, 42).message(13, param).bytes());
   expect_failure("a chat message that lacks a field");
 }
 
 TEST_F(FrontEnd, WhenARequestCarriesTheSendersIds_Fails) {
   authenticate();
-  send_message(connection_, "CurrentTimeRequest", Wire().number(1, 5001).number(11, 2).bytes());
+  send_message(connection_, "CurrentTimeRequest", Fields().number(1, 5001).number(11, 2).bytes());
   expect_failure("ids of the sender in: CurrentTimeRequest");
 }
 
 TEST_F(FrontEnd, WhenARequestIsOfAnotherChatroom_Fails) {
   authenticate();
-  send_message(connection_, "IsTyping", Wire().number(11, 2).number(12, 43).bytes());
+  send_message(connection_, "IsTyping", Fields().number(11, 2).number(12, 43).bytes());
   expect_failure("a typing status of another chatroom");
 }
 
 TEST_F(FrontEnd, WhenBothTitleAndLifetimeChange_Fails) {
   authenticate();
   send_message(connection_, "ChangeChatroomMetaRequest",
-               Wire().number(11, 2).number(12, 42).text(13, "x").number(16, 1).bytes());
+               Fields().number(11, 2).number(12, 42).text(13, "x").number(16, 1).bytes());
   expect_failure("a change that is not of one property");
 }
 
 TEST_F(FrontEnd, WhenAReadReceiptSaysMoreThanItShould_Fails) {
   authenticate();
-  const Wire entry = Wire().number(1, 1).number(2, 0).number(3, 6001).number(5, 1).text(6, "x");
+  const Fields entry = Fields().number(1, 1).number(2, 0).number(3, 6001).number(5, 1).text(6, "x");
   send_message(connection_, "ReadMessageRequest",
-               Wire().number(11, 2).number(12, 42).message(13, entry).bytes());
+               Fields().number(11, 2).number(12, 42).message(13, entry).bytes());
   expect_failure("a read receipt with more than the message's name");
 }
 

@@ -6,6 +6,7 @@
 #include <cstdio>
 #include <sstream>
 #include <string>
+#include <utility>
 
 namespace support {
 
@@ -31,6 +32,9 @@ inline std::string to_hex(const std::string& bytes) {
 // A message's fields, one after the other.
 class Fields {
  public:
+  Fields() = default;
+  explicit Fields(std::string bytes) : bytes_(std::move(bytes)) {}
+
   // int32, int64, bool, enumerations
   Fields& number(int field, int64_t value) {
     varint(static_cast<uint64_t>(field) << 3);
