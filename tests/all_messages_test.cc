@@ -81,10 +81,11 @@ std::vector<Values> all_values() {
 }
 
 // The schema as a service might have it that is newer than the client: in every message further
-// fields of each wire type, between the known ones and after them, with numbers that no message has;
-// and in every enumeration further members.
+// fields of each wire type, between the known ones and after them, with numbers that no message
+// has; and in every enumeration further members.
 const char kLaterFields[] =
-    "optional uint64 laterNumber = 8; optional fixed64 laterLong = 9; optional bytes laterBytes = 24;"
+    "optional uint64 laterNumber = 8; optional fixed64 laterLong = 9; optional bytes laterBytes = "
+    "24;"
     "optional group LaterGroup = 26 { optional int32 number = 1; }"
     "optional fixed32 laterInt = 536870911;";
 const char kLaterValues[] =
@@ -249,7 +250,8 @@ std::vector<Item> make_items() {
       if (!google::protobuf::TextFormat::ParseFromString(known, message.get())) {
         throw std::runtime_error("not the text of a message: " + known);
       }
-      batch += "item { " + type.name() + " { " + Writer(values, values.is_later).text(type) + "} }\n";
+      batch +=
+          "item { " + type.name() + " { " + Writer(values, values.is_later).text(type) + "} }\n";
       items.push_back({type.name() + ", " + values.name, values.is_later, std::move(message), ""});
     }
   }
@@ -363,8 +365,8 @@ TEST(EveryMessage, OfALaterSchema_HasTheValuesThatAreKnown) {
 // In another order than the reference's, as what is unknown comes last in its message.
 TEST(EveryMessage, OfALaterSchema_IsSentBackWhole) {
   const std::string received = batch_of(every_item(), [](const Item& item) { return item.bytes; });
-  const std::string sent_back = batch_of(
-      every_item(), [](const Item& item) { return parsed(item)->SerializeAsString(); });
+  const std::string sent_back =
+      batch_of(every_item(), [](const Item& item) { return parsed(item)->SerializeAsString(); });
   EXPECT_EQ(difference(reference("decode", received), reference("decode", sent_back)), "");
   EXPECT_EQ(received.size(), sent_back.size());
 }
@@ -379,12 +381,12 @@ std::string sent_back(const std::string& received) {
 }
 
 TEST(UnknownFields, AmongKnownOnes_AreSentBackBehindThemInTheirOrder) {
-  const std::string text = "4a 05 6c 61 74 65 72 ";                              // 9
-  const std::string fixed = "d5 01 04 03 02 01 ";                                // 26
-  const std::string group = "c3 01 08 ff ff ff ff ff ff ff ff ff 01 c4 01";      // 24
-  EXPECT_EQ(sent_back<ProcessedMessageEntry>(
-                support::hex(text + "08 05 " + fixed + "10 06 " + group)),
-            "08 05 10 06 " + text + fixed + group);
+  const std::string text = "4a 05 6c 61 74 65 72 ";                          // 9
+  const std::string fixed = "d5 01 04 03 02 01 ";                            // 26
+  const std::string group = "c3 01 08 ff ff ff ff ff ff ff ff ff 01 c4 01";  // 24
+  EXPECT_EQ(
+      sent_back<ProcessedMessageEntry>(support::hex(text + "08 05 " + fixed + "10 06 " + group)),
+      "08 05 10 06 " + text + fixed + group);
 }
 
 TEST(UnknownFields, OfAnEmbeddedMessage_AreSentBackInsideIt) {

@@ -21,8 +21,8 @@
 
 namespace {
 
-using support::hex;
 using support::Fields;
+using support::hex;
 
 // For each message, in seconds: long for a busy machine, short for the tests of silence.
 const char kTimeout[] = "3";

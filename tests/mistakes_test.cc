@@ -88,8 +88,9 @@ struct Message {
 // requestId 7, chatroomId 42, result { code 0, msg "accepted" },
 // processedMessageEntries { msgId 9, sentTime 1700000000000 }
 Fields chat_reply() {
-  return Fields(support::hex("58 07 60 2a 6a 0c 08 00 12 08 61 63 63 65 70 74 65 64 72 09 08 09 10 "
-                             "80 d0 95 ff bc 31"));
+  return Fields(
+      support::hex("58 07 60 2a 6a 0c 08 00 12 08 61 63 63 65 70 74 65 64 72 09 08 09 10 "
+                   "80 d0 95 ff bc 31"));
 }
 
 TEST(Mistakes, WhenTheKindIsGuessed_AChatReplyOf29BytesIsTyping) {
@@ -196,7 +197,8 @@ bool is_login(const char* kind, const Fields& message) {
 TEST(Mistakes, WhenKindAndRequestAreCompared_OnlyTheReplyThatSaysSoIsALogin) {
   const Fields reply = Fields().number(1, 7).message(2, Fields().number(1, 0));
   EXPECT_TRUE(is_login("ChannelAuthReply", reply));
-  EXPECT_FALSE(is_login("ChannelAuthReply", Fields().number(1, 7).message(2, Fields().number(1, 1))));
+  EXPECT_FALSE(
+      is_login("ChannelAuthReply", Fields().number(1, 7).message(2, Fields().number(1, 1))));
   EXPECT_FALSE(is_login("ChannelAuthReply", Fields()));
   EXPECT_FALSE(is_login("ClientEcho", Fields().number(1, 7)));
 }
