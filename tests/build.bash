@@ -17,6 +17,12 @@ case $TRIPLE in
   *) ARCHITECTURE=$(dpkg --print-architecture) ;;
 esac
 
+# functions [FILE]: those that the public header, or another source, has, in its order.
+functions() {
+  sed -nE 's/^(int|void) ([a-z_]+_(de)?serialize)\(.*/\2/p' \
+    "${1:-$SOURCE/proto-lib/qel-message-serialize.h}"
+}
+
 # Each test has a folder for its files.
 setup() { cd "$BATS_TEST_TMPDIR" || exit; }
 

@@ -36,7 +36,7 @@ said_by() {
 
 @test "every function that does something is called" {
   [ "$DLOG_STANDIN" = 1 ] || skip "a device's log service does not show it"
-  diff <(grep -v '^forward_stored_message_' "$SOURCE/proto-lib/exported-functions.txt" | sort) \
+  diff <(functions | grep -v '^forward_stored_message_' | sort) \
     <(sed -nE 's/^.*\]([a-z_]+)(:? start|: enter)$/\1/p' log | sort -u)
 }
 

@@ -11,7 +11,7 @@ exported() { "$NM" -D --defined-only "$@" "$LIBRARY" | sed -E 's/^[0-9a-f]+ //; 
 # C++ symbols in words; C's are plain identifiers.
 exported_in_cxx() { exported -C | cut -c 3- | grep -vx '[A-Za-z0-9_]*' | sort -u; }
 
-messages() { sed -n 's/^message //p' "$table"; }
+messages() { sed -nE 's/^message ([^:]*):.*/\1/p' "$table"; }
 
 # What the compiler of the schema and the C++ compiler make of each message, enumeration and file.
 schema() {
@@ -29,15 +29,16 @@ M::Swap(M*); M::default_instance(); M::default_instance_; M::descriptor()
 typeinfo for M; typeinfo name for M; vtable for M
 TXT
   done
-  awk '$1 == "message" {message = $2}
-       $1 == "enum" {message = ""; print $2 "_IsValid(int)\n" $2 "_descriptor()"}
-       /^ / && message {print message "::k" toupper(substr($2, 1, 1)) substr($2, 2) "FieldNumber"}
-       ' "$table"
+  awk -F '[: ,]+' '
+    $1 == "message" {message = $2}
+    $1 == "enum" {message = ""; print $2 "_IsValid(int)\n" $2 "_descriptor()"}
+    message {for (i = 1; i < NF; i++) if ($i ~ /^[0-9]+$/)
+      print message "::k" toupper(substr($(i + 1), 1, 1)) substr($(i + 1), 2) "FieldNumber"}' "$table"
   printf 'protobuf_%s_msgspec_5ffrontend_2eproto()\n' AddDesc AssignDesc ShutdownFile
 }
 
 @test "the C interface is the list of functions, which every module can bind to" {
-  diff <(sed 's/^/T /' "$SOURCE/proto-lib/exported-functions.txt" | sort) \
+  diff <(functions | sed 's/^/T /' | sort) \
     <(exported | grep -v '^. _Z' | sort)
 }
 

@@ -1,56 +1,22 @@
 #!/usr/bin/env bats
-# What the repository says about itself: the list of the exported functions, which has them in the
-# interface's order, against what has to name them; numbers; the picture. Doxygen looks at links.
+# What the repository says about itself: the header's functions against what has to name them;
+# the picture. Doxygen looks at links.
 # shellcheck disable=SC2016 # backticks of Markdown
 load build
 
-setup() {
-  cd "$SOURCE" || exit
-  list=proto-lib/exported-functions.txt
-}
+setup() { cd "$SOURCE" || exit; }
 
-declared() { sed -nE 's/^(int|void) ([a-z_]+_(de)?serialize)\(.*/\2/p' "$1"; }
-
-# All but those that do nothing.
-working() { grep -v '^forward_stored_message_' "$list"; }
-
-@test "the header has the functions of the list, in its order" {
-  diff "$list" <(declared proto-lib/qel-message-serialize.h)
-}
-
-@test "the module has the functions of the list, in its order" {
-  diff "$list" <(declared proto-lib/qel-message-serialize.cc)
+@test "the module has the functions of the header, in its order" {
+  diff <(functions) <(functions proto-lib/qel-message-serialize.cc)
 }
 
 @test "the table of docs/interface.md has a row for each function" {
-  diff "$list" <(sed -nE 's/^\| `([a-z_]+serialize)` \|.*/\1/p' docs/interface.md)
+  diff <(functions) <(sed -nE 's/^\| `([a-z_]+serialize)` \|.*/\1/p' docs/interface.md)
 }
 
 @test "the diagrams of docs/interface.md show each function" {
-  diff <(working | sort) \
+  diff <(functions | grep -v '^forward_stored_message_' | sort) \
     <(sed -nE 's/^ *P->>L: ([a-z_]+serialize).*/\1/p' docs/interface.md | sort -u)
-}
-
-@test "the tables of README.md show each function" {
-  diff <(sort "$list") <(grep '^|' README.md | grep -oE '`[a-z_]+serialize`' | tr -d '`' | sort)
-}
-
-@test "each deserializer has a fuzz target" {
-  # It has the name of its folder of seeds; three are for all functions or messages, or the tool.
-  diff <((working | grep '_deserialize$' && printf '%s\n' qel_wire round_trip serializers) | sort) \
-    <(find fuzz/seeds -mindepth 1 -maxdepth 1 -printf '%f\n' | sort)
-}
-
-@test "fuzzing calls each serializer" {
-  diff <(working | grep -v '_deserialize$' | sort) \
-    <(grep -oE '\<[a-z_]+_serialize\>' fuzz/serializers.cc | sort -u)
-}
-
-@test "pages say how many functions and messages there are" {
-  diff <(printf '%s\n' "$(wc -l <"$list") functions" \
-    "$(grep -c '^message ' proto-lib/msgspec_frontend.proto) messages" | sort) \
-    <(grep -ohE '\<[0-9]{2,} (functions|messages)\>' README.md docs/*.dot \
-      docs/{architecture,interface,qel-wire}.md | sort -u)
 }
 
 @test "the newest version in CHANGELOG.md is the project's" {
