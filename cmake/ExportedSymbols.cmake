@@ -1,13 +1,20 @@
 # The symbols that the library exports: the C interface and all that the schema's compiler
 # generates. Templates and inline functions of other libraries are compiled in, but not exported.
 
-# qel_write_version_script(OUTPUT FUNCTIONS SCHEMA): FUNCTIONS lists the C interface, a name a line.
+# qel_functions_of(HEADER RESULT): the names of the C interface, in the header's order.
+function(qel_functions_of header result)
+  set_property(DIRECTORY APPEND PROPERTY CMAKE_CONFIGURE_DEPENDS "${header}")
+  file(STRINGS "${header}" functions REGEX "^(int|void) [a-z_]+\\(")
+  list(TRANSFORM functions REPLACE "^[a-z]+ ([a-z_]+).*" "\\1")
+  set(${result} "${functions}" PARENT_SCOPE)
+endfunction()
+
+# qel_write_version_script(OUTPUT FUNCTIONS SCHEMA): FUNCTIONS is a list of names.
 function(qel_write_version_script output functions schema)
-  set_property(DIRECTORY APPEND PROPERTY CMAKE_CONFIGURE_DEPENDS "${functions}" "${schema}")
+  set_property(DIRECTORY APPEND PROPERTY CMAKE_CONFIGURE_DEPENDS "${schema}")
   set(script "{\nglobal:\n") # without a name, so that the symbols have no version
 
-  file(STRINGS "${functions}" names)
-  foreach(name IN LISTS names)
+  foreach(name IN LISTS functions)
     string(APPEND script "  ${name};\n")
   endforeach()
 

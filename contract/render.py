@@ -73,7 +73,7 @@ def main():
         place = list(error.absolute_path)
         case = contract["cases"][place[1]]["case"] if place[:1] == ["cases"] and len(place) > 1 else ""
         sys.exit(f"render.py: {case}: {'/'.join(map(str, place))}: {error.message[:300]}")
-    output.write_text(json.dumps(contract, indent=1) + "\n")
+    output.write_text(json.dumps(contract, indent=1, ensure_ascii=False) + "\n")
 
 
 main()

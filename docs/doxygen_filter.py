@@ -46,7 +46,7 @@ def link(match, page):
     plain = " ".join(text.replace("`", "").split())  # Doxygen needs a link's text so
     path, _, anchor = target.partition("#")
     path = os.path.normpath(os.path.join(os.path.dirname(page), path)) if path else page
-    if path.endswith(".md"):
+    if path.endswith(".md") or not os.path.exists(path):  # then Doxygen complains of its name
         return f"[{plain}](@ref {name_of(path, anchor)})"
     if path in sources():
         return f"[{plain}](@ref {os.path.basename(path)})"
@@ -118,7 +118,7 @@ def page(text, name):
 def main(path):
     with open(path, encoding="utf-8") as file:
         text = file.read()
-    if path.endswith(".md"):
+    if path.endswith(".md") or not os.path.exists(path):  # then Doxygen complains of its name
         sys.stdout.write(page(text, path))
     else:
         sys.stdout.write(header(text, os.path.basename(path)))

@@ -23,7 +23,8 @@ install(FILES proto-lib/msgspec_frontend.proto
 # only ones of operator new. Outputs come from malloc and calloc. The library itself tells
 # LeakSanitizer.
 set(_valgrind "# Memcheck: what libqel-message-protosvc keeps allocated on purpose.\n")
-file(STRINGS proto-lib/exported-functions.txt _deserializers REGEX "_deserialize$")
+set(_deserializers "${QEL_FUNCTIONS}")
+list(FILTER _deserializers INCLUDE REGEX "_deserialize$")
 foreach(_function IN LISTS _deserializers)
   string(APPEND _valgrind "{\n  input stream of ${_function}\n  Memcheck:Leak\n"
     "  fun:_Znw*\n  ...\n  fun:${_function}\n}\n")

@@ -181,7 +181,7 @@ T* Call::output(const std::string& name) {
   if constexpr (std::is_pointer_v<T>) {
     blanks_[name] = [](const void* block, size_t size, bool is_element) {
       return Reader(nullptr).read_new_block(static_cast<const std::remove_pointer_t<T>*>(block),
-                                             size, is_element);
+                                            size, is_element);
     };
   }
   if (given_.contains(name) && given_[name].is_null()) {

@@ -40,11 +40,6 @@ struct Course {
 
 Course course_of(const Json& contract_case);
 
-// Whether the course has more steps than all outputs can be looked at, at each of them.
-constexpr int kLong = 1000;
-constexpr int kRarely = 20'000;  // but at some
-bool is_long(const Course& course);
-
 // How many blocks of calloc, malloc and strdup the course asks for.
 int blocks_of(const Course& course);
 

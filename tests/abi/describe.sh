@@ -1,0 +1,7 @@
+#!/usr/bin/env bash
+# describe.sh LIBRARY: the binary form of its C interface, without what changes from one machine and
+# one edit to the next. The library must have debug information.
+set -euo pipefail
+abidw --suppressions "$(dirname "${BASH_SOURCE[0]}")/c_interface.suppr" --exported-interfaces-only \
+  --no-corpus-path --no-comp-dir-path --no-show-locs --no-parameter-names --no-elf-needed "$1" |
+  sed "s|path='[^']*/|path='|"
