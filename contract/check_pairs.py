@@ -1,4 +1,4 @@
-#!/usr/bin/env python3
+#!/usr/bin/python3
 """check_pairs.py CONTRACT.json PROTOC SCHEMA-FOLDER
 
 Compares the text form of every message of the contract with its bytes, by an implementation of

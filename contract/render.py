@@ -1,4 +1,4 @@
-#!/usr/bin/env python3
+#!/usr/bin/python3
 """render.py OUTPUT FAMILY.yaml...
 
 Writes the contract as one JSON file: the same cases, with repeated values written out and bytes as

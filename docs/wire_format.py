@@ -1,4 +1,4 @@
-#!/usr/bin/env python3
+#!/usr/bin/python3
 """wire_format.py CONTRACT.json QEL-WIRE
 
 Prints docs/wire-format.md: the first case of each function in the contract, and its bytes as qel-wire

@@ -1,4 +1,4 @@
-#!/usr/bin/env python3
+#!/usr/bin/python3
 """make_seeds.py CONTRACT.json SCHEMA-FOLDER SEEDS
 
 Writes the seeds of every fuzz target into SEEDS/TARGET: of a deserializer what its cases of the
