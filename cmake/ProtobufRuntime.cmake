@@ -1,7 +1,7 @@
 # Protocol Buffers, 2.6 series, 2.6.1 at least: the target protobuf26 (headers and shared library) and
-# the compiler of the schema, QEL_PROTOC. ./dev setup builds one in .deps; an existing installation, a
-# device SDK's for example, is used where QEL_PROTOBUF_ROOT names it. When cross-compiling, the
-# target's runtime is the one of ./dev arm, and its compiler the one of this machine.
+# the compiler of the schema, QEL_PROTOC. ./dev setup builds one in .deps (runtime/get); an existing
+# installation, a device SDK's for example, is used where QEL_PROTOBUF_ROOT names it. When
+# cross-compiling, the target's runtime is the one of ./dev arm, and its compiler the one of this machine.
 
 set(QEL_PROTOBUF_ROOT "" CACHE PATH "Installation of Protocol Buffers 2.6.1 (empty: the one of ./dev)")
 set(QEL_PROTOC "" CACHE FILEPATH "Compiler of the schema (empty: the installation's, or the one of ./dev when cross-compiling)")
