@@ -1,0 +1,56 @@
+# shellcheck shell=bash disable=SC2154 # what ./dev sets
+# The stages of './dev check'. Needs the functions of ./dev.
+# shellcheck source=SCRIPTDIR/stages.sh
+. "$root/tools/stages.sh"
+
+# What is committed, and a number of new inputs; the corpus of longer runs is left alone.
+check_fuzz() {
+  cmake_build fuzz
+  rm -rf build/fuzz/check
+  fuzz/run.sh build/fuzz/fuzz build/fuzz/check/corpus -runs=10000
+  # As one replays a finding.
+  build/fuzz/fuzz/invite_reply_deserialize build/fuzz/fuzz/seeds/invite_reply_deserialize/*
+  do_fuzz invite_reply_deserialize 1
+}
+
+check_docs() { QEL_DOCS=ON run_tests release -R '^reference\.'; }
+
+check_format() {
+  step "check formatting" "./dev format mends it" clang_format --dry-run --Werror
+  do_format # which finds nothing left to do
+}
+
+check_lint() { step "lint" '' tools/lint.sh release bench fuzz; }
+
+check_demo() {
+  do_demo
+  do_demo --log
+}
+
+check_packages() {
+  need_packages "${arm_packages[@]}" "${lint_packages[@]}" "${coverage_packages[@]}" \
+    "${fuzz_packages[@]}" "${bench_packages[@]}" "${docs_packages[@]}"
+}
+
+# The tests come first, as a user would run them; long stages come before short ones.
+do_check() {
+  stage_folder=$root/build/check
+  setup
+  stage tests '' do_test
+  stage plain-runtime '' runtime/get --plain
+  stage packages tests check_packages
+  stage demo tests check_demo
+  stage format packages check_format
+  stage runtime-armhf packages runtime/get arm-linux-gnueabihf
+  stage armhf runtime-armhf armhf_with_counts run_tests
+  stage sanitizers tests run_tests sanitizers
+  stage runtime-armel packages runtime/get arm-linux-gnueabi
+  stage armel runtime-armel for_arm armel run_tests
+  stage fuzz packages check_fuzz
+  stage bench 'packages plain-runtime' for_bench run_tests
+  stage docs 'packages demo' check_docs
+  stage lint 'bench fuzz docs' check_lint
+  stage coverage packages do_coverage
+  stage threads tests run_tests threads
+  run_stages
+}
