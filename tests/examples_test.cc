@@ -2,76 +2,60 @@
 // why, and exit with 1.
 
 #include <arpa/inet.h>
-#include <fcntl.h>
 #include <gtest/gtest.h>
 #include <netinet/in.h>
-#include <spawn.h>
 #include <sys/socket.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
 #include <cstdio>
 #include <cstdlib>
+#include <filesystem>
+#include <fstream>
 #include <memory>
 #include <string>
 #include <vector>
 
 #include "../examples/framing.h"
-#include "support/wire.h"
+#include "support/fields.h"
 
 namespace {
 
+using support::Fields;
 using support::hex;
-using support::Wire;
 
 // For each message, in seconds: long for a busy machine, short for the tests of silence.
-const char kTimeout[] = "3";
+const std::string kTimeout = " --timeout 3";
 
 // A program whose standard error is kept and whose standard output is dropped.
 class Program {
  public:
-  explicit Program(std::vector<std::string> command) {
-    if (*QEL_EMULATOR != '\0') {
-      command.insert(command.begin(), QEL_EMULATOR);
-    }
-    int ends[2];
-    EXPECT_EQ(pipe2(ends, O_CLOEXEC), 0);
-    errors_ = ends[0];
-    posix_spawn_file_actions_t actions;
-    posix_spawn_file_actions_init(&actions);
-    posix_spawn_file_actions_addopen(&actions, STDOUT_FILENO, "/dev/null", O_WRONLY, 0);
-    posix_spawn_file_actions_adddup2(&actions, ends[1], STDERR_FILENO);
-    std::vector<char*> arguments;
-    for (std::string& word : command) {
-      arguments.push_back(word.data());
-    }
-    arguments.push_back(nullptr);
-    EXPECT_EQ(posix_spawn(&process_, arguments[0], &actions, nullptr, arguments.data(), environ),
-              0);
-    posix_spawn_file_actions_destroy(&actions);
-    close(ends[1]);
-  }
-  ~Program() { close(errors_); }
+  explicit Program(const std::string& command)
+      : errors_(popen((QEL_EMULATOR " " + command + " 2>&1 >/dev/null").c_str(), "r")) {}
+  ~Program() { end(); }
   Program(const Program&) = delete;
   Program& operator=(const Program&) = delete;
 
-  // Waits for its end.
-  int exit_status() {
-    char chunk[4096];
-    for (ssize_t n = 0; (n = read(errors_, chunk, sizeof chunk)) > 0;) {
-      messages_.append(chunk, static_cast<size_t>(n));
+  // Waits until it ends by itself.
+  void expect_end(int exit_status, const std::string& messages) {
+    std::string said;
+    for (int c = 0; (c = std::fgetc(errors_)) != EOF;) {
+      said += static_cast<char>(c);
     }
-    int status = -1;
-    waitpid(process_, &status, 0);
-    return WIFEXITED(status) ? WEXITSTATUS(status) : -1;
+    const int status = end();
+    EXPECT_TRUE(WIFEXITED(status)) << status;
+    EXPECT_EQ(WEXITSTATUS(status), exit_status);
+    EXPECT_EQ(said, messages);
   }
-  // Standard error, after exit_status().
-  const std::string& messages() const { return messages_; }
 
  private:
-  pid_t process_ = -1;
-  int errors_ = -1;
-  std::string messages_;
+  int end() {
+    std::FILE* errors = errors_;
+    errors_ = nullptr;
+    return errors == nullptr ? 0 : pclose(errors);
+  }
+
+  std::FILE* errors_;
 };
 
 sockaddr_in loopback(int port) {
@@ -82,7 +66,8 @@ sockaddr_in loopback(int port) {
   return address;
 }
 
-void send_message(int connection, const std::string& name, const std::string& bytes) {
+void send_message(int connection, const std::string& name, const Fields& message) {
+  const std::string& bytes = message.bytes();
   EXPECT_EQ(
       frame_send(connection, name.c_str(), reinterpret_cast<const unsigned char*>(bytes.data()),
                  static_cast<int>(bytes.size())),
@@ -98,11 +83,40 @@ std::string receive_message(int connection) {
 }
 
 // A Result with a text.
-Wire result(int code) {
-  return Wire().number(1, code).text(2, "text");
+Fields result(int code) {
+  return Fields().number(1, code).text(2, "text");
 }
 
 // ---- The plug-in against a front end that misbehaves
+
+// A reply about chatroom 42.
+Fields reply(int64_t request, int code) {
+  return Fields().number(11, request).number(12, 42).message(13, result(code));
+}
+// That confirms the message.
+Fields chat_reply(int64_t request, int64_t message) {
+  return reply(request, 0).message(14, Fields().number(1, message).number(2, 1));
+}
+
+// What the front end should send, and what the plug-in then sends.
+struct Step {
+  const char* message;
+  Fields bytes;
+  std::vector<const char*> answers;
+};
+
+const Step kSession[] = {
+    {"ChannelAuthReply", Fields().number(1, 1).message(2, result(0)), {"CurrentTimeRequest"}},
+    {"CurrentTimeReply", Fields().number(11, 2).message(12, result(0)), {"CreateChatroomRequest"}},
+    {"CreateChatroomReply", reply(3, 1001), {"AllowChatRequest"}},
+    {"AllowChatReply", reply(4, 0), {"ChatRequest"}},
+    {"ChatReply", chat_reply(5, 9001), {"ChatRequest"}},
+    {"ChatReply", chat_reply(6, 9002), {"ReadMessageRequest"}},
+    {"ReadMessageReply", reply(7, 0), {"GetAllUnreadMessageRequest"}},
+    {"GetAllUnreadMessageReply", Fields().number(11, 8).message(12, result(0)), {}},
+    {"ForwardUnreadMessage", Fields(), {"ForwardUnreadMessageReply", "UnsealMessageRequest"}},
+    {"UnsealMessageReply", reply(9, 0), {"IsTyping"}},
+};
 
 class PluginSession : public ::testing::Test {
  protected:
@@ -114,8 +128,8 @@ class PluginSession : public ::testing::Test {
     ASSERT_EQ(bind(listener_, reinterpret_cast<sockaddr*>(&address), length), 0);
     ASSERT_EQ(listen(listener_, 1), 0);
     ASSERT_EQ(getsockname(listener_, reinterpret_cast<sockaddr*>(&address), &length), 0);
-    program_.reset(new Program(
-        {QEL_PLUGIN_SESSION, std::to_string(ntohs(address.sin_port)), "--timeout", kTimeout}));
+    program_ = std::make_unique<Program>(QEL_PLUGIN_SESSION " " +
+                                         std::to_string(ntohs(address.sin_port)) + kTimeout);
     connection_ = accept4(listener_, nullptr, nullptr, SOCK_CLOEXEC);
     ASSERT_GE(connection_, 0);
     ASSERT_EQ(receive_message(connection_), "ChannelAuthRequest");
@@ -125,49 +139,11 @@ class PluginSession : public ::testing::Test {
     close(listener_);
   }
 
-  // Answers the authentication, as it should be.
-  void welcome() {
-    send_message(connection_, "ChannelAuthReply",
-                 Wire().number(1, 1).message(2, result(0)).bytes());
-    ASSERT_EQ(receive_message(connection_), "CurrentTimeRequest");
-  }
-  // A reply about chatroom 42 that says that all is well.
-  static std::string reply(int64_t request) {
-    return Wire().number(11, request).number(12, 42).message(13, result(0)).bytes();
-  }
-  // The session up to the answer to its request for a chatroom.
-  void create_chatroom(int code) {
-    welcome();
-    send_message(connection_, "CurrentTimeReply",
-                 Wire().number(11, 2).message(12, result(0)).bytes());
-    ASSERT_EQ(receive_message(connection_), "CreateChatroomRequest");
-    send_message(connection_, "CreateChatroomReply",
-                 Wire().number(11, 3).number(12, 42).message(13, result(code)).bytes());
-  }
-  // ... up to its first chat message.
-  void enter_chatroom() {
-    create_chatroom(1001);
-    ASSERT_EQ(receive_message(connection_), "AllowChatRequest");
-    send_message(connection_, "AllowChatReply", reply(4));
-    ASSERT_EQ(receive_message(connection_), "ChatRequest");
-  }
-  // ... up to where it waits for stored messages.
-  void fetch_unread() {
-    enter_chatroom();
-    for (int64_t message = 1; message <= 2; ++message) {
-      const Wire entry = Wire().number(1, 9000 + message).number(2, 1);
-      send_message(connection_, "ChatReply",
-                   reply(4 + message) + Wire().message(14, entry).bytes());
-      ASSERT_EQ(receive_message(connection_), message == 1 ? "ChatRequest" : "ReadMessageRequest");
-    }
-    send_message(connection_, "ReadMessageReply", reply(7));
-    ASSERT_EQ(receive_message(connection_), "GetAllUnreadMessageRequest");
-    send_message(connection_, "GetAllUnreadMessageReply",
-                 Wire().number(11, 8).message(12, result(0)).bytes());
-  }
   void expect_failure(const std::string& reason) {
-    EXPECT_EQ(program_->exit_status(), 1);
-    EXPECT_EQ(program_->messages(), "plug-in: " + reason + "\n");
+    program_->expect_end(1, "plug-in: " + reason + "\n");
+  }
+  void expect_failure_of_the_connection() {
+    expect_failure("the connection ended or fell silent where a message was due");
   }
 
   int listener_ = -1;
@@ -175,40 +151,60 @@ class PluginSession : public ::testing::Test {
   std::unique_ptr<Program> program_;
 };
 
-TEST_F(PluginSession, WhenTheReplyCannotBeParsed_Fails) {
-  send_message(connection_, "ChannelAuthReply", hex("08"));
-  expect_failure("the reply could not be parsed");
+// What the front end sends after so many steps of the session, and why the plug-in stops then.
+struct FrontEndMistake {
+  const char* name;
+  int steps;
+  const char* message;
+  Fields bytes;
+  const char* reason;
+};
+
+const Fields kBroken(hex("08"));
+
+const FrontEndMistake kFrontEndMistakes[] = {
+    {"BrokenReply", 0, "ChannelAuthReply", kBroken, "the reply could not be parsed"},
+    {"ReplyWithoutResult", 0, "ChannelAuthReply", Fields().number(1, 1),
+     "the reply does not say how it went"},
+    {"ReplyToAnotherRequest", 0, "ChannelAuthReply", Fields().number(1, 999).message(2, result(0)),
+     "the reply belongs to another request"},
+    {"Refusal", 0, "ChannelAuthReply", Fields().number(1, 1).message(2, result(2001)),
+     "the service refused the request"},
+    {"AnotherMessage", 0, "ChatReply", Fields(), "a message came that was not expected"},
+    {"BrokenProbe", 1, "ClientEcho", kBroken, "the echo probe could not be parsed"},
+    {"BrokenPush", 1, "ForwardOnlineMessage", kBroken, "the pushed message could not be parsed"},
+    {"RefusedChatroom", 2, "CreateChatroomReply", reply(3, 2002),
+     "the service refused the request"},
+    {"UnconfirmedChatMessage", 4, "ChatReply", reply(5, 0),
+     "the service did not confirm the message"},
+    {"BrokenPage", 8, "ForwardUnreadMessage", kBroken, "the page could not be parsed"},
+    {"BrokenTypingStatus", 10, "TypingUpdated", kBroken, "the typing status could not be parsed"},
+};
+
+class PluginSessionWithMistake : public PluginSession,
+                                 public ::testing::WithParamInterface<FrontEndMistake> {};
+
+TEST_P(PluginSessionWithMistake, OfTheFrontEnd_SaysItAndFails) {
+  for (int i = 0; i < GetParam().steps; ++i) {
+    send_message(connection_, kSession[i].message, kSession[i].bytes);
+    for (const char* answer : kSession[i].answers) {
+      ASSERT_EQ(receive_message(connection_), answer);
+    }
+  }
+  send_message(connection_, GetParam().message, GetParam().bytes);
+  expect_failure(GetParam().reason);
 }
 
-TEST_F(PluginSession, WhenTheReplyHasNoResult_Fails) {
-  send_message(connection_, "ChannelAuthReply", Wire().number(1, 1).bytes());
-  expect_failure("the reply does not say how it went");
-}
-
-TEST_F(PluginSession, WhenTheReplyIsForAnotherRequest_Fails) {
-  send_message(connection_, "ChannelAuthReply",
-               Wire().number(1, 999).message(2, result(0)).bytes());
-  expect_failure("the reply belongs to another request");
-}
-
-TEST_F(PluginSession, WhenTheServiceRefuses_Fails) {
-  send_message(connection_, "ChannelAuthReply",
-               Wire().number(1, 1).message(2, result(2001)).bytes());
-  expect_failure("the service refused the request");
-}
-
-TEST_F(PluginSession, WhenAnotherMessageComes_Fails) {
-  send_message(connection_, "ChatReply", "");
-  expect_failure("a message came that was not expected");
-}
+INSTANTIATE_TEST_SUITE_P(Each, PluginSessionWithMistake, ::testing::ValuesIn(kFrontEndMistakes),
+                         [](const auto& row) { return row.param.name; });
 
 TEST_F(PluginSession, WhenTheConnectionEnds_Fails) {
   shutdown(connection_, SHUT_RDWR);
-  expect_failure("the connection ended or fell silent where a message was due");
+  expect_failure_of_the_connection();
 }
 
 TEST_F(PluginSession, WhenTheFrontEndFallsSilent_Fails) {
-  expect_failure("the connection ended or fell silent where a message was due");
+  expect_failure_of_the_connection();
 }
 
 TEST_F(PluginSession, WhenAFrameIsCutShort_Fails) {
@@ -218,7 +214,7 @@ TEST_F(PluginSession, WhenAFrameIsCutShort_Fails) {
                  5, 0),
             5);
   shutdown(connection_, SHUT_RDWR);
-  expect_failure("the connection ended or fell silent where a message was due");
+  expect_failure_of_the_connection();
 }
 
 TEST_F(PluginSession, WhenAFrameClaimsTooLongAMessage_Fails) {
@@ -227,80 +223,27 @@ TEST_F(PluginSession, WhenAFrameClaimsTooLongAMessage_Fails) {
                  "X\x7f\xff\xff\xff",
                  6, 0),
             6);
-  expect_failure("the connection ended or fell silent where a message was due");
+  expect_failure_of_the_connection();
 }
-
-TEST_F(PluginSession, WhenAProbeCannotBeParsed_Fails) {
-  welcome();
-  send_message(connection_, "ClientEcho", hex("08"));
-  expect_failure("the echo probe could not be parsed");
-}
-
-TEST_F(PluginSession, WhenAPushedMessageCannotBeParsed_Fails) {
-  welcome();
-  send_message(connection_, "ForwardOnlineMessage", hex("08"));
-  expect_failure("the pushed message could not be parsed");
-}
-
-TEST_F(PluginSession, WhenTheChatroomIsRefused_Fails) {
-  create_chatroom(2002);
-  expect_failure("the service refused the request");
-}
-
-TEST_F(PluginSession, WhenTheChatMessageIsNotConfirmed_Fails) {
-  enter_chatroom();
-  send_message(connection_, "ChatReply", reply(5));
-  expect_failure("the service did not confirm the message");
-}
-
-TEST_F(PluginSession, WhenAPageCannotBeParsed_Fails) {
-  fetch_unread();
-  send_message(connection_, "ForwardUnreadMessage", hex("08"));
-  expect_failure("the page could not be parsed");
-}
-
-TEST_F(PluginSession, WhenAPageIsEmpty_GoesOn) {
-  fetch_unread();
-  send_message(connection_, "ForwardUnreadMessage", "");
-  ASSERT_EQ(receive_message(connection_), "ForwardUnreadMessageReply");
-  EXPECT_EQ(receive_message(connection_), "UnsealMessageRequest");
-}
-
-TEST_F(PluginSession, WhenTheTypingStatusCannotBeParsed_Fails) {
-  fetch_unread();
-  send_message(connection_, "ForwardUnreadMessage", "");
-  ASSERT_EQ(receive_message(connection_), "ForwardUnreadMessageReply");
-  ASSERT_EQ(receive_message(connection_), "UnsealMessageRequest");
-  send_message(connection_, "UnsealMessageReply", reply(9));
-  ASSERT_EQ(receive_message(connection_), "IsTyping");
-  send_message(connection_, "TypingUpdated", hex("08"));
-  expect_failure("the typing status could not be parsed");
-}
-
-const char kPluginUsage[] =
-    "usage: plugin_session PORT [--access-token TEXT] [--timeout SECONDS]\n";
 
 TEST(PluginSessionAlone, WhenNobodyListens_Fails) {
-  Program program({QEL_PLUGIN_SESSION, "1"});
-  EXPECT_EQ(program.exit_status(), 1);
-  EXPECT_EQ(program.messages(), "plug-in: connection to the front end: Connection refused\n");
+  Program(QEL_PLUGIN_SESSION " 1")
+      .expect_end(1, "plug-in: connection to the front end: Connection refused\n");
 }
 
-TEST(PluginSessionAlone, WhenCalledWithoutAPort_PrintsItsUsage) {
-  Program program({QEL_PLUGIN_SESSION});
-  EXPECT_EQ(program.exit_status(), 2);
-  EXPECT_EQ(program.messages(), kPluginUsage);
-}
-
-TEST(PluginSessionAlone, WhenThePortIsNone_PrintsItsUsage) {
-  for (const char* port : {"abc", "", "0", "-5", "70000"}) {
-    Program program({QEL_PLUGIN_SESSION, port});
-    EXPECT_EQ(program.exit_status(), 2);
-    EXPECT_EQ(program.messages(), kPluginUsage);
+TEST(PluginSessionAlone, WhenThePortIsMissingOrNone_PrintsItsUsage) {
+  for (const std::string port : {"", "abc", "''", "0", "-5", "70000"}) {
+    Program(QEL_PLUGIN_SESSION " " + port)
+        .expect_end(2, "usage: plugin_session PORT [--access-token TEXT] [--timeout SECONDS]\n");
   }
 }
 
 // ---- The front end against a plug-in that misbehaves
+
+Fields auth() {
+  return Fields().number(1, 1).number(2, 2).number(3, 3).text(5, "app").text(
+      6, "example-access-token");
+}
 
 class FrontEnd : public ::testing::Test {
  protected:
@@ -308,17 +251,13 @@ class FrontEnd : public ::testing::Test {
     std::string folder = testing::TempDir() + "front-end-XXXXXX";
     ASSERT_NE(mkdtemp(folder.data()), nullptr);
     const std::string port_file = folder + "/port";
-    program_.reset(new Program({QEL_FRONT_END, "--port-file", port_file, "--timeout", kTimeout}));
+    program_ = std::make_unique<Program>(QEL_FRONT_END " --port-file " + port_file + kTimeout);
     for (int tries = 0; tries < 200 && access(port_file.c_str(), R_OK) != 0; ++tries) {
       usleep(50000);
     }
     int port = 0;
-    std::FILE* file = std::fopen(port_file.c_str(), "r");
-    ASSERT_NE(file, nullptr);
-    ASSERT_EQ(std::fscanf(file, "%d", &port), 1);
-    std::fclose(file);
-    unlink(port_file.c_str());
-    rmdir(folder.c_str());
+    std::ifstream(port_file) >> port;
+    std::filesystem::remove_all(folder);
 
     connection_ = socket(AF_INET, SOCK_STREAM | SOCK_CLOEXEC, 0);
     const sockaddr_in address = loopback(port);
@@ -326,125 +265,83 @@ class FrontEnd : public ::testing::Test {
   }
   void TearDown() override { close(connection_); }
 
-  static Wire auth() {
-    return Wire().number(1, 1).number(2, 2).number(3, 3).text(5, "app").text(
-        6, "example-access-token");
-  }
   void authenticate() {
-    send_message(connection_, "ChannelAuthRequest", auth().bytes());
+    send_message(connection_, "ChannelAuthRequest", auth());
     ASSERT_EQ(receive_message(connection_), "ChannelAuthReply");
   }
   void expect_failure(const std::string& reason) {
     shutdown(connection_, SHUT_WR);
-    EXPECT_EQ(program_->exit_status(), 1);
-    EXPECT_EQ(program_->messages(), "front_end: " + reason + "\n");
+    program_->expect_end(1, "front_end: " + reason + "\n");
   }
 
   int connection_ = -1;
   std::unique_ptr<Program> program_;
 };
 
+struct PluginMistake {
+  const char* name;
+  bool is_authenticated;
+  const char* message;
+  Fields bytes;
+  const char* reason;
+};
+
+const PluginMistake kPluginMistakes[] = {
+    {"NoMessage", false, "NoSuchMessage", Fields(), "no such message: NoSuchMessage"},
+    {"BrokenMessage", false, "ChannelAuthRequest", kBroken,
+     "not a valid message: ChannelAuthRequest"},
+    {"UnknownField", false, "ChannelAuthRequest", auth().number(1000, 1),
+     "unknown fields in: ChannelAuthRequest"},
+    {"Imei", false, "ChannelAuthRequest", auth().text(4, "1"),
+     "an authentication with IMEI or proxy options"},
+    {"WrongToken", false, "ChannelAuthRequest", auth().text(6, "wrong"), "wrong access token"},
+    {"RequestBeforeAuthentication", false, "CurrentTimeRequest", Fields().number(11, 1),
+     "a message before the authentication: CurrentTimeRequest"},
+    {"RequestIdAgain", true, "CurrentTimeRequest", Fields().number(11, 1),
+     "a request id that is not above the one before"},
+    {"ChatMessageWithoutLifetime", true, "ChatRequest",
+     Fields().number(11, 2).number(12, 42).message(13,
+                                                   Fields().number(1, 3).number(2, 0).text(3, "x")),
+     "a chat message that lacks a field"},
+    {"SendersIds", true, "CurrentTimeRequest", Fields().number(1, 5001).number(11, 2),
+     "ids of the sender in: CurrentTimeRequest"},
+    {"AnotherChatroom", true, "IsTyping", Fields().number(11, 2).number(12, 43),
+     "a typing status of another chatroom"},
+    {"TitleAndLifetime", true, "ChangeChatroomMetaRequest",
+     Fields().number(11, 2).number(12, 42).text(13, "x").number(16, 1),
+     "a change that is not of one property"},
+    {"TextOfAReadMessage", true, "ReadMessageRequest",
+     Fields().number(11, 2).number(12, 42).message(
+         13, Fields().number(1, 1).number(2, 0).number(3, 6001).number(5, 1).text(6, "x")),
+     "a read receipt with more than the message's name"},
+    {"MessageOfTheService", true, "ChatReply", Fields(),
+     "this front end does not take a ChatReply"},
+};
+
+class FrontEndWithMistake : public FrontEnd, public ::testing::WithParamInterface<PluginMistake> {};
+
+TEST_P(FrontEndWithMistake, OfThePlugin_SaysItAndFails) {
+  if (GetParam().is_authenticated) {
+    authenticate();
+  }
+  send_message(connection_, GetParam().message, GetParam().bytes);
+  expect_failure(GetParam().reason);
+}
+
+INSTANTIATE_TEST_SUITE_P(Each, FrontEndWithMistake, ::testing::ValuesIn(kPluginMistakes),
+                         [](const auto& row) { return row.param.name; });
+
 TEST_F(FrontEnd, WhenThePluginFallsSilent_Fails) {
   authenticate();
-  EXPECT_EQ(program_->exit_status(), 1);
-  EXPECT_EQ(program_->messages(), "front_end: the connection broke or fell silent\n");
-}
-
-TEST(FrontEndAlone, WhenNobodyComes_Fails) {
-  Program program({QEL_FRONT_END, "--timeout", "1"});
-  EXPECT_EQ(program.exit_status(), 1);
-  EXPECT_EQ(program.messages(), "front_end: nobody came\n");
-}
-
-TEST(FrontEndAlone, WhenThePortIsNone_SaysSo) {
-  Program program({QEL_FRONT_END, "--port", "70000"});
-  EXPECT_EQ(program.exit_status(), 2);
-  EXPECT_EQ(program.messages(), "front_end: --port takes a number of 0 to 65535, not '70000'\n");
-}
-
-TEST_F(FrontEnd, WhenTheMessageDoesNotExist_Fails) {
-  send_message(connection_, "NoSuchMessage", "");
-  expect_failure("no such message: NoSuchMessage");
-}
-
-TEST_F(FrontEnd, WhenTheMessageIsMalformed_Fails) {
-  send_message(connection_, "ChannelAuthRequest", hex("08"));
-  expect_failure("not a valid message: ChannelAuthRequest");
-}
-
-TEST_F(FrontEnd, WhenTheMessageHasAnUnknownField_Fails) {
-  send_message(connection_, "ChannelAuthRequest", auth().number(1000, 1).bytes());
-  expect_failure("unknown fields in: ChannelAuthRequest");
-}
-
-TEST_F(FrontEnd, WhenTheAuthenticationCarriesAnImei_Fails) {
-  send_message(connection_, "ChannelAuthRequest", auth().text(4, "1").bytes());
-  expect_failure("an authentication with IMEI or proxy options");
-}
-
-TEST_F(FrontEnd, WhenTheTokenIsWrong_Fails) {
-  send_message(connection_, "ChannelAuthRequest", auth().text(6, "wrong").bytes());
-  expect_failure("wrong access token");
-}
-
-TEST_F(FrontEnd, WhenARequestComesBeforeTheAuthentication_Fails) {
-  send_message(connection_, "CurrentTimeRequest", Wire().number(11, 1).bytes());
-  expect_failure("a message before the authentication: CurrentTimeRequest");
-}
-
-TEST_F(FrontEnd, WhenARequestIdIsUsedAgain_Fails) {
-  authenticate();
-  send_message(connection_, "CurrentTimeRequest", Wire().number(11, 1).bytes());
-  expect_failure("a request id that is not above the one before");
+  program_->expect_end(1, "front_end: the connection broke or fell silent\n");
 }
 
 TEST_F(FrontEnd, WhenTheProbeIsAnsweredWithAnotherId_Fails) {
   authenticate();
-  send_message(connection_, "CurrentTimeRequest", Wire().number(11, 2).bytes());
+  send_message(connection_, "CurrentTimeRequest", Fields().number(11, 2));
   ASSERT_EQ(receive_message(connection_), "ClientEcho");
-  send_message(connection_, "ClientEchoReply", Wire().number(1, 5).bytes());
+  send_message(connection_, "ClientEchoReply", Fields().number(1, 5));
   expect_failure("an answer to another echo probe");
-}
-
-TEST_F(FrontEnd, WhenAChatMessageLacksItsLifetime_Fails) {
-  authenticate();
-  const Wire param = Wire().number(1, 3).number(2, 0).text(3, "x");
-  send_message(connection_, "ChatRequest",
-               Wire().number(11, 2).number(12, 42).message(13, param).bytes());
-  expect_failure("a chat message that lacks a field");
-}
-
-TEST_F(FrontEnd, WhenARequestCarriesTheSendersIds_Fails) {
-  authenticate();
-  send_message(connection_, "CurrentTimeRequest", Wire().number(1, 5001).number(11, 2).bytes());
-  expect_failure("ids of the sender in: CurrentTimeRequest");
-}
-
-TEST_F(FrontEnd, WhenARequestIsOfAnotherChatroom_Fails) {
-  authenticate();
-  send_message(connection_, "IsTyping", Wire().number(11, 2).number(12, 43).bytes());
-  expect_failure("a typing status of another chatroom");
-}
-
-TEST_F(FrontEnd, WhenBothTitleAndLifetimeChange_Fails) {
-  authenticate();
-  send_message(connection_, "ChangeChatroomMetaRequest",
-               Wire().number(11, 2).number(12, 42).text(13, "x").number(16, 1).bytes());
-  expect_failure("a change that is not of one property");
-}
-
-TEST_F(FrontEnd, WhenAReadReceiptSaysMoreThanItShould_Fails) {
-  authenticate();
-  const Wire entry = Wire().number(1, 1).number(2, 0).number(3, 6001).number(5, 1).text(6, "x");
-  send_message(connection_, "ReadMessageRequest",
-               Wire().number(11, 2).number(12, 42).message(13, entry).bytes());
-  expect_failure("a read receipt with more than the message's name");
-}
-
-TEST_F(FrontEnd, WhenAMessageIsNotOneOfAPlugins_Fails) {
-  authenticate();
-  send_message(connection_, "ChatReply", "");
-  expect_failure("this front end does not take a ChatReply");
 }
 
 TEST_F(FrontEnd, WhenTheSessionEndsTooEarly_Fails) {
@@ -459,6 +356,15 @@ TEST_F(FrontEnd, WhenTheConnectionBreaksWithinAFrame_Fails) {
                  5, 0),
             5);
   expect_failure("the connection broke or fell silent");
+}
+
+TEST(FrontEndAlone, WhenNobodyComes_Fails) {
+  Program(QEL_FRONT_END " --timeout 1").expect_end(1, "front_end: nobody came\n");
+}
+
+TEST(FrontEndAlone, WhenThePortIsNone_SaysSo) {
+  Program(QEL_FRONT_END " --port 70000")
+      .expect_end(2, "front_end: --port takes a number of 0 to 65535, not '70000'\n");
 }
 
 }  // namespace

@@ -60,19 +60,21 @@ TXT
 }
 
 field_numbers() {
-  awk '$1 == "enum" {exit}
-       $1 == "message" {message = $2}
-       /^ / {print message "::k" toupper(substr($2, 1, 1)) substr($2, 2) "FieldNumber"}' "$table"
+  awk -F '[: ,]+' '
+    $1 == "enum" {exit}
+    $1 == "message" {message = $2}
+    {for (i = 1; i < NF; i++) if ($i ~ /^[0-9]+$/)
+       print message "::k" toupper(substr($(i + 1), 1, 1)) substr($(i + 1), 2) "FieldNumber"}' "$table"
 }
 
-messages() { sed -n 's/^message //p' "$table"; }
+messages() { sed -nE 's/^message ([^:]*):.*/\1/p' "$table"; }
 
 schema() {
   local message step
   {
     for message in $(messages); do of_each_message | sed "s/\<M\>/$message/g"; done
     field_numbers
-    sed -n 's/^enum \(.*\)/\1_IsValid(int)\n\1_descriptor()/p' "$table"
+    sed -n 's/^enum \([^:]*\):.*/\1_IsValid(int)\n\1_descriptor()/p' "$table"
     for step in AddDesc AssignDesc ShutdownFile; do
       echo "protobuf_${step}_msgspec_5ffrontend_2eproto()"
     done

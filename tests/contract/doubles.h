@@ -27,11 +27,15 @@ struct LogLine {
 class Observer {
  public:
   virtual ~Observer() = default;
-  virtual void on_line(const LogLine& line) = 0;
+  virtual void on_line(const LogLine& /*line*/) {}
   // Whether the block is to be had. The text is what strdup copies.
-  virtual bool on_request(Allocator allocator, size_t count, size_t size, const char* text) = 0;
-  virtual void on_block(Allocator allocator, void* block, size_t size) = 0;
-  virtual void on_release(Allocator allocator, void* block) = 0;  // of free, or of delete: kNew
+  virtual bool on_request(Allocator /*allocator*/, size_t /*count*/, size_t /*size*/,
+                          const char* /*text*/) {
+    return true;
+  }
+  virtual void on_block(Allocator /*allocator*/, void* /*block*/, size_t /*size*/) {}
+  // Of free, or of delete: kNew.
+  virtual void on_release(Allocator /*allocator*/, void* /*block*/) {}
 };
 
 // While it lives, the observer sees what the calling thread does. One at a time in a thread.
