@@ -2,7 +2,6 @@
 
 #include <fcntl.h>
 #include <gtest/gtest.h>
-#include <regex.h>
 #include <sys/socket.h>
 #include <sys/syscall.h>
 #include <termios.h>
@@ -14,6 +13,8 @@
 #include <cstdio>
 #include <cstdlib>
 #include <ctime>
+#include <numeric>
+#include <regex>
 #include <string>
 #include <thread>
 #include <vector>
@@ -41,23 +42,25 @@ std::vector<std::string> pieces(int into, int from, const Write& write) {
   return read_pieces;
 }
 
+// A socket keeps apart what was written apart.
 template <typename Write>
-std::string captured(int into, int from, const Write& write) {
-  std::string text;
-  for (const std::string& piece : pieces(into, from, write)) {
-    text += piece;
-  }
-  return text;
-}
-
-template <typename Write>
-std::string on_pipe(const Write& write) {
+std::vector<std::string> pieces_on_socket(const Write& write) {
   int ends[2];
-  EXPECT_EQ(pipe(ends), 0);
-  std::string text = captured(ends[1], ends[0], write);
+  EXPECT_EQ(socketpair(AF_UNIX, SOCK_SEQPACKET, 0, ends), 0);
+  auto all = pieces(ends[1], ends[0], write);
   close(ends[0]);
   close(ends[1]);
-  return text;
+  return all;
+}
+
+std::string joined(const std::vector<std::string>& all) {
+  return std::accumulate(all.begin(), all.end(), std::string());
+}
+
+// What a call prints where there is no terminal.
+template <typename... Arguments>
+std::string printed(int priority, const char* tag, const char* format, Arguments... arguments) {
+  return joined(pieces_on_socket([&] { __dlog_print(0, priority, tag, format, arguments...); }));
 }
 
 // A pseudo-terminal that passes line ends on as they are written.
@@ -84,21 +87,13 @@ class Terminal {
 
   template <typename Write>
   std::string captured(const Write& write) const {
-    return ::captured(slave_, master_, write);
+    return joined(pieces(slave_, master_, write));
   }
 
  private:
   int master_;
   int slave_ = -1;
 };
-
-bool matches(const std::string& text, const std::string& pattern) {
-  regex_t compiled;
-  EXPECT_EQ(regcomp(&compiled, pattern.c_str(), REG_EXTENDED | REG_NOSUB), 0);
-  const bool found = regexec(&compiled, text.c_str(), 0, nullptr, 0) == 0;
-  regfree(&compiled);
-  return found;
-}
 
 // The line's text, behind time, priority, tag, process and thread.
 std::string text_of(const std::string& line) {
@@ -114,13 +109,22 @@ class DlogStandin : public ::testing::Test {
   }
 };
 
+class DlogStandinOnATerminal : public DlogStandin {
+ protected:
+  void SetUp() override {
+    if (!terminal_.exists()) {
+      GTEST_SKIP() << "no pseudo-terminals on this machine";
+    }
+  }
+  const Terminal terminal_;
+};
+
 TEST_F(DlogStandin, WhenCalled_PrintsTimePriorityTagProcessAndThread) {
-  const std::string line =
-      on_pipe([] { __dlog_print(0, 5, "TAG", "%s is %d and %lld", "x", -1, 5000000000LL); });
+  const std::string line = printed(5, "TAG", "%s is %d and %lld", "x", -1, 5000000000LL);
   const std::string process = std::to_string(getpid());
-  const std::string pattern = "^[0-2][0-9]:[0-5][0-9]:[0-6][0-9]\\.[0-9]{3} W TAG P" + process +
-                              " T" + process + ": x is -1 and 5000000000\n$";
-  EXPECT_TRUE(matches(line, pattern)) << line;
+  const std::regex pattern(R"([0-2]\d:[0-5]\d:[0-6]\d\.\d{3} W TAG P)" + process + " T" + process +
+                           ": x is -1 and 5000000000\n");
+  EXPECT_TRUE(std::regex_match(line, pattern)) << line;
 }
 
 int64_t milliseconds_now() {
@@ -133,7 +137,7 @@ TEST_F(DlogStandin, WhenCalled_PrintsTheLocalTimeInMilliseconds) {
   setenv("TZ", "HERE-05:45", 1);
   tzset();
   const int64_t before = milliseconds_now();
-  const std::string line = on_pipe([] { __dlog_print(0, 5, "TAG", "text"); });
+  const std::string line = printed(5, "TAG", "text");
   const int64_t after = milliseconds_now();
 
   int hours = 0;
@@ -148,112 +152,95 @@ TEST_F(DlogStandin, WhenCalled_PrintsTheLocalTimeInMilliseconds) {
 }
 
 TEST_F(DlogStandin, WhenCalled_WritesTheLineAtOnce) {
-  int ends[2];
-  ASSERT_EQ(socketpair(AF_UNIX, SOCK_SEQPACKET, 0, ends), 0);
-  const auto writes = pieces(ends[1], ends[0], [] { __dlog_print(0, 5, "TAG", "text"); });
-  EXPECT_EQ(writes.size(), 1u);
-  close(ends[0]);
-  close(ends[1]);
+  EXPECT_EQ(pieces_on_socket([] { __dlog_print(0, 5, "TAG", "text"); }).size(), 1u);
 }
 
 TEST_F(DlogStandin, WhenCalledByAnotherThread_PrintsThatThreadsId) {
   long id = 0;
-  const std::string line = on_pipe([&] {
+  const std::string line = joined(pieces_on_socket([&] {
     std::thread([&] {
       id = syscall(SYS_gettid);
       __dlog_print(0, 3, "TAG", "text");
     }).join();
-  });
+  }));
   EXPECT_NE(line.find(" T" + std::to_string(id) + ": text\n"), std::string::npos) << line;
 }
 
 TEST_F(DlogStandin, OfEachPriority_PrintsTheLetter) {
   const std::string letters = "??VDIWEFS?";
   for (int priority = 0; priority < static_cast<int>(letters.size()); ++priority) {
-    const std::string line = on_pipe([&] { __dlog_print(0, priority, "TAG", "text"); });
+    const std::string line = printed(priority, "TAG", "text");
     EXPECT_EQ(line.substr(13, 2), letters.substr(static_cast<size_t>(priority), 1) + " ");
   }
 }
 
 TEST_F(DlogStandin, WhenPriorityIsNegative_PrintsAQuestionMark) {
-  const std::string line = on_pipe([] { __dlog_print(0, -1, "TAG", "text"); });
+  const std::string line = printed(-1, "TAG", "text");
   EXPECT_EQ(line.substr(13, 2), "? ");
 }
 
-TEST_F(DlogStandin, OnATerminal_KeepsColours) {
-  const Terminal terminal;
-  if (!terminal.exists()) {
-    GTEST_SKIP() << "no pseudo-terminals on this machine";
-  }
+TEST_F(DlogStandinOnATerminal, KeepsColours) {
   const std::string line =
-      terminal.captured([] { __dlog_print(0, 6, "T", "a \033[31m[%d]b\033[0m", 7); });
+      terminal_.captured([] { __dlog_print(0, 6, "T", "a \033[31m[%d]b\033[0m", 7); });
   EXPECT_EQ(text_of(line), "a \033[31m[7]b\033[0m\n");
 }
 
-TEST_F(DlogStandin, OnATerminalWithNoColorSet_RemovesColours) {
-  const Terminal terminal;
-  if (!terminal.exists()) {
-    GTEST_SKIP() << "no pseudo-terminals on this machine";
-  }
+TEST_F(DlogStandinOnATerminal, WhenNoColorIsSet_RemovesColours) {
   const auto write = [] { __dlog_print(0, 6, "T", "a \033[31m[%d]b\033[0m", 7); };
   setenv("NO_COLOR", "1", 1);
-  EXPECT_EQ(text_of(terminal.captured(write)), "a [7]b\n");
+  EXPECT_EQ(text_of(terminal_.captured(write)), "a [7]b\n");
   setenv("NO_COLOR", "", 1);
-  EXPECT_EQ(text_of(terminal.captured(write)), "a \033[31m[7]b\033[0m\n");
+  EXPECT_EQ(text_of(terminal_.captured(write)), "a \033[31m[7]b\033[0m\n");
 }
 
 TEST_F(DlogStandin, ElsewhereThanOnATerminal_RemovesColours) {
-  const std::string line = on_pipe([] { __dlog_print(0, 6, "T", "a \033[31m[%d]b\033[0m", 7); });
+  const std::string line = printed(6, "T", "a \033[31m[%d]b\033[0m", 7);
   EXPECT_EQ(text_of(line), "a [7]b\n");
 }
 
 TEST_F(DlogStandin, WhenTextHasALineBreak_StaysOneLine) {
-  const std::string line = on_pipe([] { __dlog_print(0, 3, "T", "count=3\n\033[0m"); });
+  const std::string line = printed(3, "T", "count=3\n\033[0m");
   EXPECT_EQ(text_of(line), "count=3\\n\n");
 }
 
 TEST_F(DlogStandin, WhenTextIsTooLong_PrintsOneLineOf4096Bytes) {
   const std::string text(10000, 'x');
-  const std::string line = on_pipe([&] { __dlog_print(0, 3, "T", "%s", text.c_str()); });
+  const std::string line = printed(3, "T", "%s", text.c_str());
   EXPECT_LE(line.size(), 4096u);
   EXPECT_GT(line.size(), 4000u);
   EXPECT_EQ(std::count(line.begin(), line.end(), '\n'), 1);
   EXPECT_EQ(line.back(), '\n');
 }
 
-TEST_F(DlogStandin, WhenAColouredTextIsTooLong_EndsTheColour) {
-  const Terminal terminal;
-  if (!terminal.exists()) {
-    GTEST_SKIP() << "no pseudo-terminals on this machine";
-  }
+TEST_F(DlogStandinOnATerminal, WhenAColouredTextIsTooLong_EndsTheColour) {
   // Shorter than the log service's memory, longer than its line.
   const std::string text(4080, 'x');
   const std::string line =
-      terminal.captured([&] { __dlog_print(0, 6, "T", "\033[31m%s\033[0m", text.c_str()); });
+      terminal_.captured([&] { __dlog_print(0, 6, "T", "\033[31m%s\033[0m", text.c_str()); });
   EXPECT_EQ(line.substr(line.size() - 6), "x\033[0m\n");
 }
 
 TEST_F(DlogStandin, WhenTagIsTooLong_PrintsOneLine) {
   const std::string tag(10000, 'x');
-  const std::string line = on_pipe([&] { __dlog_print(0, 3, tag.c_str(), "text"); });
+  const std::string line = printed(3, tag.c_str(), "text");
   EXPECT_LE(line.size(), 4096u);
   EXPECT_EQ(line.back(), '\n');
 }
 
 TEST_F(DlogStandin, WhenAPriorityIsAskedFor_PrintsItAndThoseAbove) {
   setenv("DLOG_STANDIN_PRIORITY", "W", 1);
-  EXPECT_EQ(on_pipe([] { __dlog_print(0, 4, "T", "text"); }), "");
-  EXPECT_NE(on_pipe([] { __dlog_print(0, 5, "T", "text"); }), "");
+  EXPECT_EQ(printed(4, "T", "text"), "");
+  EXPECT_NE(printed(5, "T", "text"), "");
 }
 
 TEST_F(DlogStandin, WhenSilenceIsAskedFor_PrintsNothing) {
   setenv("DLOG_STANDIN_PRIORITY", "S", 1);
-  EXPECT_EQ(on_pipe([] { __dlog_print(0, 6, "T", "text"); }), "");
+  EXPECT_EQ(printed(6, "T", "text"), "");
 }
 
 TEST_F(DlogStandin, WhenThePrioritySettingIsEmpty_PrintsAll) {
   setenv("DLOG_STANDIN_PRIORITY", "", 1);
-  EXPECT_NE(on_pipe([] { __dlog_print(0, 2, "T", "text"); }), "");
+  EXPECT_NE(printed(2, "T", "text"), "");
 }
 
 }  // namespace
