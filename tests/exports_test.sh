@@ -63,8 +63,9 @@ field_numbers() {
   awk -F '[: ,]+' '
     $1 == "enum" {exit}
     $1 == "message" {message = $2}
-    {for (i = 1; i < NF; i++) if ($i ~ /^[0-9]+$/)
-       print message "::k" toupper(substr($(i + 1), 1, 1)) substr($(i + 1), 2) "FieldNumber"}' "$table"
+    {for (i = 1; i < NF; i++) if ($i ~ /^[0-9]+$/) {
+       name = $(i + 1)
+       print message "::k" toupper(substr(name, 1, 1)) substr(name, 2) "FieldNumber"}}' "$table"
 }
 
 messages() { sed -nE 's/^message ([^:]*):.*/\1/p' "$table"; }
