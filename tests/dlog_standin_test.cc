@@ -47,7 +47,7 @@ template <typename Write>
 std::vector<std::string> pieces_on_socket(const Write& write) {
   int ends[2];
   EXPECT_EQ(socketpair(AF_UNIX, SOCK_SEQPACKET, 0, ends), 0);
-  const auto all = pieces(ends[1], ends[0], write);
+  auto all = pieces(ends[1], ends[0], write);
   close(ends[0]);
   close(ends[1]);
   return all;

@@ -6,6 +6,7 @@
 #include <cstdlib>
 #include <set>
 #include <string>
+#include <utility>
 #include <vector>
 
 #include "doubles.h"
@@ -17,14 +18,7 @@ namespace {
 
 using contract::Allocator;
 using support::Fields;
-
-// A call of a function that reads the message first.
-template <typename Function, typename... Others>
-auto read(Function function, const Fields& message, Others... others) {
-  const std::string& bytes = message.bytes();
-  return function(reinterpret_cast<const unsigned char*>(bytes.data()),
-                  static_cast<int>(bytes.size()), others...);
-}
+using support::read;
 
 Fields broken() {
   return Fields(support::hex("58"));  // a field without its value

@@ -6,6 +6,7 @@
 #include <functional>
 #include <ostream>
 #include <string>
+#include <utility>
 
 #include "doubles.h"
 #include "qel-message-serialize.h"
@@ -52,7 +53,8 @@ void read_invitation(const unsigned char* data, int size) {
 // Reads the bytes, and looks at each line of the log.
 class Reading : public contract::Observer {
  public:
-  Reading(Read read, const std::string& bytes, std::function<void()> look) : look_(look) {
+  Reading(Read read, const std::string& bytes, std::function<void()> look)
+      : look_(std::move(look)) {
     const contract::Observation observation(this);
     read(reinterpret_cast<const unsigned char*>(bytes.data()), static_cast<int>(bytes.size()));
   }

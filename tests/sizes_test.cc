@@ -2,8 +2,8 @@
 
 #include <gtest/gtest.h>
 
-#include <algorithm>
 #include <cstdlib>
+#include <cstring>
 #include <functional>
 #include <iterator>
 #include <numeric>
@@ -16,6 +16,7 @@
 namespace {
 
 using support::Fields;
+using support::read;
 
 // More than 16 bits count.
 constexpr int kMany = 70000;
@@ -50,14 +51,14 @@ std::string long_text(size_t size) {
 
 // ---- Requests
 
-template <typename Call>
-void expect_encoding(const Fields& expected, Call call) {
+// What the function makes of the arguments.
+template <typename Function, typename... Arguments>
+void expect_encoding(const Fields& expected, Function serialize, Arguments... arguments) {
   unsigned char* data = nullptr;
   int size = 0;
-  call(&data, &size);
+  serialize(arguments..., &data, &size);
   ASSERT_EQ(static_cast<size_t>(size), expected.bytes().size());
-  EXPECT_TRUE(std::equal(data, data + size,
-                         reinterpret_cast<const unsigned char*>(expected.bytes().data())));
+  EXPECT_EQ(std::memcmp(data, expected.bytes().data(), expected.bytes().size()), 0);
   std::free(data);
 }
 
@@ -67,9 +68,8 @@ TEST(Sizes, CreateChatroomRequest_TakesManyReceivers) {
   for (const int64_t receiver : receivers) {
     expected.number(13, receiver);
   }
-  expect_encoding(expected, [&](unsigned char** data, int* size) {
-    create_chatroom_request_serialize(7, 1, receivers.data(), kMany, nullptr, data, size);
-  });
+  expect_encoding(expected, create_chatroom_request_serialize, 7, 1, receivers.data(), kMany,
+                  nullptr);
 }
 
 TEST(Sizes, InviteChatRequest_TakesManyMembers) {
@@ -79,9 +79,7 @@ TEST(Sizes, InviteChatRequest_TakesManyMembers) {
     expected.number(13, member);
   }
   const int count = kMany;
-  expect_encoding(expected, [&](unsigned char** data, int* size) {
-    invite_chat_request_serialize(7, 42, members.data(), &count, data, size);
-  });
+  expect_encoding(expected, invite_chat_request_serialize, 7, 42, members.data(), &count);
 }
 
 TEST(Sizes, EndChatRequest_TakesManyEntries) {
@@ -91,9 +89,7 @@ TEST(Sizes, EndChatRequest_TakesManyEntries) {
     entries.push_back({id(i), i % 3 == 0});
     expected.message(12, Fields().number(1, id(i)).number(11, i % 3 == 0));
   }
-  expect_encoding(expected, [&](unsigned char** data, int* size) {
-    end_chat_request_serialize(7, entries.data(), kMany, data, size);
-  });
+  expect_encoding(expected, end_chat_request_serialize, 7, entries.data(), kMany);
 }
 
 // ---- Lists of replies and pushes
@@ -112,12 +108,6 @@ void expect_ids(int count, int64_t* elements) {
   expect_elements<int64_t>(count, elements, [](int64_t got, int i) { return got == id(i); });
 }
 
-template <typename Read>
-void read_bytes(const Fields& message, Read read) {
-  read(reinterpret_cast<const unsigned char*>(message.bytes().data()),
-       static_cast<int>(message.bytes().size()));
-}
-
 TEST(Sizes, ChatReply_HandsOutManyEntries) {
   Fields reply;
   for (int i = 0; i < kMany; ++i) {
@@ -126,10 +116,8 @@ TEST(Sizes, ChatReply_HandsOutManyEntries) {
   int count = 0;
   int64_t* messages = nullptr;
   int64_t* times = nullptr;
-  read_bytes(reply, [&](const unsigned char* data, int size) {
-    chat_reply_deserialize(data, size, nullptr, nullptr, nullptr, nullptr, &count, &messages,
-                           &times);
-  });
+  read(chat_reply_deserialize, reply, nullptr, nullptr, nullptr, nullptr, &count, &messages,
+       &times);
   expect_ids(count, messages);
   expect_elements<int64_t>(count, times, [](int64_t got, int i) { return got == other_id(i); });
 }
@@ -170,23 +158,19 @@ Fields reply_with_many_refused() {
 
 TEST(Sizes, CreateChatroomReply_HandsOutManyRefusedReceivers) {
   Refused out;
-  read_bytes(reply_with_many_refused(), [&](const unsigned char* data, int size) {
-    create_chatroom_reply_deserialize(data, size, &number, &number, &code, &code, nullptr,
-                                      &out.ids[0], &out.counts[0], &out.ids[2], &out.counts[2],
-                                      &out.pairs, &out.pair_count, &out.ids[4], &out.counts[4]);
-  });
+  read(create_chatroom_reply_deserialize, reply_with_many_refused(), &number, &number, &code, &code,
+       nullptr, &out.ids[0], &out.counts[0], &out.ids[2], &out.counts[2], &out.pairs,
+       &out.pair_count, &out.ids[4], &out.counts[4]);
   EXPECT_EQ(out.counts[0] + out.counts[2] + out.counts[4], 3 * kMany);
   out.expect_many();
 }
 
 TEST(Sizes, InviteReply_HandsOutManyRefusedMembers) {
   Refused out;
-  read_bytes(reply_with_many_refused(), [&](const unsigned char* data, int size) {
-    invite_reply_deserialize(data, size, &number, &number, &number, &code, nullptr, &out.ids[0],
-                             &out.counts[0], &out.ids[1], &out.counts[1], &out.ids[2],
-                             &out.counts[2], &out.ids[3], &out.counts[3], &out.pairs,
-                             &out.pair_count, &out.ids[4], &out.counts[4]);
-  });
+  read(invite_reply_deserialize, reply_with_many_refused(), &number, &number, &number, &code,
+       nullptr, &out.ids[0], &out.counts[0], &out.ids[1], &out.counts[1], &out.ids[2],
+       &out.counts[2], &out.ids[3], &out.counts[3], &out.pairs, &out.pair_count, &out.ids[4],
+       &out.counts[4]);
   EXPECT_EQ(std::accumulate(std::begin(out.counts), std::end(out.counts), 0), 5 * kMany);
   out.expect_many();
 }
@@ -208,11 +192,9 @@ TEST(Sizes, AllowChatReply_HandsOutManyMembersAndMarks) {
   qel_message_watermarkentry_t **deliveries = nullptr, **reads = nullptr;
   qel_message_chatroommember_t** members = nullptr;
   int delivery_count = 0, read_count = 0, member_count = 0;
-  read_bytes(reply, [&](const unsigned char* data, int size) {
-    allow_chat_reply_deserialize(data, size, &number, &number, &code, nullptr, &deliveries,
-                                 &delivery_count, &number, &reads, &read_count, &number, &members,
-                                 &member_count, nullptr, &code);
-  });
+  read(allow_chat_reply_deserialize, reply, &number, &number, &code, nullptr, &deliveries,
+       &delivery_count, &number, &reads, &read_count, &number, &members, &member_count, nullptr,
+       &code);
   expect_elements<qel_message_chatroommember_t*>(member_count, members, [](auto* got, int i) {
     const bool is_right = got->userId == id(i) && got->available == (i % 3 == 0) &&
                           is_text(got->name, std::to_string(i));
@@ -234,9 +216,7 @@ struct Page {
   char* key = nullptr;
 
   explicit Page(const Fields& push) {
-    read_bytes(push, [&](const unsigned char* data, int size) {
-      forward_unread_message_deserialize(data, size, &number, &entries, &count, &key);
-    });
+    read(forward_unread_message_deserialize, push, &number, &entries, &count, &key);
   }
 };
 
@@ -267,21 +247,14 @@ INSTANTIATE_TEST_SUITE_P(Bytes, LongTexts, ::testing::Values(70000, size_t{9} <<
 TEST_P(LongTexts, OfRequests_AreSentWhole) {
   const char* text = text_.c_str();
   expect_encoding(Fields().number(1, 7).number(2, 1).number(3, 2).text(5, text_).text(6, text_),
-                  [&](auto** data, int* size) {
-                    channel_auth_request_serialize(7, 1, 2, text, text, data, size);
-                  });
+                  channel_auth_request_serialize, 7, 1, 2, text, text);
   const int64_t receiver = 5;
   expect_encoding(Fields().number(11, 7).number(12, 1).number(13, 5).text(14, text_),
-                  [&](auto** data, int* size) {
-                    create_chatroom_request_serialize(7, 1, &receiver, 1, text, data, size);
-                  });
-  expect_encoding(Fields().number(11, 7).text(12, text_), [&](auto** data, int* size) {
-    forward_unread_message_reply_serialize(7, &text, nullptr, data, size);
-  });
+                  create_chatroom_request_serialize, 7, 1, &receiver, 1, text);
+  expect_encoding(Fields().number(11, 7).text(12, text_), forward_unread_message_reply_serialize, 7,
+                  &text, nullptr);
   expect_encoding(Fields().number(11, 7).number(12, 42).number(13, 5).number(14, 9).text(15, text_),
-                  [&](auto** data, int* size) {
-                    unseal_message_request_serialize(7, 42, 5, 9, text, data, size);
-                  });
+                  unseal_message_request_serialize, 7, 42, 5, 9, text);
   expect_encoding(Fields()
                       .number(11, 7)
                       .number(12, 42)
@@ -290,29 +263,20 @@ TEST_P(LongTexts, OfRequests_AreSentWhole) {
                       .number(22, 5)
                       .number(23, 6)
                       .number(25, 60),
-                  [&](auto** data, int* size) {
-                    save_call_log_request_serialize(7, 42, text, text, 5, 6, 60, data, size);
-                  });
+                  save_call_log_request_serialize, 7, 42, text, text, 5, 6, 60);
   expect_encoding(Fields().number(11, 7).number(12, 42).text(13, text_),
-                  [&](auto** data, int* size) {
-                    is_typing_request_serialize(7, 42, text, nullptr, nullptr, data, size);
-                  });
+                  is_typing_request_serialize, 7, 42, text, nullptr, nullptr);
   expect_encoding(Fields().number(11, 7).number(12, 42).text(13, text_),
-                  [&](auto** data, int* size) {
-                    change_chatroom_meta_request_serialize(7, 42, text, nullptr, data, size);
-                  });
+                  change_chatroom_meta_request_serialize, 7, 42, text, nullptr);
 }
 
 TEST_P(LongTexts, OfResults_AreHandedOutWhole) {
   const Fields result = Fields().number(1, 3).text(2, text_);
   char* text = nullptr;
-  read_bytes(Fields().message(2, result), [&](const unsigned char* data, int size) {
-    channel_auth_reply_deserialize(data, size, &number, &code, &text);
-  });
+  read(channel_auth_reply_deserialize, Fields().message(2, result), &number, &code, &text);
   EXPECT_TRUE(is_text(text, text_));
-  read_bytes(Fields().message(13, result), [&](const unsigned char* data, int size) {
-    unseal_message_reply_deserialize(data, size, &number, &number, &code, &text);
-  });
+  read(unseal_message_reply_deserialize, Fields().message(13, result), &number, &number, &code,
+       &text);
   EXPECT_TRUE(is_text(text, text_));
 }
 
@@ -326,10 +290,8 @@ TEST_P(LongTexts, OfARoom_AreHandedOutWhole) {
   int count = 0;
   char* text = nullptr;
   char* title = nullptr;
-  read_bytes(reply, [&](const unsigned char* data, int size) {
-    allow_chat_reply_deserialize(data, size, &number, &number, &code, &text, &marks, &count,
-                                 &number, &marks, &count, &number, &members, &count, &title, &code);
-  });
+  read(allow_chat_reply_deserialize, reply, &number, &number, &code, &text, &marks, &count, &number,
+       &marks, &count, &number, &members, &count, &title, &code);
   EXPECT_TRUE(is_text(text, text_));
   EXPECT_TRUE(is_text(title, text_));
   EXPECT_TRUE(is_text(members[0]->name, text_));
@@ -349,15 +311,12 @@ TEST_P(LongTexts, OfPushes_AreHandedOutWhole) {
   auto* pointer = &record;
   bool skip_reply = false;
   char* text = nullptr;
-  read_bytes(Fields().message(14, entry), [&](const unsigned char* data, int size) {
-    forward_online_message_get_deserialize(data, size, &number, &number, &code, &pointer,
-                                           &skip_reply, &code, &text);
-  });
+  read(forward_online_message_get_deserialize, Fields().message(14, entry), &number, &number, &code,
+       &pointer, &skip_reply, &code, &text);
   EXPECT_TRUE(is_text(record.chatMsg, text_));
 
-  read_bytes(Fields().text(14, text_), [&](const unsigned char* data, int size) {
-    typing_updated_deserialize(data, size, &number, &number, &number, &text, &code, &code);
-  });
+  read(typing_updated_deserialize, Fields().text(14, text_), &number, &number, &number, &text,
+       &code, &code);
   EXPECT_TRUE(is_text(text, text_));
 }
 
@@ -365,10 +324,10 @@ TEST_P(LongTexts, OfPushes_AreHandedOutWhole) {
 bool is_read(const std::string& text, int levels) {
   const std::string groups = std::string(static_cast<size_t>(levels), '\x63') +
                              std::string(static_cast<size_t>(levels), '\x64');
-  const std::string reply = Fields().message(12, Fields().text(2, text)).bytes() + groups;
+  const Fields result = Fields().text(2, text);
   int64_t request_id = -1;
-  end_chat_reply_deserialize(reinterpret_cast<const unsigned char*>(reply.data()),
-                             static_cast<int>(reply.size()), &request_id, nullptr, nullptr);
+  read(end_chat_reply_deserialize, Fields(Fields().message(12, result).bytes() + groups),
+       &request_id, nullptr, nullptr);
   return request_id != -1;
 }
 

@@ -63,6 +63,14 @@ class Fields {
   std::string bytes_;
 };
 
+// A call of a function that takes the message's bytes first.
+template <typename Function, typename... Others>
+auto read(Function function, const Fields& message, Others... others) {
+  const std::string& bytes = message.bytes();
+  return function(reinterpret_cast<const unsigned char*>(bytes.data()),
+                  static_cast<int>(bytes.size()), others...);
+}
+
 }  // namespace support
 
 #endif
