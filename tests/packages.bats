@@ -93,7 +93,8 @@ has() {
     include/qel-message-protosvc/{msgspec_frontend.pb,qel-message-serialize}.h \
     "$LIBDIR"/cmake/qel-message-protosvc/qel-message-protosvc-config{,-version}.cmake \
     "$LIBDIR"/pkgconfig/qel-message-protosvc{,-classes}.pc \
-    share/qel-message-protosvc/{msgspec_frontend.proto,valgrind.supp}
+    share/qel-message-protosvc/{contract.json,contract.schema.json,msgspec_frontend.proto} \
+    share/qel-message-protosvc/valgrind.supp
   licence=share/doc/$workstation/LICENSE.protobuf
   [ -e "$PROTOBUF/share/doc/protobuf/LICENSE" ] || licence='' # of others' there may be none
   has "$workstation" "$LIBDIR/libdlog-standin.so" "$LIBDIR/libprotobuf.so.9" \

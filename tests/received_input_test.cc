@@ -65,6 +65,23 @@ class Reading : public contract::Observer {
   std::function<void()> look_;
 };
 
+// ---- Length
+
+// Whether a message of that many bytes is read, a field that is unknown.
+bool is_read(size_t size) {
+  const size_t tag_and_length = 6;
+  const Fields message = Fields().text(1000, std::string(size - tag_and_length, 'x'));
+  EXPECT_EQ(message.bytes().size(), size);
+  number = -1;
+  support::read(client_echo_deserialize, message, &number);
+  return number == 0;
+}
+
+TEST(ReceivedInput, MayHave64MiBAndNoByteMore) {
+  EXPECT_TRUE(is_read(64 << 20));
+  EXPECT_FALSE(is_read((64 << 20) + 1));
+}
+
 // ---- Memory
 
 size_t heap_in_use() {
