@@ -16,7 +16,8 @@ for preset in "$@"; do
   sed -E 's/ -Winvalid-pch -include [^ ]*cmake_pch\.hxx / /' "build/$preset/compile_commands.json" \
     >"$folder/compile_commands.json"
   compiled=$(sed -nE "s#^ *\"file\": \"$PWD/(.*)\",?\$#\1#p" "$folder/compile_commands.json")
-  grep -xF "$compiled" <<<"$left" | xargs -P "$(nproc)" -n 1 clang-tidy -p "$folder" --quiet \
+  { grep -xF "$compiled" <<<"$left" || true; } |
+    xargs -r -P "$(nproc)" -n 1 clang-tidy -p "$folder" --quiet \
     2> >(grep -v ' warnings generated' >&2) # in the headers of others
   left=$(grep -vxF "$compiled" <<<"$left" || true)
 done
