@@ -2,6 +2,7 @@
 
 #include <cstdlib>
 #include <fstream>
+#include <map>
 #include <vector>
 
 namespace contract {
@@ -16,23 +17,22 @@ std::vector<std::string> module_source() {
   return lines;
 }
 
-// What stands in the source where the function logs the text.
-std::string statement_of(const std::string& function, int priority, const std::string& text) {
-  const bool ends_encode = priority == 3 && text == "%s: exit" &&
-                           function != "is_typing_request_serialize";  // which does without
-  if (ends_encode || text == "Invalid serialized data size : %d" ||
-      text == "Could not allocate memory for serialized data") {
-    return "encode(";
-  }
-  if (text == "merge error : Could not parse the received data!" ||
-      text == "ConsumedEntireMessage error :Could not parse the received data") {
-    return "parse(";
-  }
+// Whether the statement has the text, or calls the shared step that logs it.
+bool logs(const std::string& statement, const std::string& text) {
+  static const std::map<std::string, std::string> kSharedSteps = {
+      {"%s: exit", "encode("},
+      {"Invalid serialized data size : %d", "encode("},
+      {"Could not allocate memory for serialized data", "encode("},
+      {"merge error : Could not parse the received data!", "parse("},
+      {"ConsumedEntireMessage error :Could not parse the received data", "parse("},
+  };
   std::string literal = "\"";
   for (const char c : text) {
     literal += c == '\n' ? "\\n" : std::string(1, c);
   }
-  return literal + '"';
+  const auto step = kSharedSteps.find(text);
+  return statement.find(literal + '"') != std::string::npos ||
+         (step != kSharedSteps.end() && statement.find(step->second) != std::string::npos);
 }
 
 // The statement up to the line: compilers differ in which line of a call of several they name.
@@ -68,14 +68,12 @@ bool is_in_function(const std::vector<std::string>& source, size_t line,
 
 }  // namespace
 
-std::string other_statement(const std::string& function, int priority, const std::string& text,
-                            int line) {
+std::string other_statement(const std::string& function, const std::string& text, int line) {
   static const bool is_known = std::getenv("QEL_LIBRARY") == nullptr;
   static const std::vector<std::string> source = module_source();
   const auto place = static_cast<size_t>(line);
-  if (!is_known || (is_in_function(source, place, function) &&
-                    statement_at(source, place).find(statement_of(function, priority, text)) !=
-                        std::string::npos)) {
+  if (!is_known ||
+      (is_in_function(source, place, function) && logs(statement_at(source, place), text))) {
     return "";
   }
   return "line " + std::to_string(line) + " of the module, in " + function + ", does not log " +

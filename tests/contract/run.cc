@@ -316,7 +316,7 @@ void CaseRun::on_line(const LogLine& line) {
             std::to_string(step->priority));
     return;
   }
-  const std::string other = other_statement(function_, step->priority, text, line.arguments[2]);
+  const std::string other = other_statement(function_, text, line.arguments[2]);
   if (!other.empty()) {
     problem(other);
   }
