@@ -58,25 +58,6 @@ std::string replaced(std::string text, const std::string& from, const std::strin
   return text;
 }
 
-// With the number for each # in it.
-Json numbered(const Json& pattern, int number) {
-  if (pattern.is_string()) {
-    return pattern == "#" ? Json(number) : Json(replaced(pattern, "#", std::to_string(number)));
-  }
-  if (!pattern.is_structured()) {
-    return pattern;
-  }
-  Json result = pattern.is_array() ? Json::array() : Json::object();
-  for (const auto& [key, value] : pattern.items()) {
-    if (pattern.is_array()) {
-      result.push_back(numbered(value, number));
-    } else {
-      result[replaced(key, "#", std::to_string(number))] = numbered(value, number);
-    }
-  }
-  return result;
-}
-
 std::vector<Step> steps_of(const Json& does) {
   std::vector<Step> steps;
   for (const Json& entry : does) {
@@ -431,6 +412,7 @@ void CaseRun::check_thrown(const std::string& thrown) {
   if (thrown != course_.end.value("throws", "")) {
     problem(thrown.empty() ? "nothing is thrown" : "thrown: " + thrown);
   }
+  check_end();
 }
 
 void CaseRun::check_return(std::optional<int> status) {
@@ -438,6 +420,11 @@ void CaseRun::check_return(std::optional<int> status) {
   if (returned != course_.end.value("returns", Json())) {
     problem("it returned " + returned.dump());
   }
+  check_end();
+}
+
+// Nothing is left to be done but to write.
+void CaseRun::check_end() {
   while (!is_done() &&
          (course_.steps[next_].kind == Step::kWrite || course_.steps[next_].kind == Step::kNews)) {
     if (course_.steps[next_].kind == Step::kWrite) {
@@ -446,7 +433,7 @@ void CaseRun::check_return(std::optional<int> status) {
     ++next_;
   }
   if (!is_done()) {
-    problem("it returned before " + course_.steps[next_].what.dump());
+    problem("it ended before " + course_.steps[next_].what.dump());
   }
   compare_outputs("in the end");
 }

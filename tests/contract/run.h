@@ -75,6 +75,7 @@ class CaseRun : public Observer {
   Json outputs() const;
   void check_thrown(const std::string& thrown);
   void check_return(std::optional<int> status);
+  void check_end();
   void check_blocks();
   void problem(const std::string& text);
   bool is_done() const { return next_ == course_.steps.size(); }
