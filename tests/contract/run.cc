@@ -268,9 +268,10 @@ const Step* CaseRun::take(Step::Kind kind, const std::string& what) {
     ++next_;
   }
   if (is_done() || course_.steps[next_].kind != kind) {
-    const bool is_ending = is_done() && kind == Step::kBlock &&
-                           (course_.end.contains("throws") || course_.end.contains("aborts"));
-    if (!is_ending) {  // which takes blocks too
+    // An exception takes blocks too, and so does what a dying process says.
+    const bool is_ending = is_done() ? !course_.end.contains("returns") && !course_.end.empty()
+                                     : course_.steps[next_].kind == Step::kFault;
+    if (kind != Step::kBlock || !is_ending) {
       problem("unexpected: " + what);
     }
     return nullptr;
