@@ -7,6 +7,7 @@
 #include <fstream>
 #include <functional>
 #include <set>
+#include <stdexcept>
 #include <string>
 
 #include "cases.h"
@@ -92,6 +93,24 @@ TEST(Contract, HasCasesOfTheFunctionsThatAreExported) {
     exported.insert(function);
   }
   EXPECT_EQ(with_cases, exported);
+}
+
+// Whether the case comes to a block of operator new.
+bool allocates(const std::string& function, const std::string& name) {
+  for (const Json& contract_case : contract::cases()) {
+    if (contract_case["call"] == function && contract_case["case"] == name) {
+      CaseRun run(contract_case, contract::course_of(contract_case), 1);
+      run.execute();
+      return run.has_refused_new();
+    }
+  }
+  throw std::invalid_argument(function + " has no case: " + name);
+}
+
+TEST(Contract, ARefusedArgumentComesBeforeOrAfterTheMessageIsFilled) {
+  EXPECT_TRUE(allocates("chat_request_serialize", "A type of -1 is refused"));
+  EXPECT_TRUE(allocates("read_message_request_serialize", "A type of -1 is refused"));
+  EXPECT_FALSE(allocates("create_chatroom_request_serialize", "Without receivers it is refused"));
 }
 
 // The lines of all cases, and what has to be said of each.

@@ -74,11 +74,11 @@ bool is_early(const void* block) {
   return !before(block, early_blocks) && before(block, early_blocks + sizeof early_blocks);
 }
 
-// The function that the program's own one stands before, or nullptr while it is looked up.
+// The function that the program's own one stands before, or nullptr while the thread looks it up.
 template <typename Function>
 Function real(const char* name) {
   static Function found = nullptr;
-  static bool searching = false;
+  static thread_local bool searching = false;
   if (found == nullptr && !searching) {
     searching = true;
     void* symbol = dlsym(RTLD_NEXT, name);

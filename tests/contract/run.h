@@ -76,6 +76,8 @@ class CaseRun : public Observer {
   void check_thrown(const std::string& thrown);
   void check_return(std::optional<int> status);
   void check_end();
+  void watch_death();
+  bool has_place_for(const std::string& path) const;
   void check_blocks();
   void problem(const std::string& text);
   bool is_done() const { return next_ == course_.steps.size(); }
