@@ -362,7 +362,7 @@ bool CaseRun::on_request(Allocator allocator, size_t count, size_t size, const c
 // message is parsed or copied.
 bool CaseRun::on_new() {
   ++news_;
-  if (!problems_.empty() || case_.value("flags", Json::array()).size() > 0) {
+  if (!problems_.empty() || !case_.value("flags", Json::array()).empty()) {
     return true;
   }
   const Json got = outputs();

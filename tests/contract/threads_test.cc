@@ -14,7 +14,6 @@
 namespace {
 
 using contract::CaseRun;
-using contract::Course;
 using contract::Json;
 
 constexpr size_t kThreads = 8;
