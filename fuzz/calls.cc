@@ -331,14 +331,15 @@ std::vector<Target> deserializer_targets() {
   for (const auto& [function, message] : contract::messages().items()) {
     if (contract::parameters_of(function)[0].kind == Kind::kReceived) {
       const std::vector<std::string> entry = entry_of(function);
-      targets.push_back({function, [function = function, entry](const std::string& bytes) {
-                           check_deserializer(function, entry, Json::object(), bytes);
-                           for (const auto& [name, kind] : contract::parameters_of(function)) {
-                             if (name == "inboxEntry") {  // which callers may lack
-                               check_deserializer(function, entry, {{name, nullptr}}, bytes);
-                             }
-                           }
-                         }});
+      targets.push_back(
+          {function, [function = function, entry](const std::string& bytes) {
+             check_deserializer(function, entry, Json::object(), bytes);
+             for (const auto& [name, kind] : contract::parameters_of(function)) {
+               if (name == "inboxEntry") {  // which callers may lack
+                 check_deserializer(function, entry, {{name, {{"to", nullptr}}}}, bytes);
+               }
+             }
+           }});
     }
   }
   return targets;
