@@ -23,6 +23,7 @@ using google::protobuf::FieldDescriptor;
 using google::protobuf::Message;
 using google::protobuf::Reflection;
 
+// NOLINTNEXTLINE(bugprone-exception-escape): what the JSON library declares of its values
 struct Outcome {
   std::optional<int> status;
   Json outputs;
