@@ -10,15 +10,14 @@ else()
   find_package(GTest REQUIRED)
 endif()
 
-# qel_bats_tests(PREFIX FILE... ENVIRONMENT VARIABLE=VALUE...): a test for each file of bats cases, which
-# is named PREFIX and the file's name without its ending.
-function(qel_bats_tests prefix)
-  cmake_parse_arguments(PARSE_ARGV 1 arg "" "" "ENVIRONMENT")
+# qel_bats_tests(FILE... ENVIRONMENT VARIABLE=VALUE...): a test for each file of bats cases, which has the
+# file's name. The cases are named in the file alone.
+function(qel_bats_tests)
+  cmake_parse_arguments(PARSE_ARGV 0 arg "" "" "ENVIRONMENT")
   find_program(QEL_BATS bats REQUIRED DOC "bats 1.5 or later, which runs shell tests")
   foreach(file IN LISTS arg_UNPARSED_ARGUMENTS)
-    cmake_path(GET file STEM name)
-    add_test(NAME ${prefix}.${name}
+    add_test(NAME ${file}
       COMMAND "${QEL_BATS}" --print-output-on-failure "${CMAKE_CURRENT_SOURCE_DIR}/${file}")
-    set_tests_properties(${prefix}.${name} PROPERTIES ENVIRONMENT "${arg_ENVIRONMENT}")
+    set_tests_properties(${file} PROPERTIES ENVIRONMENT "${arg_ENVIRONMENT}")
   endforeach()
 endfunction()

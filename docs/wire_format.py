@@ -32,10 +32,8 @@ def named(values):
 
 
 def block(step, what):
-    asked = what["size"] if step == "malloc" else f"{what['count']}, {what['size']}"
-    if step == "malloc" and what["count"] != 1:
-        asked = f"{what['count']} * {what['size']}"
-    return f"asks for {step}({asked}): {what['for']}"
+    between = ", " if step == "calloc" else " * "
+    return f"asks for {step}({what['count']}{between}{what['size']}): {what['for']}"
 
 
 def course(case):

@@ -50,14 +50,28 @@ void note_free(const volatile void* block) {
   is_stream_kept = is_stream_kept && block != stream;
 }
 
+bool is_deserializer(const std::string& function) {
+  return contract::parameters_of(function)[0].kind == Kind::kReceived;
+}
+
+// The functions that take received bytes, or those that do not, but for those that do nothing.
+std::vector<std::string> functions_that(bool take_bytes) {
+  std::vector<std::string> functions;
+  for (const auto& [function, message] : contract::messages().items()) {
+    if (is_deserializer(function) == take_bytes) {
+      functions.push_back(function);
+    }
+  }
+  return functions;
+}
+
 Outcome call(const std::string& function, const Json& given, const std::string& bytes) {
   contract::Call arguments(given, bytes);
   const contract::Invocation invocation = contract::invocation_of(function, &arguments);
   [[maybe_unused]] static const int installed =
       __sanitizer_install_malloc_and_free_hooks(note_malloc, note_free);
   Outcome outcome;
-  const bool has_stream = contract::parameters_of(function)[0].kind == Kind::kReceived;
-  stream = has_stream ? nullptr : &outcome;
+  stream = is_deserializer(function) ? nullptr : &outcome;
   outcome_of_call = &outcome;
   outcome.status = invocation();
   outcome_of_call = nullptr;
@@ -276,6 +290,22 @@ int64_t number_in(const Message& message, const FieldDescriptor& field) {
   }
 }
 
+// Whether the field, which is one of the message, is what an argument gives.
+bool is_sent_as(const Message& message, const FieldDescriptor& field, const Json& value) {
+  if (field.cpp_type() == FieldDescriptor::CPPTYPE_STRING) {
+    return value == contract::json_of_text(message.GetReflection()->GetString(message, &field));
+  }
+  if (value.is_null()) {
+    return false;
+  }
+  const int64_t sent = number_in(message, field);
+  if (field.cpp_type() == FieldDescriptor::CPPTYPE_BOOL) {
+    return (sent == 1) == (contract::byte_of(value) != 0);
+  }
+  const bool is_too_large = field.name() == "maxCount" && (value < 1 || value > 500);
+  return sent == (is_too_large ? 500 : value.get<int64_t>());
+}
+
 // Every field is what the argument of its name gives; nothing else is sent.
 void check_fields(const Message& message, const Json& given) {
   const Reflection& reflection = *message.GetReflection();
@@ -288,7 +318,6 @@ void check_fields(const Message& message, const Json& given) {
       continue;
     }
     const Json value = given.value(name == "endChatEntries" ? "entries" : name, Json());
-    Json sent;
     if (field->is_repeated()) {
       const int size = reflection.FieldSize(message, field);
       if (size != static_cast<int>(value.size())) {
@@ -309,18 +338,8 @@ void check_fields(const Message& message, const Json& given) {
       check_fields(reflection.GetMessage(message, field), value);
       continue;
     }
-    if (field->cpp_type() == FieldDescriptor::CPPTYPE_STRING) {
-      sent = contract::json_of_text(reflection.GetString(message, field));
-    } else if (field->cpp_type() == FieldDescriptor::CPPTYPE_BOOL) {
-      const bool is_true = value.is_boolean() ? value.get<bool>() : value.is_number() && value != 0;
-      sent = !value.is_null() && is_true == (number_in(message, *field) == 1) ? value : Json("not");
-    } else {
-      sent = number_in(message, *field);
-    }
-    const bool is_page = name == "maxCount" && value.is_number();
-    if (sent != (is_page && (value < 1 || value > 500) ? Json(500) : value) &&
-        !(name == "maxCount" && value.is_null() && sent == 500)) {
-      fail(name + " is " + sent.dump() + " instead of " + value.dump());
+    if (!is_sent_as(message, *field, value)) {
+      fail(name + " is not " + value.dump() + " in " + message.ShortDebugString());
     }
   }
 }
@@ -329,31 +348,24 @@ void check_fields(const Message& message, const Json& given) {
 
 std::vector<Target> deserializer_targets() {
   std::vector<Target> targets;
-  for (const auto& [function, message] : contract::messages().items()) {
-    if (contract::parameters_of(function)[0].kind == Kind::kReceived) {
-      const std::vector<std::string> entry = entry_of(function);
-      targets.push_back(
-          {function, [function = function, entry](const std::string& bytes) {
-             check_deserializer(function, entry, Json::object(), bytes);
-             for (const auto& [name, kind] : contract::parameters_of(function)) {
-               if (name == "inboxEntry") {  // which callers may lack
-                 check_deserializer(function, entry, {{name, {{"to", nullptr}}}}, bytes);
-               }
+  for (const std::string& function : functions_that(true)) {
+    const std::vector<std::string> entry = entry_of(function);
+    targets.push_back(
+        {function, [function, entry](const std::string& bytes) {
+           check_deserializer(function, entry, Json::object(), bytes);
+           for (const auto& [name, kind] : contract::parameters_of(function)) {
+             if (name == "inboxEntry") {  // which callers may lack
+               check_deserializer(function, entry, {{name, {{"to", nullptr}}}}, bytes);
              }
-           }});
-    }
+           }
+         }});
   }
   return targets;
 }
 
 // The first byte chooses the function.
 void check_serializers(const std::string& input) {
-  std::vector<std::string> functions;
-  for (const auto& [function, message] : contract::messages().items()) {
-    if (contract::parameters_of(function)[0].kind != Kind::kReceived) {
-      functions.push_back(function);
-    }
-  }
+  static const std::vector<std::string> functions = functions_that(false);
   if (input.empty()) {
     return;
   }

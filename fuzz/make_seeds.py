@@ -8,41 +8,17 @@ import json
 import pathlib
 import sys
 
-from google.protobuf import descriptor_pb2
-
-sys.path.insert(0, str(pathlib.Path(__file__).resolve().parent.parent / "contract"))
-import service  # pylint: disable=wrong-import-position
+sys.path.insert(0, str(pathlib.Path(__file__).resolve().parent.parent / "tests" / "support"))
+import schema  # pylint: disable=wrong-import-position
 
 # Behind each message what encoders do not write: a packed list or a number where a text is, unknown
 # fields and groups, an enumeration's number that is no member, a length behind the end.
 UNUSUAL = bytes.fromhex("5a020063 3007 c33e0801c43e 7063 6a0308")
 
 
-def fill(message):
-    """Sets every field, two elements of each list, as deep as it goes."""
-    for field in message.DESCRIPTOR.fields:
-        values = [1] if field.type == field.TYPE_BOOL else [field.number * 100, field.number]
-        if field.cpp_type == field.CPPTYPE_STRING:
-            values = ["text", "a longer text"] if field.type == field.TYPE_STRING else [b"text", b"bytes"]
-        elif field.cpp_type == field.CPPTYPE_ENUM:
-            values = [value.number for value in field.enum_type.values][:2] * 2
-        if field.cpp_type == field.CPPTYPE_MESSAGE:
-            if field.label == field.LABEL_REPEATED:
-                fill(getattr(message, field.name).add())
-                getattr(message, field.name).add()
-            else:
-                fill(getattr(message, field.name))
-        elif field.label == field.LABEL_REPEATED:
-            getattr(message, field.name).extend(values)
-        else:
-            setattr(message, field.name, values[0])
-    return message
-
-
 def main():
     contract, schema_folder, folder = sys.argv[1:]
     contract = json.loads(pathlib.Path(contract).read_text())
-    schema = service.load_schema(schema_folder)
 
     def seed(target, name, data):
         path = pathlib.Path(folder, target, str(name))
@@ -52,10 +28,9 @@ def main():
     for number, case in enumerate(contract["cases"]):
         if "received" in case and case["call"] in contract["messages"]:
             seed(case["call"], number, bytes.fromhex(case["received"]["bytes"]))
-    file = descriptor_pb2.FileDescriptorProto()
-    schema.DESCRIPTOR.CopyToProto(file)
-    for number, name in enumerate(message.name for message in file.message_type):
-        encoded = fill(getattr(schema, name)()).SerializeToString(deterministic=True)
+    for number, message in enumerate(schema.messages(schema_folder)):
+        name = message.DESCRIPTOR.name
+        encoded = schema.fill(message).SerializeToString(deterministic=True)
         seed("round_trip", name, bytes([number]) + encoded)  # the first byte chooses the message
         seed("qel_wire", name, bytes([number]) + encoded)
         seed("qel_wire", f"{name}_unusual", bytes([number]) + UNUSUAL)

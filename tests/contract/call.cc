@@ -50,6 +50,11 @@ Json json_of_text(const std::string& text) {
   return is_utf8(text) ? Json(text) : Json({{"hex", hex_of(text)}});
 }
 
+unsigned char byte_of(const Json& flag) {
+  return flag.is_boolean() ? static_cast<unsigned char>(flag.get<bool>())
+                           : flag.get<unsigned char>();
+}
+
 bool Reader::is_fresh(const void* memory, size_t size) {
   const auto* bytes = static_cast<const unsigned char*>(memory);
   return std::all_of(bytes, bytes + size, [](unsigned char byte) { return byte == kFreshByte; });
@@ -99,6 +104,11 @@ Json Call::given(const std::string& name) {
   return given_.contains(name) ? given_[name] : Json();
 }
 
+char* Call::keep_text(const Json& text) {
+  const std::string bytes = text_of(text);
+  return keep(std::vector<char>(bytes.c_str(), bytes.c_str() + bytes.size() + 1));
+}
+
 qel_message_inboxentry_t Call::inbox_entry(const Json& fields) {
   qel_message_inboxentry_t entry = {};
   entry.msgId = fields.value("msgId", int64_t{0});
@@ -110,8 +120,7 @@ qel_message_inboxentry_t Call::inbox_entry(const Json& fields) {
   entry.chatType = fields.value("chatType", 0);
   entry.msgTtl = fields.value("msgTtl", 0);
   if (fields.contains("chatMsg")) {
-    const std::string text = text_of(fields["chatMsg"]);
-    entry.chatMsg = keep(std::vector<char>(text.c_str(), text.c_str() + text.size() + 1));
+    entry.chatMsg = keep_text(fields["chatMsg"]);
   }
   return entry;
 }

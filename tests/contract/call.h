@@ -28,6 +28,9 @@ std::string hex_of(const std::string& bytes);
 std::string text_of(const Json& value);
 Json json_of_text(const std::string& text);
 
+// A bool as the byte that it is: true and false, or a byte that is neither.
+unsigned char byte_of(const Json& flag);
+
 // The size of a block of calloc, malloc or strdup that is in use, if it is one.
 using SizeOf = std::function<std::optional<size_t>(const void* block)>;
 
@@ -150,6 +153,7 @@ class Call {
 
   template <typename T>
   T* keep(std::vector<T> values);
+  char* keep_text(const Json& text);
   template <typename T>
   T* input(const std::string& name);
   template <typename T>
@@ -217,14 +221,13 @@ T* Call::input(const std::string& name) {
       values.push_back(inbox_entry(element));
     } else if constexpr (std::is_same_v<T, qel_message_endchatentry_t>) {
       qel_message_endchatentry_t entry = {element.value("chatroomId", int64_t{0}), false};
-      const Json flag = element.value("denyInvitation", Json(false));
-      const auto byte = flag.is_boolean() ? static_cast<unsigned char>(flag.get<bool>())
-                                          : flag.get<unsigned char>();
-      std::memcpy(&entry.denyInvitation, &byte, 1);
+      const unsigned char flag = byte_of(element.value("denyInvitation", Json(false)));
+      std::memcpy(&entry.denyInvitation, &flag, 1);
       values.push_back(entry);
+    } else if constexpr (std::is_same_v<T, unsigned char>) {
+      values.push_back(byte_of(element));
     } else {
-      values.push_back(element.is_boolean() ? static_cast<T>(element.get<bool>())
-                                            : element.get<T>());
+      values.push_back(element.get<T>());
     }
   }
   values.shrink_to_fit();  // so that reading beyond it shows
@@ -242,30 +245,20 @@ T Call::argument(const std::string& name) {
     return !value.is_null() ? value.get<T>()
            : name == "size" ? static_cast<T>(received_.size())
                             : T{0};
-  } else if constexpr (std::is_same_v<T, unsigned char>) {  // a bool, or a byte that is none
+  } else if constexpr (std::is_same_v<T, unsigned char>) {
     const Json value = given(name);
-    return value.is_null()      ? T{0}
-           : value.is_boolean() ? static_cast<T>(value.get<bool>())
-                                : value.get<T>();
+    return value.is_null() ? T{0} : byte_of(value);
   } else if constexpr (std::is_same_v<T, const char*>) {
     const Json value = given(name);
-    if (value.is_null()) {
-      return nullptr;
-    }
-    const std::string text = text_of(value);
-    return keep(std::vector<char>(text.c_str(), text.c_str() + text.size() + 1));
+    return value.is_null() ? nullptr : keep_text(value);
   } else if constexpr (std::is_same_v<T, const char**>) {
     // {to: null} is a pointer to NULL.
     const Json value = given(name);
     if (value.is_null()) {
       return nullptr;
     }
-    const char* pointer = nullptr;
-    if (!value.is_object() || !value.contains("to")) {
-      const std::string text = text_of(value);
-      pointer = keep(std::vector<char>(text.c_str(), text.c_str() + text.size() + 1));
-    }
-    return keep(std::vector<const char*>{pointer});
+    const bool is_to_null = value.is_object() && value.contains("to");
+    return keep(std::vector<const char*>{is_to_null ? nullptr : keep_text(value)});
   } else if constexpr (std::is_same_v<T, const bool*>) {
     return reinterpret_cast<const bool*>(input<unsigned char>(name));
   } else if constexpr (std::is_const_v<std::remove_pointer_t<T>>) {

@@ -151,11 +151,9 @@ std::string identifier(std::string name) {
   return name;
 }
 
-void add_test(const std::string& suite, const Json& contract_case,
+void add_test(const std::string& suite, const Json& contract_case, const Course& course,
               void (*body)(const Json&, const Course&)) {
-  const auto test = [&contract_case, body] {
-    body(contract_case, contract::course_of(contract_case));
-  };
+  const auto test = [&contract_case, course, body] { body(contract_case, course); };
   ::testing::RegisterTest(suite.c_str(), identifier(contract_case.at("case")).c_str(), nullptr,
                           nullptr, __FILE__, __LINE__, [&contract_case, test]() -> ContractTest* {
                             return new ContractTest(contract_case, test);
@@ -168,13 +166,13 @@ int main(int argc, char** argv) {
   ::testing::InitGoogleTest(&argc, argv);
   for (const Json& contract_case : contract::cases()) {
     const std::string function = contract_case.at("call");
-    add_test(function, contract_case, run);
     const Course course = contract::course_of(contract_case);
+    add_test(function, contract_case, course, run);
     if (blocks_of(course) > 0) {
-      add_test(function + "/each_block_refused", contract_case, refuse_blocks);
+      add_test(function + "/each_block_refused", contract_case, course, refuse_blocks);
     }
     if (!ends_process(course) && !contract_case.contains("flags")) {
-      add_test(function + "/each_new_refused", contract_case, refuse_news);
+      add_test(function + "/each_new_refused", contract_case, course, refuse_news);
     }
   }
   return RUN_ALL_TESTS();

@@ -131,8 +131,3 @@ TEST(MessageLength, WhenTheCallSucceeds_IsComputedOnce) {
 }
 
 }  // namespace
-
-int main(int argc, char** argv) {
-  ::testing::InitGoogleTest(&argc, argv);
-  return RUN_ALL_TESTS();
-}

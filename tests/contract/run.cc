@@ -30,11 +30,6 @@ const std::map<int, std::string> kColours = {
 constexpr int kProblem = 97;
 constexpr int kReturned = 98;
 
-Json without(Json object, const std::string& key) {
-  object.erase(key);
-  return object;
-}
-
 // The common end of a serializer. If there is no memory, most log this error and return -1.
 void add_encode(const Json& encode, std::vector<Step>* steps) {
   const std::string hex = encode.at("bytes");
@@ -185,7 +180,8 @@ Course course_without_block(const Course& course, int n) {
     for (const Step& follows : steps_of(refused.at("does"))) {
       rest.steps.push_back(follows);
     }
-    rest.end = without(refused, "does");
+    rest.end = refused;
+    rest.end.erase("does");
     return rest;
   }
   if (step->allocator == Allocator::kStrdup) {
@@ -254,19 +250,25 @@ void CaseRun::compare_outputs(const std::string& when) {
   }
 }
 
-// The step that comes next, if it is of this kind: until there the outputs are written as the case
-// says. After the first problem nothing more is compared.
+// Until the next line or block, the outputs are written as the case says.
+void CaseRun::apply_writes() {
+  for (; !is_done(); ++next_) {
+    const Step& step = course_.steps[next_];
+    if (step.kind == Step::kWrite) {
+      apply(step);
+    } else if (step.kind != Step::kNews) {
+      return;
+    }
+  }
+}
+
+// The step that comes next, if it is of this kind. After the first problem nothing more is
+// compared.
 const Step* CaseRun::take(Step::Kind kind, const std::string& what) {
   if (!problems_.empty() || !is_called_) {
     return nullptr;
   }
-  while (!is_done() && course_.steps[next_].kind != Step::kLine &&
-         course_.steps[next_].kind != Step::kBlock && course_.steps[next_].kind != Step::kFault) {
-    if (course_.steps[next_].kind != Step::kNews) {
-      apply(course_.steps[next_]);
-    }
-    ++next_;
-  }
+  apply_writes();
   if (is_done() || course_.steps[next_].kind != kind) {
     // An exception takes blocks too, and so does what a dying process says.
     const bool is_ending = is_done() ? !course_.end.contains("returns") && !course_.end.empty()
@@ -358,8 +360,9 @@ bool CaseRun::on_request(Allocator allocator, size_t count, size_t size, const c
   return !step->is_refused;
 }
 
-// A serializer's message is filled before anything is written. A deserializer allocates where its
-// message is parsed or copied.
+// A deserializer allocates where its message is parsed or copied. A serializer fills its message
+// after its first line and before anything is written; or where it copies something, if the case
+// says so.
 bool CaseRun::on_new() {
   ++news_;
   if (!problems_.empty() || !case_.value("flags", Json::array()).empty()) {
@@ -367,8 +370,10 @@ bool CaseRun::on_new() {
   }
   const Json got = outputs();
   const Json before = model_;
-  const bool is_serializer = !course_.keeps_stream && next_ > 0;  // after its first line
-  bool fits = is_serializer && got == model_;
+  const bool fills_anywhere =
+      next_ > 0 && std::none_of(course_.steps.begin(), course_.steps.end(),
+                                [](const Step& step) { return step.kind == Step::kNews; });
+  bool fits = fills_anywhere && got == model_;
   for (size_t i = next_; i < course_.steps.size() && !fits; ++i) {
     const Step& step = course_.steps[i];
     if (step.kind == Step::kNews) {
@@ -436,13 +441,7 @@ void CaseRun::check_return(std::optional<int> status) {
 
 // Nothing is left to be done but to write.
 void CaseRun::check_end() {
-  while (!is_done() &&
-         (course_.steps[next_].kind == Step::kWrite || course_.steps[next_].kind == Step::kNews)) {
-    if (course_.steps[next_].kind == Step::kWrite) {
-      apply(course_.steps[next_]);
-    }
-    ++next_;
-  }
+  apply_writes();
   if (!is_done() && course_.steps[next_].kind != Step::kFault) {
     problem("it ended before " + course_.steps[next_].what.dump());
   }
@@ -567,8 +566,6 @@ void CaseRun::execute_in_child() {
                                       WEXITSTATUS(status) != kReturned);  // in ways of its own
 #else
   const bool faults = signal == SIGSEGV;
-#endif
-#ifndef __SANITIZE_ADDRESS__
   if (!course_.end.contains("aborts") && !case_.contains("flags") && !said.empty()) {
     problem("before it faulted, the process said:\n" + said);
   }

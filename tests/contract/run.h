@@ -69,6 +69,7 @@ class CaseRun : public Observer {
   bool on_new();
   const Step* take(Step::Kind kind, const std::string& what);
   void apply(const Step& step);
+  void apply_writes();
   void store(const std::string& path, const Json& value);
   void compare_outputs(const std::string& when);
   Reader reader() const;

@@ -59,8 +59,3 @@ TEST(Threads, WhenEightMakeAllCalls_EachHasItsOwnResultsAndLines) {
 }
 
 }  // namespace
-
-int main(int argc, char** argv) {
-  ::testing::InitGoogleTest(&argc, argv);
-  return RUN_ALL_TESTS();
-}
