@@ -34,12 +34,6 @@ said_by() {
   none <err
 }
 
-@test "every function that does something is called" {
-  [ "$DLOG_STANDIN" = 1 ] || skip "a device's log service does not show it"
-  diff <(functions | grep -v '^forward_stored_message_' | sort) \
-    <(sed -nE 's/^.*\]([a-z_]+)(:? start|: enter)$/\1/p' log | sort -u)
-}
-
 @test "a refused access token ends both programs and is not shown" {
   run -1 run_demo --access-token refused-token
   says 'demo: failed (plug-in 1, front end 1)'
