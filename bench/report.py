@@ -3,7 +3,7 @@
 
 usage: report.py BUILD [ARM_BUILD...] [--rounds N] [--to FOLDER]
 
-BUILD is the folder of the preset bench, ARM_BUILD those of the presets for ARM. In each round all
+BUILD is the folder of the preset release, ARM_BUILD those of the presets for ARM. In each round all
 programs run each case in turn, so that a disturbance of the machine slows them all. Times are
 medians of the rounds, ratios the medians of the rounds' ratios.
 """
@@ -42,7 +42,7 @@ CASE_NAMES = {
     "message_page/500": "page, 500 messages",
     "chatroom_entry/500": "room, 500 members",
 }
-PRESETS = {"bench": "x86-64", "armhf": "ARM, hard float", "armel": "ARM, soft float"}
+PRESETS = {"release": "x86-64", "armhf": "ARM, hard float", "armel": "ARM, soft float"}
 ROUNDS, FEWEST_PUBLISHED = 21, 11
 SINGLE = [case for case in measure.CASES if case not in measure.LISTS]
 
@@ -129,9 +129,10 @@ def time_calls(build, rounds):
 
 
 def time_loading(build, rounds):
+    baseline_runtime = pathlib.Path(build.setting("QEL_BASELINE_RUNTIME"))
     libraries = {
         "plain": (build.folder / "bench" / "libplain-protosvc.so", {}),
-        "ours, plain runtime": (build.library, {"LD_LIBRARY_PATH": build.setting("QEL_PLAIN_PROTOBUF_ROOT") + "/lib"}),
+        "ours, plain runtime": (build.library, {"LD_LIBRARY_PATH": str(baseline_runtime.parent)}),
         "ours": (build.library, {}),
     }
     times = Rounds()
@@ -245,7 +246,7 @@ def thresholds(results):
     for preset in results["instructions"]:
         for case, threshold in measure.INSTRUCTION_THRESHOLDS.items():
             counted = results["instructions"][preset][case]
-            if preset != "bench":
+            if preset != "release":
                 yield Threshold(f"{CASE_NAMES[case]}: instructions on {PRESETS[preset]}, ratio",
                                 counted["ours"] / counted["baseline"], threshold, is_ratio=True)
     for name, threshold in LOADING_RATIOS.items():

@@ -8,7 +8,7 @@
 bats_require_minimum_version 1.5.0
 BATS_PRINT_OUTPUT_ON_FAILURE=1 # of 'run'
 export LC_ALL=C
-unset QEL_PLAIN_PROTOBUF_ROOT QEL_DOCS # presets read them, and here they are of the build around the tests
+unset QEL_PLAIN_PROTOBUF_ROOT QEL_BENCH QEL_DOCS # presets read them, and here they are of the build around the tests
 # shellcheck source=/dev/null
 . "${QEL_BUILD:-${BASH_SOURCE[0]%/*}/../build/release}/tests/build.bash"
 FIRST=${VERSION%%.*} # the SONAME's number

@@ -112,7 +112,7 @@ class ReceivedInput : public ::testing::TestWithParam<CostlyInput> {};
 constexpr size_t kMostMemoryPerByte = sizeof(void*) == 4 ? 100 : 130;
 
 TEST_P(ReceivedInput, WhenOfEmptyElements_TakesLessMemoryPerByteThanCallersCountOn) {
-#ifdef __SANITIZE_ADDRESS__
+#ifdef QEL_ADDRESS_SANITIZER
   GTEST_SKIP() << "the sanitizer's heap is another";
 #endif
   std::string input;

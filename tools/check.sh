@@ -13,14 +13,14 @@ check_fuzz() {
   do_fuzz invite_reply_deserialize 1
 }
 
-check_docs() { QEL_DOCS=ON run_tests release -R '^reference\.'; }
+check_bench_and_docs() { QEL_DOCS=ON for_bench run_tests -R '^(Bench|reference\.)'; }
 
 check_format() {
   step "check formatting" "./dev format mends it" clang_format --dry-run --Werror
   do_format # which finds nothing left to do
 }
 
-check_lint() { step "lint" '' tools/lint.sh release bench fuzz; }
+check_lint() { step "lint" '' tools/lint.sh release fuzz; }
 
 check_demo() {
   do_demo
@@ -37,19 +37,17 @@ do_check() {
   stage_folder=$root/build/check
   setup
   stage tests '' do_test
-  stage plain-runtime '' runtime/get --plain
   stage packages tests check_packages
   stage demo tests check_demo
   stage format packages check_format
   stage runtime-armhf packages runtime/get arm-linux-gnueabihf
-  stage armhf runtime-armhf armhf_with_counts run_tests
+  stage armhf runtime-armhf for_arm armhf run_tests
   stage sanitizers tests run_tests sanitizers
   stage runtime-armel packages runtime/get arm-linux-gnueabi
   stage armel runtime-armel for_arm armel run_tests
   stage fuzz packages check_fuzz
-  stage bench 'packages plain-runtime' for_bench run_tests
-  stage docs 'packages demo' check_docs
-  stage lint 'bench fuzz docs' check_lint
+  stage bench-and-docs 'packages demo' check_bench_and_docs
+  stage lint 'bench-and-docs fuzz' check_lint
   stage coverage packages do_coverage
   stage threads tests run_tests threads
   run_stages

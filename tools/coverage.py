@@ -1,21 +1,44 @@
 #!/usr/bin/env python3
 """Checks that the tests execute all lines and branches of the module, except for listed ones.
 
-usage: coverage.py BUILD
+usage: coverage.py BUILD TESTS
 
-BUILD is a folder of the coverage preset in which the tests have run. Writes BUILD/coverage.txt and
-BUILD/html/index.html. Branches that the compiler adds for exceptions are not counted.
+BUILD is the folder of the preset coverage, TESTS that of release, both built. Runs the tests with the
+library of BUILD, and writes BUILD/coverage.txt and BUILD/html/index.html. Branches that the compiler
+adds for exceptions are not counted.
 """
 
+import concurrent.futures
 import json
+import os
 import pathlib
 import re
 import subprocess
 import sys
 
+import programs
+
 ROOT = pathlib.Path(__file__).resolve().parent.parent
 LISTED = ROOT / "tools" / "uncovered.txt"
 SOURCES = ["encode-and-parse.h", "log-line.h", "qel-message-serialize.cc"]
+
+
+def run_tests(build, tests):
+    for counters in build.rglob("*.gcda"):  # of an earlier run
+        counters.unlink()
+    environment = programs.with_library(build / "proto-lib" / "libqel-message-protosvc.so")
+
+    def run(program):
+        return subprocess.run([program, "--gtest_brief=1"], env=environment, stdout=subprocess.PIPE,
+                              stderr=subprocess.STDOUT, text=True, errors="replace")
+
+    with concurrent.futures.ThreadPoolExecutor(os.cpu_count()) as pool:
+        runs = list(pool.map(run, programs.test_programs(tests)))
+    failed = [run for run in runs if run.returncode != 0]
+    for run in failed:
+        print(run.stdout)
+    if failed or not runs:
+        sys.exit(f"coverage: {len(failed)} of {len(runs)} test programs failed")
 
 
 def gcovr(build, *report):
@@ -59,9 +82,10 @@ def listed():
 
 
 def main():
-    if len(sys.argv) != 2:
+    if len(sys.argv) != 3:
         sys.exit(__doc__)
-    build = pathlib.Path(sys.argv[1]).resolve()
+    build, tests = (pathlib.Path(folder).resolve() for folder in sys.argv[1:])
+    run_tests(build, tests)
     found, lines, branches = measured(build)
     known = listed()
     (build / "coverage.txt").write_text(

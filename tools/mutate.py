@@ -1,11 +1,12 @@
 #!/usr/bin/env python3
 """Changes the module in many small ways, one at a time, and checks that the tests notice.
 
-usage: mutate.py BUILD [--list | --all] [PATTERN]
+usage: mutate.py BUILD TESTS [--list | --all] [PATTERN]
 
-BUILD is a folder of the coverage preset, built. Each mutant is compiled and linked in another
-folder, and the test programs of BUILD load that library: neither the tree nor BUILD changes. With
-PATTERN, a regular expression, only mutants whose names match it are tried, and all of them.
+BUILD is the folder of the preset coverage, TESTS that of release, both built. Each mutant is compiled
+and linked in another folder, and the test programs load that library: neither the tree nor a build
+changes. With PATTERN, a regular expression, only mutants whose names match it are tried, and all of
+them.
 """
 
 import argparse
@@ -25,6 +26,7 @@ import time
 import zlib
 
 import mutants
+import programs
 
 ROOT = pathlib.Path(__file__).resolve().parent.parent
 MODULE = "proto-lib/qel-message-serialize.cc"
@@ -57,7 +59,7 @@ def run(command, seconds, **settings):
 class Build:
     """How the preset builds the library, and which programs test it."""
 
-    def __init__(self, folder):
+    def __init__(self, folder, tests):
         self.folder = folder
         entries = json.loads((folder / "compile_commands.json").read_text())
         entry = next(e for e in entries if e["file"] == str(ROOT / MODULE))
@@ -66,9 +68,7 @@ class Build:
         self.library = str((folder / LIBRARY).resolve().relative_to(folder))
         self.link = self._output("ninja", "-C", folder, "-t", "commands", self.library).splitlines()[-1]
         self.soname = re.search(r"-Wl,-soname,(\S+)", self.link)[1]
-        listed = json.loads(self._output("ctest", "--test-dir", folder, "--show-only=json-v1"))
-        self.programs = sorted({t["command"][0] for t in listed["tests"]
-                                if any(a.startswith("--gtest") for a in t["command"])})
+        self.programs = programs.test_programs(tests)
 
     @staticmethod
     def _output(*command):
@@ -136,10 +136,9 @@ class Worker:
         yield from ((p, "*") for p in self.build.programs)
 
     def test(self, program, pattern, seconds):
-        environment = dict(os.environ, LD_LIBRARY_PATH=str(self.folder),
-                           QEL_LIBRARY=str(self.folder / self.build.soname))
         return run([program, "--gtest_brief=1", "--gtest_fail_fast", f"--gtest_filter={pattern}"],
-                   seconds, env=environment, cwd=self.folder)
+                   seconds, env=programs.with_library(self.folder / self.build.soname),
+                   cwd=self.folder)
 
 
 def time_limits(worker):
@@ -210,7 +209,8 @@ def print_table(counts):
 
 def main():
     arguments = argparse.ArgumentParser(usage=__doc__.split("usage: ")[1].split("\n")[0])
-    arguments.add_argument("build")
+    arguments.add_argument("build", type=pathlib.Path)
+    arguments.add_argument("tests", type=pathlib.Path)
     arguments.add_argument("--list", action="store_true")
     arguments.add_argument("--all", action="store_true")
     arguments.add_argument("pattern", nargs="?")
@@ -234,7 +234,7 @@ def main():
 
     folder = ROOT / "build" / "mutate"
     folder.mkdir(exist_ok=True)
-    build = Build(pathlib.Path(given.build).resolve())
+    build = Build(given.build.resolve(), given.tests.resolve())
     counts = collections.defaultdict(collections.Counter)
     wrong = [f"listed as equivalent, but no mutant: {name}" for name in sorted(unknown)]
     start = time.monotonic()

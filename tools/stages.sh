@@ -3,7 +3,7 @@
 # Needs tools/step.sh. What a stage says is kept in $stage_folder.
 
 stages=()
-declare -A stage_after stage_command stage_state
+declare -A stage_after stage_command stage_state stage_began
 
 # stage NAME 'STAGE...' COMMAND...: one that begins when the stages named before the command have
 # passed. The words of the command have no blanks.
@@ -18,13 +18,14 @@ stage_can_begin() {
   local other
   [ "${stage_state[$1]}" = waiting ] || return 1
   for other in ${stage_after[$1]}; do
-    [ "${stage_state[$other]}" = passed ] || return 1
+    [[ ${stage_state[$other]} = passed* ]] || return 1
   done
 }
 
 begin_stage() {
   say "begin: $1"
   stage_state[$1]=running
+  stage_began[$1]=$SECONDS
   (
     trap - EXIT INT TERM
     log=$stage_folder/$1.log
@@ -68,14 +69,14 @@ run_stages() {
     wait -n -p pid "${!stage_of[@]}" || passed=''
     name=${stage_of[$pid]}
     unset "stage_of[$pid]"
-    stage_state[$name]=${passed:+passed}
+    stage_state[$name]=${passed:+passed in $((SECONDS - stage_began[$name])) s}
     if [ -z "$passed" ]; then
       stop_stages
       stage_state[$name]=failed
       show_stage "$name" >&2
       fail "$name has failed; what it says is in $stage_folder/$name.out"
     fi
-    while [ "${stage_state[${stages[shown]:-none}]:-}" = passed ]; do
+    while [[ ${stage_state[${stages[shown]:-none}]:-} = passed* ]]; do
       show_stage "${stages[shown]}"
       shown=$((shown + 1))
     done

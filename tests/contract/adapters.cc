@@ -6,7 +6,7 @@
 #include <map>
 #include <sstream>
 #include <stdexcept>
-#include <tuple>
+#include <utility>
 
 namespace contract {
 namespace {
@@ -55,33 +55,60 @@ Kind kind_of() {
   // clang-format on
 }
 
+// An argument, as it waits for the call.
+using Slot = uint64_t;
+
+template <typename T>
+Slot slot_of(T argument) {
+  Slot slot = 0;
+  std::memcpy(&slot, &argument, sizeof argument);
+  return slot;
+}
+
+template <typename T>
+T argument_in(const Slot& slot) {
+  T argument;
+  std::memcpy(&argument, &slot, sizeof argument);
+  return argument;
+}
+
 struct Adapter {
   std::vector<Parameter> parameters;
-  std::function<Invocation(const std::string& function, Call* call)> bind;
+  std::vector<Slot> (*make_arguments)(const std::vector<Parameter>& parameters, Call* call);
+  std::optional<int> (*call)(void* function, const Slot* arguments);
 };
+
+template <typename... A>
+std::vector<Slot> make_arguments(const std::vector<Parameter>& parameters, Call* call) {
+  auto parameter = parameters.begin();
+  // In braces, so that they are made in order.
+  return {slot_of(call->argument<Passed<A>>((parameter++)->name))...};
+}
+
+template <typename R, typename... A, size_t... I>
+std::optional<int> call_with(void* function, const Slot* arguments, std::index_sequence<I...>) {
+  R (*called)(Passed<A>...) = nullptr;
+  std::memcpy(&called, &function, sizeof called);
+  if constexpr (std::is_void_v<R>) {
+    called(argument_in<Passed<A>>(arguments[I])...);
+    return std::nullopt;
+  } else {
+    return called(argument_in<Passed<A>>(arguments[I])...);
+  }
+}
 
 template <typename R, typename... A>
 Adapter adapter(R (* /*declared*/)(A...), const std::string& names) {
   std::istringstream words(names);
-  std::string word;
-  std::vector<Parameter> parameters{(words >> word, Parameter{word, kind_of<A>()})...};
-  return {
-      parameters, [parameters](const std::string& function, Call* call) -> Invocation {
-        auto parameter = parameters.begin();
-        // In braces, so that they are made in order.
-        const std::tuple<Passed<A>...> arguments{call->argument<Passed<A>>((parameter++)->name)...};
-        R (*called)(Passed<A>...) = nullptr;
-        void* found = address(function);
-        std::memcpy(&called, &found, sizeof called);
-        return [=]() -> std::optional<int> {
-          if constexpr (std::is_void_v<R>) {
-            std::apply(called, arguments);
-            return std::nullopt;
-          } else {
-            return std::apply(called, arguments);
-          }
-        };
-      }};
+  std::vector<Parameter> parameters;
+  for (const Kind kind : {kind_of<A>()...}) {
+    std::string name;
+    words >> name;
+    parameters.push_back({name, kind});
+  }
+  return {parameters, make_arguments<A...>, [](void* function, const Slot* arguments) {
+            return call_with<R, A...>(function, arguments, std::index_sequence_for<A...>());
+          }};
 }
 
 // Nothing of the library is linked with this program: of the functions, only the types are used.
@@ -224,7 +251,11 @@ const std::vector<Parameter>& parameters_of(const std::string& function) {
 }
 
 Invocation invocation_of(const std::string& function, Call* call) {
-  return adapter_of(function).bind(function, call);
+  const Adapter& adapter = adapter_of(function);
+  void* const found = address(function);
+  return [&adapter, found, arguments = adapter.make_arguments(adapter.parameters, call)] {
+    return adapter.call(found, arguments.data());
+  };
 }
 
 }  // namespace contract

@@ -10,7 +10,6 @@
 #include <cstdio>
 #include <cstdlib>
 #include <map>
-#include <regex>
 #include <utility>
 
 #include "adapters.h"
@@ -122,11 +121,10 @@ std::string shown(const LogLine& line) {
 
 // The frame that all lines share.
 bool is_in_frame(const LogLine& line, const std::string& function) {
-  static const std::regex kSource("qel-message-serialize\\.[a-z+]+");
   const Json& arguments = line.arguments;
   return line.log_id == 0 && line.tag == "MESSAGE_PLUGIN" && arguments.size() >= 4 &&
-         std::regex_match(arguments[0].get<std::string>(), kSource) && arguments[1] == function &&
-         arguments[2].get<int>() > 0 && line.fresh_thread_id != 0 &&
+         arguments[0].get<std::string>().rfind("qel-message-serialize.", 0) == 0 &&
+         arguments[1] == function && arguments[2].get<int>() > 0 && line.fresh_thread_id != 0 &&
          arguments[3] == line.fresh_thread_id;
 }
 
@@ -561,7 +559,7 @@ void CaseRun::execute_in_child() {
     return s.kind == Step::kLine || s.kind == Step::kBlock;
   });
   const int signal = WIFSIGNALED(status) ? WTERMSIG(status) : 0;
-#ifdef __SANITIZE_ADDRESS__
+#ifdef QEL_ADDRESS_SANITIZER
   const bool faults = signal != 0 || (WEXITSTATUS(status) != kProblem &&
                                       WEXITSTATUS(status) != kReturned);  // in ways of its own
 #else

@@ -28,7 +28,7 @@ inline std::string refused_by_setter(const std::string& message, const std::stri
 
 // A NULL pointer that is read or written through.
 inline bool faults(int status) {
-#ifdef __SANITIZE_ADDRESS__
+#ifdef QEL_ADDRESS_SANITIZER
   return status != 0;  // the sanitizers end the process in ways of their own
 #else
   return WIFSIGNALED(status) && WTERMSIG(status) == SIGSEGV;
