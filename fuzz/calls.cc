@@ -369,7 +369,7 @@ void check_serializers(const std::string& input) {
   if (input.empty()) {
     return;
   }
-  const std::string function = functions[static_cast<unsigned char>(input[0]) % functions.size()];
+  const std::string& function = functions[static_cast<unsigned char>(input[0]) % functions.size()];
   const std::string rest = input.substr(1);
   const Json given = Arguments(rest).of(function);
   const Outcome got = call(function, given, "");

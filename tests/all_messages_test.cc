@@ -152,9 +152,13 @@ class Writer {
     std::string text = "\"";
     for (const char c : bytes) {
       const auto byte = static_cast<unsigned char>(c);
-      char octal[5];
-      std::snprintf(octal, sizeof octal, "\\%03o", byte);
-      text += std::isalnum(byte) != 0 ? std::string(1, c) : octal;
+      if (std::isalnum(byte) != 0) {
+        text += c;
+      } else {
+        char octal[5];
+        std::snprintf(octal, sizeof octal, "\\%03o", byte);
+        text += octal;
+      }
     }
     return text + "\" ";
   }
