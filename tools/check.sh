@@ -41,7 +41,7 @@ do_check() {
   stage demo tests check_demo
   stage format packages check_format
   stage runtime-armhf packages runtime/get arm-linux-gnueabihf
-  stage armhf runtime-armhf for_arm armhf run_tests
+  stage armhf runtime-armhf armhf_tests
   stage sanitizers tests run_tests sanitizers
   stage runtime-armel packages runtime/get arm-linux-gnueabi
   stage armel runtime-armel for_arm armel run_tests
