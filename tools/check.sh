@@ -46,9 +46,9 @@ do_check() {
   stage runtime-armel packages runtime/get arm-linux-gnueabi
   stage armel runtime-armel for_arm armel run_tests
   stage fuzz packages check_fuzz
-  stage bench-and-docs 'packages demo' check_bench_and_docs
+  stage coverage 'packages demo' do_coverage
+  stage bench-and-docs coverage check_bench_and_docs # after what else builds the preset release
   stage lint 'bench-and-docs fuzz' check_lint
-  stage coverage packages do_coverage
   stage threads tests run_tests threads
   run_stages
 }
