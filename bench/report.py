@@ -331,7 +331,7 @@ def report(results):
     return f"""# Benchmark
 
 Written by `{results['command']}` on {results['date']}. {about['processor']}; {about['system']};
-{results['compilers']['bench']}. Medians of {results['rounds']} rounds. The columns and the
+{results['compilers']['release']}. Medians of {results['rounds']} rounds. The columns and the
 numbers are explained in [performance.md](../performance.md).
 
 {time_table(results)}
