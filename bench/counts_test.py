@@ -38,9 +38,13 @@ def kept_blocks(case, ours, baseline):
     expect(baseline[1] == 0, f"{case}: the baseline keeps {baseline[1]}")
 
 
-def published():
-    """The instructions of each case in docs/benchmark, which another compiler would not have."""
-    results = json.loads((measure.PUBLISHED / "results.json").read_text())
+def published_results():
+    return json.loads((measure.PUBLISHED / "results.json").read_text())
+
+
+def published_instructions():
+    """Those of each case, which another compiler would not have."""
+    results = published_results()
     compiler = results["compilers"][build.folder.name]
     if build.compiler != compiler:
         print(f"published for {compiler}, not {build.compiler}")
@@ -49,17 +53,27 @@ def published():
 
 
 def instructions_are_those_published():
-    for case, listed in published().items():
+    for case, listed in published_instructions().items():
         counted = build.instructions("ours", case)
         expect(abs(counted - listed["ours"]) <= 0.03 * listed["ours"],
                f"{case}: {counted:.0f} instructions, published are {listed['ours']:.0f}")
 
 
 def instructions_are_within_the_thresholds():
-    for case, listed in published().items():
+    for case, listed in published_instructions().items():
         ours, threshold = build.instructions("ours", case), measure.INSTRUCTION_THRESHOLDS[case]
         expect(round(ours / listed["baseline"], 2) <= threshold,
                f"{case}: {ours:.0f} instructions, more than {threshold} of {listed['baseline']:.0f}")
+
+
+def blocks_are_those_published():
+    results = published_results()
+    for case, listed in results["blocks"].items():
+        counted = build.blocks("ours", case)
+        expect(counted == listed["ours"], f"{case}: {counted} blocks and lines, published are {listed['ours']}")
+    for case, listed in results["allocations"].items():
+        counted = build.blocks("ours", case, 1)[0]
+        expect(counted == listed, f"{case}: {counted} allocations, published are {listed}")
 
 
 # Each further entry takes the same number of blocks, apart from the arrays whose size the classes
@@ -83,6 +97,7 @@ CASES = {
     "parsers_keep_the_stream_alone":
         lambda: compare_blocks(kept_blocks),
     "allocations_grow_with_the_entries": allocations_grow_with_the_entries,
+    "blocks_are_those_published": blocks_are_those_published,
     "instructions_are_those_published": instructions_are_those_published,
     "instructions_are_within_the_thresholds": instructions_are_within_the_thresholds,
 }

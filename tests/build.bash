@@ -11,6 +11,7 @@ export LC_ALL=C
 unset QEL_PLAIN_PROTOBUF_ROOT QEL_BENCH QEL_DOCS # presets read them, and here they are of the build around the tests
 # shellcheck source=/dev/null
 . "${QEL_BUILD:-${BASH_SOURCE[0]%/*}/../build/release}/tests/build.bash"
+MODULE=${QEL_MODULE:-$MODULE} # another object of it, as mutation makes them
 FIRST=${VERSION%%.*} # the SONAME's number
 case $TRIPLE in
   arm-linux-gnueabihf) ARCHITECTURE=armhf ;;

@@ -3,7 +3,7 @@
 # Needs tools/step.sh. What a stage says is kept in $stage_folder.
 
 stages=()
-declare -A stage_after stage_command stage_state stage_began
+declare -A stage_after stage_command stage_state stage_began stage_took
 
 # stage NAME 'STAGE...' COMMAND...: one that begins when the stages named before the command have
 # passed. The words of the command have no blanks.
@@ -18,7 +18,7 @@ stage_can_begin() {
   local other
   [ "${stage_state[$1]}" = waiting ] || return 1
   for other in ${stage_after[$1]}; do
-    [[ ${stage_state[$other]} = passed* ]] || return 1
+    [ "${stage_state[$other]}" = passed ] || return 1
   done
 }
 
@@ -37,7 +37,7 @@ begin_stage() {
 
 show_stage() {
   printf '\n'
-  say "$1: ${stage_state[$1]}"
+  say "$1: ${stage_state[$1]}${stage_took[$1]:+ in ${stage_took[$1]} s}"
   cat "$stage_folder/$1.out"
 }
 
@@ -69,14 +69,15 @@ run_stages() {
     wait -n -p pid "${!stage_of[@]}" || passed=''
     name=${stage_of[$pid]}
     unset "stage_of[$pid]"
-    stage_state[$name]=${passed:+passed in $((SECONDS - stage_began[$name])) s}
+    stage_state[$name]=${passed:+passed}
     if [ -z "$passed" ]; then
       stop_stages
       stage_state[$name]=failed
       show_stage "$name" >&2
       fail "$name has failed; what it says is in $stage_folder/$name.out"
     fi
-    while [[ ${stage_state[${stages[shown]:-none}]:-} = passed* ]]; do
+    stage_took[$name]=$((SECONDS - stage_began[$name]))
+    while [ "${stage_state[${stages[shown]:-none}]:-}" = passed ]; do
       show_stage "${stages[shown]}"
       shown=$((shown + 1))
     done

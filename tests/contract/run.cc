@@ -119,11 +119,18 @@ std::string shown(const LogLine& line) {
          line.arguments.dump();
 }
 
+// The name of the module's source, in any language.
+bool is_source(const std::string& name) {
+  const std::string stem = "qel-message-serialize.";
+  return name.size() > stem.size() && name.compare(0, stem.size(), stem) == 0 &&
+         name.find_first_not_of("abcdefghijklmnopqrstuvwxyz+", stem.size()) == std::string::npos;
+}
+
 // The frame that all lines share.
 bool is_in_frame(const LogLine& line, const std::string& function) {
   const Json& arguments = line.arguments;
   return line.log_id == 0 && line.tag == "MESSAGE_PLUGIN" && arguments.size() >= 4 &&
-         arguments[0].get<std::string>().rfind("qel-message-serialize.", 0) == 0 &&
+         is_source(arguments[0].get<std::string>()) &&
          arguments[1] == function && arguments[2].get<int>() > 0 && line.fresh_thread_id != 0 &&
          arguments[3] == line.fresh_thread_id;
 }
