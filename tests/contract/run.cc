@@ -130,8 +130,8 @@ bool is_source(const std::string& name) {
 bool is_in_frame(const LogLine& line, const std::string& function) {
   const Json& arguments = line.arguments;
   return line.log_id == 0 && line.tag == "MESSAGE_PLUGIN" && arguments.size() >= 4 &&
-         is_source(arguments[0].get<std::string>()) &&
-         arguments[1] == function && arguments[2].get<int>() > 0 && line.fresh_thread_id != 0 &&
+         is_source(arguments[0].get<std::string>()) && arguments[1] == function &&
+         arguments[2].get<int>() > 0 && line.fresh_thread_id != 0 &&
          arguments[3] == line.fresh_thread_id;
 }
 
