@@ -16,6 +16,7 @@ function(qel_compile_schema implementation file)
     COMMENT "Compiling the schema for ${implementation}"
     VERBATIM)
   add_library(${implementation}-schema STATIC "${folder}/${file}")
+  target_compile_options(${implementation}-schema PRIVATE ${schema_options})
   target_include_directories(${implementation}-schema SYSTEM PUBLIC "${folder}")
 endfunction()
 
