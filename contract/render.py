@@ -55,7 +55,7 @@ def main():
     output, *families = map(pathlib.Path, sys.argv[1:])
     contract = {"format": FORMAT, "messages": {}, "cases": []}
     for family in families:
-        for function in yaml.safe_load_all(family.read_text()):
+        for function in yaml.load_all(family.read_text(), yaml.CSafeLoader):
             call = function["call"]
             if function["message"]:
                 contract["messages"][call] = function["message"]
