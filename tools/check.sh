@@ -32,21 +32,22 @@ check_packages() {
     "${fuzz_packages[@]}" "${bench_packages[@]}" "${docs_packages[@]}"
 }
 
-# The tests come first, as a user would run them; long stages come before short ones.
+# The tests begin first, as a user would run them, and no other stage uses the library before they have
+# passed. Long stages come before short ones.
 do_check() {
   stage_folder=$root/build/check
-  setup
+  need_packages "${build_packages[@]}"
   stage tests '' do_test
-  stage packages tests check_packages
+  stage packages '' check_packages
+  stage runtime-armhf packages runtime/get arm-linux-gnueabihf
+  stage runtime-armel packages runtime/get arm-linux-gnueabi
   stage demo tests check_demo
   stage format packages check_format
-  stage runtime-armhf packages runtime/get arm-linux-gnueabihf
-  stage armhf runtime-armhf armhf_tests
+  stage armhf 'tests runtime-armhf' armhf_tests
   stage sanitizers tests run_tests sanitizers
-  stage runtime-armel packages runtime/get arm-linux-gnueabi
-  stage armel runtime-armel for_arm armel run_tests
-  stage fuzz packages check_fuzz
-  stage coverage 'packages demo' do_coverage
+  stage armel 'tests runtime-armel' for_arm armel run_tests
+  stage fuzz 'tests packages' check_fuzz
+  stage coverage 'demo packages' do_coverage
   stage bench-and-docs coverage check_bench_and_docs # after what else builds the preset release
   stage lint 'bench-and-docs fuzz' check_lint
   stage threads tests run_tests threads
