@@ -28,6 +28,9 @@ class ContractTest : public ::testing::Test {
       : case_(contract_case), body_(std::move(body)) {}
 
   void TestBody() override {
+#ifdef QEL_ADDRESS_SANITIZER  // its report ends the process, and is to be seen
+    body_();
+#else
     ::testing::internal::CaptureStderr();
     body_();
     const std::string said = ::testing::internal::GetCapturedStderr();
@@ -37,6 +40,7 @@ class ContractTest : public ::testing::Test {
     EXPECT_TRUE(said.empty() || (!expected.empty() && said.find(expected) != std::string::npos))
         << said;
     EXPECT_EQ(said.find('\xff'), std::string::npos) << said;
+#endif
   }
 
  private:
