@@ -123,8 +123,8 @@ TEST(Sizes, ChatReply_HandsOutManyEntries) {
 }
 
 // The outputs that a test does not look at.
-int64_t number = 0;
-int code = 0;
+int64_t ignored_number = 0;
+int ignored_code = 0;
 
 // The lists of refused users: of ids, in the order of the fields 1, 2, 3, 4 and 6, and of pairs.
 struct Refused {
@@ -158,19 +158,19 @@ Fields reply_with_many_refused() {
 
 TEST(Sizes, CreateChatroomReply_HandsOutManyRefusedReceivers) {
   Refused out;
-  read(create_chatroom_reply_deserialize, reply_with_many_refused(), &number, &number, &code, &code,
-       nullptr, &out.ids[0], &out.counts[0], &out.ids[2], &out.counts[2], &out.pairs,
-       &out.pair_count, &out.ids[4], &out.counts[4]);
+  read(create_chatroom_reply_deserialize, reply_with_many_refused(), &ignored_number,
+       &ignored_number, &ignored_code, &ignored_code, nullptr, &out.ids[0], &out.counts[0],
+       &out.ids[2], &out.counts[2], &out.pairs, &out.pair_count, &out.ids[4], &out.counts[4]);
   EXPECT_EQ(out.counts[0] + out.counts[2] + out.counts[4], 3 * kMany);
   out.expect_many();
 }
 
 TEST(Sizes, InviteReply_HandsOutManyRefusedMembers) {
   Refused out;
-  read(invite_reply_deserialize, reply_with_many_refused(), &number, &number, &number, &code,
-       nullptr, &out.ids[0], &out.counts[0], &out.ids[1], &out.counts[1], &out.ids[2],
-       &out.counts[2], &out.ids[3], &out.counts[3], &out.pairs, &out.pair_count, &out.ids[4],
-       &out.counts[4]);
+  read(invite_reply_deserialize, reply_with_many_refused(), &ignored_number, &ignored_number,
+       &ignored_number, &ignored_code, nullptr, &out.ids[0], &out.counts[0], &out.ids[1],
+       &out.counts[1], &out.ids[2], &out.counts[2], &out.ids[3], &out.counts[3], &out.pairs,
+       &out.pair_count, &out.ids[4], &out.counts[4]);
   EXPECT_EQ(std::accumulate(std::begin(out.counts), std::end(out.counts), 0), 5 * kMany);
   out.expect_many();
 }
@@ -192,9 +192,9 @@ TEST(Sizes, AllowChatReply_HandsOutManyMembersAndMarks) {
   qel_message_watermarkentry_t **deliveries = nullptr, **reads = nullptr;
   qel_message_chatroommember_t** members = nullptr;
   int delivery_count = 0, read_count = 0, member_count = 0;
-  read(allow_chat_reply_deserialize, reply, &number, &number, &code, nullptr, &deliveries,
-       &delivery_count, &number, &reads, &read_count, &number, &members, &member_count, nullptr,
-       &code);
+  read(allow_chat_reply_deserialize, reply, &ignored_number, &ignored_number, &ignored_code,
+       nullptr, &deliveries, &delivery_count, &ignored_number, &reads, &read_count, &ignored_number,
+       &members, &member_count, nullptr, &ignored_code);
   expect_elements<qel_message_chatroommember_t*>(member_count, members, [](auto* got, int i) {
     const bool is_right = got->userId == id(i) && got->available == (i % 3 == 0) &&
                           is_text(got->name, std::to_string(i));
@@ -216,7 +216,7 @@ struct Page {
   char* key = nullptr;
 
   explicit Page(const Fields& push) {
-    read(forward_unread_message_deserialize, push, &number, &entries, &count, &key);
+    read(forward_unread_message_deserialize, push, &ignored_number, &entries, &count, &key);
   }
 };
 
@@ -273,10 +273,11 @@ TEST_P(LongTexts, OfRequests_AreSentWhole) {
 TEST_P(LongTexts, OfResults_AreHandedOutWhole) {
   const Fields result = Fields().number(1, 3).text(2, text_);
   char* text = nullptr;
-  read(channel_auth_reply_deserialize, Fields().message(2, result), &number, &code, &text);
-  EXPECT_TRUE(is_text(text, text_));
-  read(unseal_message_reply_deserialize, Fields().message(13, result), &number, &number, &code,
+  read(channel_auth_reply_deserialize, Fields().message(2, result), &ignored_number, &ignored_code,
        &text);
+  EXPECT_TRUE(is_text(text, text_));
+  read(unseal_message_reply_deserialize, Fields().message(13, result), &ignored_number,
+       &ignored_number, &ignored_code, &text);
   EXPECT_TRUE(is_text(text, text_));
 }
 
@@ -290,8 +291,9 @@ TEST_P(LongTexts, OfARoom_AreHandedOutWhole) {
   int count = 0;
   char* text = nullptr;
   char* title = nullptr;
-  read(allow_chat_reply_deserialize, reply, &number, &number, &code, &text, &marks, &count, &number,
-       &marks, &count, &number, &members, &count, &title, &code);
+  read(allow_chat_reply_deserialize, reply, &ignored_number, &ignored_number, &ignored_code, &text,
+       &marks, &count, &ignored_number, &marks, &count, &ignored_number, &members, &count, &title,
+       &ignored_code);
   EXPECT_TRUE(is_text(text, text_));
   EXPECT_TRUE(is_text(title, text_));
   EXPECT_TRUE(is_text(members[0]->name, text_));
@@ -311,12 +313,12 @@ TEST_P(LongTexts, OfPushes_AreHandedOutWhole) {
   auto* pointer = &record;
   bool skip_reply = false;
   char* text = nullptr;
-  read(forward_online_message_get_deserialize, Fields().message(14, entry), &number, &number, &code,
-       &pointer, &skip_reply, &code, &text);
+  read(forward_online_message_get_deserialize, Fields().message(14, entry), &ignored_number,
+       &ignored_number, &ignored_code, &pointer, &skip_reply, &ignored_code, &text);
   EXPECT_TRUE(is_text(record.chatMsg, text_));
 
-  read(typing_updated_deserialize, Fields().text(14, text_), &number, &number, &number, &text,
-       &code, &code);
+  read(typing_updated_deserialize, Fields().text(14, text_), &ignored_number, &ignored_number,
+       &ignored_number, &text, &ignored_code, &ignored_code);
   EXPECT_TRUE(is_text(text, text_));
 }
 
