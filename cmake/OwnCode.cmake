@@ -41,4 +41,5 @@ add_compile_options(
   "-fmacro-prefix-map=${PROJECT_BINARY_DIR}/=")
 
 add_library(qel-own-code INTERFACE)
-target_compile_options(qel-own-code INTERFACE -Wall -Wextra -Wconversion -Werror)
+target_compile_options(qel-own-code INTERFACE -Wall -Wextra -Wconversion -Wredundant-decls -Werror
+  $<$<COMPILE_LANGUAGE:CXX>:-Wsuggest-override -Wzero-as-null-pointer-constant>)

@@ -2,5 +2,5 @@
 // generated code into the module. Link-time optimisation would do that too, but it removes inline
 // functions of the classes from the library, which other modules may be linked with.
 
-#include "msgspec_frontend.pb.cc"    // NOLINT(bugprone-suspicious-include)
-#include "qel-message-serialize.cc"  // NOLINT(bugprone-suspicious-include)
+#include "msgspec_frontend.pb.cc"
+#include "qel-message-serialize.cc"
