@@ -691,7 +691,7 @@ void save_call_log_reply_deserialize(const unsigned char* data, int size, int64_
  *
  * Returns nothing. To notice a failure, set *serialized_data to NULL before the call. If the buffer
  * cannot be allocated, *serialized_data is NULL, *size holds the length, and the log line is at
- * debug level.
+ * debug level. That the length is below 1 is not tested: a buffer of that length is asked for.
  */
 void is_typing_request_serialize(int64_t requestId, int64_t chatroomId, const char* state,
                                  const int* contentType, const int* refresh,

@@ -117,6 +117,28 @@ TEST(Contract, ARefusedArgumentComesBeforeOrAfterTheMessageIsFilled) {
   EXPECT_FALSE(allocates("create_chatroom_request_serialize", "Without receivers it is refused"));
 }
 
+TEST(Contract, WhatTheCasesCopy_IsCopiedThere) {
+  std::set<std::string> copying;
+  std::set<std::string> copied;
+  for (const Json& contract_case : contract::cases()) {
+    const Course course = contract::course_of(contract_case);
+    const bool copies = std::any_of(course.steps.begin(), course.steps.end(), [](const Step& step) {
+      return step.kind == Step::kNews && step.what.is_string();
+    });
+    if (copies && course.end.size() == course.end.count("returns") &&
+        !contract_case.contains("flags")) {
+      copying.insert(contract_case["call"]);
+      CaseRun run(contract_case, course);
+      run.execute();
+      if (run.has_copied()) {
+        copied.insert(contract_case["call"]);
+      }
+    }
+  }
+  EXPECT_FALSE(copying.empty());
+  EXPECT_EQ(copied, copying);
+}
+
 // The lines of all cases, and what has to be said of each.
 void for_each_line(const std::function<void(const std::string& function, const Step& line)>& look) {
   for (const Json& contract_case : contract::cases()) {

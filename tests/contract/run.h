@@ -60,6 +60,9 @@ class CaseRun : public Observer {
   // Whether it has come to the block of operator new that is refused.
   bool has_refused_new() const { return thrown_at_.has_value(); }
 
+  // Whether operator new was called where something is copied.
+  bool has_copied() const { return has_copied_; }
+
  private:
   void on_line(const LogLine& line) override;
   bool on_request(Allocator allocator, size_t count, size_t size, const char* text) override;
@@ -94,6 +97,7 @@ class CaseRun : public Observer {
   Json model_;                            // of the outputs
   bool is_called_ = false;
   int news_ = 0;
+  bool has_copied_ = false;
   std::optional<Json> thrown_at_;  // the outputs when operator new refused
   struct Progress {
     int steps;  // lines and blocks that were as they should be
