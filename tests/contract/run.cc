@@ -383,7 +383,7 @@ bool CaseRun::on_new() {
     const Step& step = course_.steps[i];
     if (step.kind == Step::kNews) {
       fits = got == model_;
-      has_copied_ = has_copied_ || (fits && step.what.is_string());  // what is copied
+      has_copied_ = has_copied_ || (fits && step.is_copy());
     } else if (step.kind == Step::kWrite) {
       apply(step);
     } else {

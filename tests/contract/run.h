@@ -29,6 +29,9 @@ struct Step {
   int priority = 0;
   Allocator allocator = Allocator::kCalloc;
   bool is_refused = false;
+
+  // Of kNews: a case names what is copied.
+  bool is_copy() const { return kind == kNews && what.is_string(); }
 };
 
 struct Course {
