@@ -16,9 +16,9 @@ struct records {
 
 #include "qel-message-serialize.h"
 
-static inline void take(struct records* all, qel_message_didviolationuser_t* pair,
-                        qel_message_watermarkentry_t* mark, qel_message_chatroommember_t* member,
-                        qel_message_inboxentry_t* message, qel_message_endchatentry_t* ended) {
+void take(struct records* all, qel_message_didviolationuser_t* pair,
+          qel_message_watermarkentry_t* mark, qel_message_chatroommember_t* member,
+          qel_message_inboxentry_t* message, qel_message_endchatentry_t* ended) {
   all->pair = pair;
   all->mark = mark;
   all->member = member;

@@ -5,11 +5,10 @@
 
 # What is committed, and a number of new inputs; the corpus of longer runs is left alone.
 check_fuzz() {
-  cmake_build fuzz
   rm -rf build/fuzz/check
-  fuzz/run.sh build/fuzz/fuzz build/fuzz/check/corpus -runs=10000
+  fuzz/run.sh build/sanitizers/fuzz build/fuzz/check -runs=5000
   # As one replays a finding.
-  build/fuzz/fuzz/invite_reply_deserialize build/fuzz/fuzz/seeds/invite_reply_deserialize/*
+  build/sanitizers/fuzz/invite_reply_deserialize build/sanitizers/fuzz/seeds/invite_reply_deserialize/*
   do_fuzz invite_reply_deserialize 1
 }
 
@@ -20,7 +19,7 @@ check_format() {
   do_format # which finds nothing left to do
 }
 
-check_lint() { step "lint" '' tools/lint.sh release fuzz; }
+check_lint() { step "lint" '' tools/lint.sh release sanitizers; }
 
 check_demo() {
   do_demo
@@ -44,9 +43,9 @@ do_check() {
   stage demo tests check_demo
   stage format packages check_format
   stage armhf 'tests runtime-armhf' armhf_tests
-  stage sanitizers tests run_tests sanitizers
+  stage sanitizers 'tests packages' run_tests sanitizers
   stage armel 'tests runtime-armel' for_arm armel run_tests
-  stage fuzz 'tests packages' check_fuzz
+  stage fuzz sanitizers check_fuzz
   stage coverage 'demo packages' do_coverage
   stage bench-and-docs coverage check_bench_and_docs # after what else builds the preset release
   stage lint 'bench-and-docs fuzz' check_lint

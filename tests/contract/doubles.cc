@@ -76,14 +76,18 @@ bool is_early(const void* block) {
   return place >= first && place < first + sizeof early_blocks;
 }
 
-// The function that the program's own one stands before, or nullptr while the thread looks it up.
+// The function that the program's own one stands before, which is a sanitizer's if there is one; or
+// nullptr while the thread looks it up.
 template <typename Function>
-Function real(const char* name) {
+Function real(const char* name, const char* interceptor = nullptr) {
   static Function found = nullptr;
   static thread_local bool searching = false;
   if (found == nullptr && !searching) {
     searching = true;
-    void* symbol = dlsym(RTLD_NEXT, name);
+    void* symbol = interceptor == nullptr ? nullptr : dlsym(RTLD_DEFAULT, interceptor);
+    if (symbol == nullptr) {
+      symbol = dlsym(RTLD_NEXT, name);
+    }
     std::memcpy(&found, &symbol, sizeof found);
     searching = false;
   }
@@ -91,12 +95,12 @@ Function real(const char* name) {
 }
 
 void* real_malloc(size_t size) {
-  const auto function = real<void* (*)(size_t)>("malloc");
+  const auto function = real<void* (*)(size_t)>("malloc", "__interceptor_malloc");
   return function == nullptr ? early_memory(size) : function(size);
 }
 
 void real_free(void* block) {
-  const auto function = real<void (*)(void*)>("free");
+  const auto function = real<void (*)(void*)>("free", "__interceptor_free");
   if (function != nullptr && !is_early(block)) {
     function(block);
   }
@@ -140,7 +144,8 @@ extern "C" const char* __asan_default_options() {
 
 extern "C" void* calloc(size_t count, size_t size) noexcept {
   using contract::Allocator;
-  const auto real_calloc = contract::real<void* (*)(size_t, size_t)>("calloc");
+  const auto real_calloc =
+      contract::real<void* (*)(size_t, size_t)>("calloc", "__interceptor_calloc");
   if (real_calloc == nullptr) {
     return contract::early_memory(count * size);
   }

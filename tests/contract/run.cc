@@ -14,6 +14,7 @@
 
 #include "adapters.h"
 #include "log_statement.h"
+#include "support/address_sanitizer.h"
 
 namespace contract {
 namespace {
@@ -567,15 +568,12 @@ void CaseRun::execute_in_child() {
     return s.kind == Step::kLine || s.kind == Step::kBlock;
   });
   const int signal = WIFSIGNALED(status) ? WTERMSIG(status) : 0;
-#ifdef QEL_ADDRESS_SANITIZER
-  const bool faults = signal != 0 || (WEXITSTATUS(status) != kProblem &&
-                                      WEXITSTATUS(status) != kReturned);  // in ways of its own
-#else
-  const bool faults = signal == SIGSEGV;
-  if (!course_.end.contains("aborts") && !case_.contains("flags") && !said.empty()) {
+  bool faults = signal == SIGSEGV;
+  if (support::has_address_sanitizer()) {  // which ends the process in ways of its own
+    faults = signal != 0 || (WEXITSTATUS(status) != kProblem && WEXITSTATUS(status) != kReturned);
+  } else if (!course_.end.contains("aborts") && !case_.contains("flags") && !said.empty()) {
     problem("before it faulted, the process said:\n" + said);
   }
-#endif
   if (course_.end.contains("aborts")
           ? signal != SIGABRT || !says_assertion_alone(said, course_.end["aborts"])
           : !faults) {

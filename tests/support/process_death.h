@@ -8,6 +8,8 @@
 #include <csignal>
 #include <string>
 
+#include "address_sanitizer.h"
+
 namespace support {
 
 inline bool aborts(int status) {
@@ -28,11 +30,10 @@ inline std::string refused_by_setter(const std::string& message, const std::stri
 
 // A NULL pointer that is read or written through.
 inline bool faults(int status) {
-#ifdef QEL_ADDRESS_SANITIZER
-  return status != 0;  // the sanitizers end the process in ways of their own
-#else
+  if (has_address_sanitizer()) {  // which ends the process in ways of its own
+    return status != 0;
+  }
   return WIFSIGNALED(status) && WTERMSIG(status) == SIGSEGV;
-#endif
 }
 
 }  // namespace support
