@@ -18,6 +18,11 @@ check_armel() { for_arm armel run_tests -E '^(Contract\.threads|device_sdk|examp
 
 check_bench_and_docs() { QEL_DOCS=ON for_bench run_tests -R '^(Bench|reference\.)'; }
 
+check_threads() {
+  setup
+  run_tests threads
+}
+
 check_format() {
   step "check formatting" "./dev format mends it" clang_format --dry-run --Werror
   do_format # which finds nothing left to do
@@ -35,8 +40,8 @@ check_packages() {
     "${fuzz_packages[@]}" "${bench_packages[@]}" "${docs_packages[@]}"
 }
 
-# The tests begin first, as a user would run them, and no other stage uses the library before they have
-# passed. Long stages come before short ones.
+# The tests begin first, as a user would run them. What needs nothing that they build is done beside them;
+# the other stages wait until they have passed, and long ones come before short ones.
 do_check() {
   stage_folder=$root/build/check
   need_packages "${build_packages[@]}"
@@ -44,8 +49,9 @@ do_check() {
   stage packages '' check_packages
   stage runtime-armhf packages runtime/get arm-linux-gnueabihf
   stage runtime-armel packages runtime/get arm-linux-gnueabi
-  stage demo tests check_demo
   stage format packages check_format
+  stage threads packages check_threads
+  stage demo tests check_demo
   stage armhf 'tests runtime-armhf' armhf_tests
   stage sanitizers 'tests packages' run_tests sanitizers
   stage armel 'tests runtime-armel' check_armel
@@ -53,6 +59,5 @@ do_check() {
   stage coverage 'demo packages' do_coverage
   stage bench-and-docs coverage check_bench_and_docs # after what else builds the preset release
   stage lint 'bench-and-docs sanitizers' check_lint
-  stage threads tests run_tests threads
   run_stages
 }
