@@ -28,8 +28,9 @@ std::vector<const Json*> cases_that_return() {
   return returning;
 }
 
-// Each thread begins with another case, so that all sorts of calls meet.
-TEST(Threads, WhenEightMakeAllCalls_EachHasItsOwnResultsAndLines) {
+// Each thread makes half of the calls, and begins with another one, so that all sorts of calls
+// meet.
+TEST(Threads, WhenEightCallAtOnce_EachHasItsOwnResultsAndLines) {
   const std::vector<const Json*> cases = cases_that_return();
   ASSERT_FALSE(cases.empty());
   std::atomic<size_t> waiting = kThreads;
@@ -40,7 +41,7 @@ TEST(Threads, WhenEightMakeAllCalls_EachHasItsOwnResultsAndLines) {
       --waiting;
       while (waiting > 0) {
       }
-      for (size_t i = 0; i < cases.size() && problems[thread].empty(); ++i) {
+      for (size_t i = 0; i < cases.size() / 2 && problems[thread].empty(); ++i) {
         const Json& contract_case = *cases[(i + thread * cases.size() / kThreads) % cases.size()];
         CaseRun run(contract_case, contract::course_of(contract_case));
         run.execute();
