@@ -24,9 +24,10 @@ json.dump(list(commands.values()), sys.stdout, indent=1)'
 # the sanitizers run those paths.
 tidy() {
   local checks=''
-  case $2 in tests/* | bench/* | fuzz/* | qel-wire/tests/* | qel-wire/fuzz_target.cc)
-    checks='-clang-analyzer-*,-bugprone-*,-misc-*,-performance-*'
-    ;;
+  case $2 in
+    tests/* | bench/* | fuzz/* | qel-wire/tests/* | qel-wire/fuzz_target.cc)
+      checks='-clang-analyzer-*,-bugprone-*,-misc-*,-performance-*'
+      ;;
   esac
   clang-tidy -p "$1" --quiet "--checks=$checks" "$2"
 }
