@@ -35,11 +35,20 @@ if(QEL_FUZZ)
   add_compile_options(-fsanitize=fuzzer-no-link)
 endif()
 
-# Aborts name files relative to the tree, wherever it and the build folder are. A generated file is
-# named as if it lay beside its source. If both options fit, the compiler takes the last one.
-add_compile_options(
-  "-fmacro-prefix-map=${PROJECT_SOURCE_DIR}/="
-  "-fmacro-prefix-map=${PROJECT_BINARY_DIR}/=")
+# name_files_below(FOLDER): aborts and debug information name its files relative to it, so that a build is
+# the same in every folder. If several folders fit, the compiler takes the last one. Counters of coverage
+# keep whole names, which gcov needs.
+function(name_files_below folder)
+  add_compile_options(
+    "-fmacro-prefix-map=${folder}/=" "-fdebug-prefix-map=${folder}=." "-fdebug-prefix-map=${folder}/=")
+endfunction()
+
+# A generated file is named as if it lay beside its source.
+if(CMAKE_SYSROOT)
+  name_files_below("${CMAKE_SYSROOT}")
+endif()
+name_files_below("${PROJECT_SOURCE_DIR}")
+name_files_below("${PROJECT_BINARY_DIR}")
 
 add_library(qel-own-code INTERFACE)
 target_compile_options(qel-own-code INTERFACE -Wall -Wextra -Wconversion -Wredundant-decls -Werror

@@ -67,5 +67,5 @@ set_target_properties(protobuf26 PROPERTIES
   INTERFACE_INCLUDE_DIRECTORIES "${QEL_PROTOBUF_PREFIX}/include"
   INTERFACE_LINK_LIBRARIES Threads::Threads)
 
-# Failed checks in the runtime's headers name them as they are included.
-add_compile_options("-fmacro-prefix-map=${QEL_PROTOBUF_PREFIX}/include/=")
+# The runtime's headers are named as they are included.
+name_files_below("${QEL_PROTOBUF_PREFIX}/include")
