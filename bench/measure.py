@@ -37,14 +37,19 @@ def kept_blocks(case):
 
 @dataclasses.dataclass
 class Build:
-    """The benchmark as one preset builds it."""
+    """The benchmark as one preset builds it, with its library or with that of another preset."""
 
     folder: pathlib.Path
     emulator: list  # the command that runs a program of another machine
+    other: pathlib.Path = None  # the folder of that preset
+
+    @property
+    def name(self):
+        return (self.other or self.folder).name
 
     @property
     def library(self):
-        return self.folder / "proto-lib" / "libqel-message-protosvc.so"
+        return (self.other or self.folder) / "proto-lib" / "libqel-message-protosvc.so"
 
     @property
     def compiler(self):
@@ -82,14 +87,16 @@ class Build:
 
     def _executed(self, implementation, case, calls):
         emulator = self.emulator or [f"qemu-{platform.machine()}"]
+        libraries = {"LD_LIBRARY_PATH": str(self.library.parent)} if self.other else {}
         command = [*emulator, "-plugin", str(self.folder / "bench" / "count_instructions.so"),
                    self.program("count_calls", implementation), case, str(calls)]
         # The C library has variants for newer processors. Without them all machines count the same.
-        out = self.run(command, GLIBC_TUNABLES="glibc.cpu.hwcaps=-AVX2,-AVX512F,-AVX512VL,-ERMS,-FSRM").stderr
+        out = self.run(command, GLIBC_TUNABLES="glibc.cpu.hwcaps=-AVX2,-AVX512F,-AVX512VL,-ERMS,-FSRM",
+                       **libraries).stderr
         return int(re.search(r"^instructions (\d+)$", out, re.MULTILINE)[1])
 
 
-def build_of(folder):
-    """The build in a preset's folder."""
+def build_of(folder, other=None):
+    """The build in a preset's folder, with the library of another's."""
     emulator = folder / "emulate"
-    return Build(folder, [str(emulator)] if emulator.exists() else [])
+    return Build(folder, [str(emulator)] if emulator.exists() else [], other)

@@ -12,6 +12,7 @@ unset QEL_PLAIN_PROTOBUF_ROOT QEL_BENCH QEL_DOCS # presets read them, and here t
 # shellcheck source=/dev/null
 . "${QEL_BUILD:-${BASH_SOURCE[0]%/*}/../build/release}/tests/build.bash"
 MODULE=${QEL_MODULE:-$MODULE} # another object of it, as mutation makes them
+LIBRARY=${QEL_LIBRARY:-$LIBRARY} # as "./dev contract" takes it
 FIRST=${VERSION%%.*} # the SONAME's number
 case $TRIPLE in
   arm-linux-gnueabihf) ARCHITECTURE=armhf ;;
