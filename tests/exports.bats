@@ -107,6 +107,24 @@ allowed=(
   grep -vxP "$(IFS='|' && echo "${allowed[*]}")" taken | none
 }
 
+@test "no schema is built from elsewhere" {
+  "$NM" -DC --undefined-only "$LIBRARY" >taken
+  grep -q 'google::protobuf::DescriptorPool::InternalAddGeneratedFile(' taken # its own, compiled in
+  grep -E '(BuildFile|DescriptorDatabase|DynamicMessage|FileDescriptorProto|compiler)' taken | none
+}
+
+@test "the runtime has no JSON" {
+  "$NM" -DC --defined-only "$PROTOBUF/lib/libprotobuf.so.9" >names
+  grep -q 'google::protobuf::Message::ParseFromArray\|google::protobuf::MessageLite::ParseFromArray' names
+  grep -i json names | none
+}
+
+@test "the runtime is the one of C++" {
+  "$READELF" -dW "$PROTOBUF/lib/libprotobuf.so.9" | sed -n 's/.*(NEEDED).*\[\(.*\)\]$/\1/p' >needed
+  grep -q '^libstdc++\.so' needed
+  grep -Ev '^lib(stdc\+\+|gcc_s|m|pthread|c)\.so|^ld-linux' needed | none
+}
+
 @test "the module has nothing that runs when it is loaded" {
   sections=$("$READELF" -SW "$MODULE")
   grep -E '\.(init_array|ctors)' <<<"$sections" | none
