@@ -1,7 +1,8 @@
 # The folders of an installation.
 
-# Debian's layout, which the packages need. A device has the layout of its SDK.
-if(CMAKE_LIBRARY_ARCHITECTURE AND NOT CMAKE_SYSROOT)
+# Debian's layout, unless a device's SDK has another.
+if(CMAKE_LIBRARY_ARCHITECTURE AND
+    (NOT CMAKE_SYSROOT OR IS_DIRECTORY "${CMAKE_SYSROOT}/usr/lib/${CMAKE_LIBRARY_ARCHITECTURE}"))
   # Not of the type PATH, which would make a relative name absolute.
   set(CMAKE_INSTALL_LIBDIR "lib/${CMAKE_LIBRARY_ARCHITECTURE}" CACHE STRING
     "Folder of libraries in the prefix")
@@ -18,7 +19,9 @@ set(_folders
   "${CMAKE_INSTALL_DATADIR}/${PROJECT_NAME}"
   "${CMAKE_INSTALL_DATADIR}/bash-completion/completions"
   "${CMAKE_INSTALL_DOCDIR}/html"
+  "${CMAKE_INSTALL_DOCDIR}/examples"
   "${CMAKE_INSTALL_DOCDIR}-workstation"
+  "${CMAKE_INSTALL_MANDIR}/man1"
   "${CMAKE_INSTALL_MANDIR}/man3")
 install(CODE "set(qel_folders \"${_folders}\")" ALL_COMPONENTS)
 install(CODE [[

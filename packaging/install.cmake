@@ -1,4 +1,5 @@
-# What 'cmake --install' installs, and where. Each component is a package of packages.cmake.
+# What 'cmake --install' installs, and where. packaging/debian/rules says which component is in which
+# package.
 
 include(CMakePackageConfigHelpers)
 set(_made "${CMAKE_CURRENT_BINARY_DIR}/packaging")
@@ -6,8 +7,8 @@ set(_headers "${CMAKE_INSTALL_INCLUDEDIR}/${PROJECT_NAME}")
 set(_pkgconfig "${CMAKE_INSTALL_LIBDIR}/pkgconfig")
 set(_cmake_package "${CMAKE_INSTALL_LIBDIR}/cmake/${PROJECT_NAME}")
 
-install(TARGETS qel-message-protosvc
-  LIBRARY COMPONENT runtime NAMELINK_COMPONENT development)
+# With the name that has no number: programs on devices may name it so.
+install(TARGETS qel-message-protosvc LIBRARY COMPONENT runtime)
 
 install(
   FILES proto-lib/qel-message-serialize.h "${PROJECT_BINARY_DIR}/proto-lib/msgspec_frontend.pb.h"
@@ -67,11 +68,17 @@ if(TARGET dlog-standin)
   install(FILES "${QEL_PROTOBUF_PREFIX}/share/doc/protobuf/LICENSE"
     DESTINATION "${CMAKE_INSTALL_DATADIR}/doc/${PROJECT_NAME}-workstation"
     RENAME LICENSE.protobuf COMPONENT workstation OPTIONAL)
-  if(_runtime)
-    install(CODE "
-      if(CMAKE_INSTALL_DO_STRIP) # CMake strips only its own targets
-        file(GLOB runtime \"\$ENV{DESTDIR}\${CMAKE_INSTALL_PREFIX}/${CMAKE_INSTALL_LIBDIR}/libprotobuf.so.9.*\")
-        execute_process(COMMAND \"${CMAKE_STRIP}\" \${runtime} COMMAND_ERROR_IS_FATAL ANY)
-      endif()" COMPONENT workstation)
-  endif()
 endif()
+
+# The example, with the sources alone that a plug-in's author needs.
+file(GLOB _example examples/*.c examples/*.h examples/*.cc)
+install(FILES ${_example} DESTINATION "${CMAKE_INSTALL_DATADIR}/doc/${PROJECT_NAME}/examples"
+  COMPONENT documentation)
+
+# Builds what is installed.
+add_custom_target(packaged DEPENDS qel-message-protosvc contract)
+foreach(_target qel-wire qel-wire-man docs)
+  if(TARGET ${_target})
+    add_dependencies(packaged ${_target})
+  endif()
+endforeach()

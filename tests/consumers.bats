@@ -28,6 +28,40 @@ configure() {
   readelf -dW plugin.so | grep "NEEDED.*\[libqel-message-protosvc\.so\.$FIRST\]"
 }
 
+@test "all that is installed can be read, whatever the umask" {
+  umask 077
+  mkdir private
+  cmake --install "$BUILD" --prefix "$PWD/private/opt/qel"
+  modes=$(find private -mindepth 1 -printf '%M\n' | sort -u | xargs)
+  [ "$modes" = '-rw-r--r-- -rwxr-xr-x drwxr-xr-x lrwxrwxrwx' ] || fail "$modes"
+  [ "$(stat -c %a private)" = 700 ] # a folder that was there stays as it was
+}
+
+@test "the SONAME has the first number, and the library looks for others beside itself alone" {
+  run -0 readelf -dW "$tree/$LIBDIR/libqel-message-protosvc.so"
+  [[ $output == *SONAME*"[libqel-message-protosvc.so.$FIRST]"* ]]
+  [ "$(sed -n 's/.*(R.*PATH).*\[\(.*\)\]/\1/p' <<<"$output")" = "\$ORIGIN" ]
+}
+
+@test "a plug-in in C runs, and reads one header of the tree" {
+  cp -r "$tree" 'a prefix' # users' have a blank, too
+  compile_c "$PWD/a prefix" -o plugin
+  prints 'probe 7, answer of 2 bytes' "$tree" ./plugin
+  # The compiler's and the C library's lie elsewhere.
+  compile_c "$tree" -o plugin -H 2>&1 | sed -n 's/^\.\.* //p' | xargs -d '\n' realpath |
+    grep -v '^/usr/' | diff - <(echo "$tree/include/qel-message-protosvc/qel-message-serialize.h")
+}
+
+@test "a module in C++ runs by the CMake package" {
+  compile_with_cmake "$tree" cxx
+  prints 'probe 7, answer of 2 bytes' "$tree" built/module
+}
+
+@test "a module that uses the classes runs by the CMake package" {
+  compile_with_cmake "$tree" classes
+  prints 'ClientEcho 7' "$tree" built/module
+}
+
 @test "a module that uses the classes compiles by pkg-config" {
   # The runtime in a path with a blank, which its own build leaves as it is.
   ln -s "$PROTOBUF" 'a runtime'

@@ -82,8 +82,8 @@ man_pages_with() {
   grep -A1 'of save_call_log_request_serialize' <<<"$output" | grep -q "parameter 'callId'"
 }
 
-@test "web pages and man pages are installed with the development files" {
-  cmake --install "$BUILD" --prefix "$BATS_TEST_TMPDIR" --component development
+@test "web pages and man pages are installed with the documentation" {
+  cmake --install "$BUILD" --prefix "$BATS_TEST_TMPDIR" --component documentation
   cd "$BATS_TEST_TMPDIR/share"
   [ -s doc/qel-message-protosvc/html/index.html ]
   [ -s doc/qel-message-protosvc/html/doxygen-awesome.css ]

@@ -13,9 +13,9 @@ check_fuzz() {
 }
 
 # armhf tests what is the same whatever registers floating-point numbers are handed over in: calls in
-# threads, messages of no function, the example's programs, and the build with an SDK.
+# threads, messages of no function, and the example's programs.
 check_armel() {
-  for_arm armel run_tests -E '^(Contract\.threads|ReferenceEncoder|examples_tests|device_sdk)'
+  for_arm armel run_tests -E '^(Contract\.threads|ReferenceEncoder|examples_tests)'
 }
 
 check_bench_and_docs() { QEL_DOCS=ON for_bench run_tests -R '^(Bench|reference\.)'; }
@@ -23,6 +23,23 @@ check_bench_and_docs() { QEL_DOCS=ON for_bench run_tests -R '^(Bench|reference\.
 check_threads() {
   setup
   run_tests threads
+}
+
+# The packages for this machine and for the device's ABI, which are tested beside this machine's. ./dev release
+# makes those of armel in the same way.
+check_release() {
+  local preset
+  make_release "$(dpkg --print-architecture)" armhf
+  for preset in release armhf; do
+    QEL_PACKAGES=$root/build/dist QEL_BUILD=$root/build/$preset bats tests/packages.bats
+  done
+  QEL_BUILD=$root/build/armhf bats tests/device_packages.bats
+}
+
+# Those for this machine alone, with the documents: 'bats tests/reproducible.bats' compares all.
+check_reproducible() {
+  is_committed || { say "not compared: there are changes that are not committed" && return; }
+  QEL_ARCHITECTURES=$(dpkg --print-architecture) bats tests/reproducible.bats
 }
 
 check_format() {
@@ -39,7 +56,7 @@ check_demo() {
 
 check_packages() {
   need_packages "${arm_packages[@]}" "${lint_packages[@]}" "${coverage_packages[@]}" \
-    "${fuzz_packages[@]}" "${bench_packages[@]}" "${docs_packages[@]}"
+    "${fuzz_packages[@]}" "${bench_packages[@]}" "${release_packages[@]}" "${release_test_packages[@]}"
 }
 
 # The tests begin first, as a user would run them. What needs nothing that they build is done beside them;
@@ -57,6 +74,9 @@ do_check() {
   stage armhf 'tests runtime-armhf' armhf_tests
   stage sanitizers 'tests packages' run_tests sanitizers
   stage armel 'tests runtime-armel' check_armel
+  stage small armhf small_tests
+  stage release armhf check_release
+  stage reproducible release check_reproducible
   stage fuzz sanitizers check_fuzz
   stage coverage 'demo packages' do_coverage
   stage bench-and-docs coverage check_bench_and_docs # after what else builds the preset release
