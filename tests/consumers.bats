@@ -57,11 +57,6 @@ configure() {
   prints 'probe 7, answer of 2 bytes' "$tree" built/module
 }
 
-@test "a module that uses the classes runs by the CMake package" {
-  compile_with_cmake "$tree" classes
-  prints 'ClientEcho 7' "$tree" built/module
-}
-
 @test "a module that uses the classes compiles by pkg-config" {
   # The runtime in a path with a blank, which its own build leaves as it is.
   ln -s "$PROTOBUF" 'a runtime'
