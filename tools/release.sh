@@ -17,7 +17,7 @@ copy_tree() {
     sed 's/^[0-9a-f]*  //' SHA256SUMS
     seconds=$(dpkg-parsechangelog -l packaging/debian/changelog -S Timestamp)
   fi >"$work/files"
-  tar -c -T "$work/files" | tar -x -C "$1"
+  tar -c --mode=u=rwX,go=rX -T "$work/files" | tar -x -C "$1" # whatever the checkout's umask was
   ! is_committed || changed=''
   packaging/debian_changelog.py "$seconds" $changed >"$1/packaging/debian/changelog"
   (cd "$1" && list_checksums)
