@@ -3,10 +3,10 @@
 
 usage: report.py BUILD [ARM_BUILD...] [--small FOLDER] [--rounds N] [--to FOLDER]
 
-BUILD is the folder of the preset release, ARM_BUILD those of the presets for ARM, and --small that of the
-preset small, whose library the first of these runs too. In each round all
-programs run each case in turn, so that a disturbance of the machine slows them all. Times are
-medians of the rounds, ratios the medians of the rounds' ratios.
+BUILD is the folder of the preset release, ARM_BUILD those of the presets for ARM, and --small that of
+the preset small, whose library the first of these runs too. In each round all programs run each case
+in turn, so that a disturbance of the machine slows them all. Times are medians of the rounds, ratios
+the medians of the rounds' ratios.
 """
 
 import argparse

@@ -70,7 +70,7 @@ if(TARGET dlog-standin)
     RENAME LICENSE.protobuf COMPONENT workstation OPTIONAL)
 endif()
 
-# The example, with the sources alone that a plug-in's author needs.
+# The example's sources, without what builds them in this tree.
 file(GLOB _example examples/*.c examples/*.h examples/*.cc)
 install(FILES ${_example} DESTINATION "${CMAKE_INSTALL_DATADIR}/doc/${PROJECT_NAME}/examples"
   COMPONENT documentation)

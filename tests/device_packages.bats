@@ -21,7 +21,7 @@ setup_file() {
     -Wl,-soname,libdlog.so.0 -o "$sysroot/usr/lib/libdlog.so.0"
   ln -s libdlog.so.0 "$sysroot/usr/lib/libdlog.so"
   CC=$sdk/bin/device-gcc CXX=$sdk/bin/device-g++ CMAKE_SYSROOT=$sysroot QEL_PROTOBUF_ROOT=$sysroot/usr \
-    QEL_DLOG_LIBRARY=$sysroot/usr/lib/libdlog.so "$SOURCE/dev" package "$ARCHITECTURE"
+    QEL_DLOG_LIBRARY=$sysroot/usr/lib/libdlog.so QEL_DLOG_PACKAGE=device-log "$SOURCE/dev" package "$ARCHITECTURE"
   # As README.md builds by hand.
   cmake -S "$SOURCE" --preset "$ARCHITECTURE" -B "$sdk/configured" -DCMAKE_SYSROOT="$sysroot" \
     -DCMAKE_C_COMPILER="$sdk/bin/device-gcc" -DCMAKE_CXX_COMPILER="$sdk/bin/device-g++" \
@@ -34,7 +34,7 @@ setup_file() {
 
 @test "the library's package needs the device's own and nothing of ours" {
   dpkg-deb -f "$library"_*.deb Depends >needed
-  diff needed - <<<'libc6 (>= 2.36), libgcc-s1 (>= 3.5), libstdc++6, libdlog, libprotobuf9 (>= 2.6.1)'
+  diff needed - <<<'libc6 (>= 2.36), libgcc-s1 (>= 3.5), libstdc++6, device-log, libprotobuf9 (>= 2.6.1)'
   printf '%s\n' "$made"/* | grep -E 'emulator|workstation|qel-wire' | none
 }
 

@@ -20,12 +20,24 @@ in_document() {
   archive=("$SOURCE"/.deps/protobuf2_*.orig.tar.gz)
   [ -e "${archive[0]}" ] || skip 'another runtime is used'
   read -r sum _ < <(sha256sum "${archive[0]}")
-  for names in "spdx d['packages'] versionInfo d['checksums'][0]['checksumValue']" \
-    "cdx d['components'] version d['hashes'][0]['content']"; do
-    read -r form list version hash <<<"$names"
-    [ "$(in_document "$form" "*((d['name'], d['$version'], ${hash}) for d in $list \
-      if d['name'] == 'Protocol Buffers')")" = "('Protocol Buffers', '2.6.1', '$sum')" ]
+  for names in "spdx d['packages'] d['checksums'][0]['checksumValue']" \
+    "cdx d['components'] d['hashes'][0]['content']"; do
+    read -r form list hash <<<"$names"
+    in_document "$form" "*((${hash}, d) for d in $list if d['name'] == 'Protocol Buffers')" >named
+    grep "('$sum', .*'2[.]6[.]1'.*'pkg:github/protocolbuffers/protobuf@v2[.]6[.]1'" named
+    grep "'cpe:2[.]3:a:google:protobuf:2[.]6[.]1:" named
   done
+}
+
+@test "Debian's changelog tells a release from what comes before and after it" {
+  mkdir -p packaging/debian
+  cp "$SOURCE/packaging/debian_changelog.py" packaging
+  cp "$SOURCE/packaging/debian/control" packaging/debian
+  while read -r version entry expected; do
+    printf '%s\n' "  VERSION $version" >CMakeLists.txt
+    printf '%s\n' '## [Unreleased]' "$entry new" '## [1.2.0] - 2030-01-02' '- `first`' >CHANGELOG.md
+    [ "$(packaging/debian_changelog.py 1900000000 | dpkg-parsechangelog -l - -S Version)" = "$expected" ]
+  done <<<$'1.2.0 not 1.2.0-1\n1.2.0 - 1.2.0+203003171746-1\n2.0.0 - 2.0.0~203003171746-1'
 }
 
 @test "every weakness that SECURITY.md names is in the OpenVEX document, with its status" {

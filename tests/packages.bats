@@ -34,13 +34,8 @@ make_root() {
   local name architecture
   for name in libc6 libgcc-s1 libstdc++6 libnettle8; do
     for architecture in $(printf '%s\n' "$native" "$ARCHITECTURE" | sort -u); do
-      dpkg-query -W -f="Package: $name
-Status: install ok installed
-Maintainer: nobody
-Multi-Arch: same
-Architecture: $architecture
-Version: \${Version}
-Description: \${binary:Summary}\n\n" "$name"
+      dpkg-query -W -f="Package: $name\nArchitecture: $architecture\nMulti-Arch: same\nMaintainer: nobody
+Status: install ok installed\nVersion: \${Version}\nDescription: \${binary:Summary}\n\n" "$name"
     done
   done >"$root/var/lib/dpkg/status"
 }
@@ -100,6 +95,10 @@ compile() {
 
 @test "the library's package needs its runtime, where that is another one" {
   [ -n "$TOOLCHAIN" ] || dpkg-deb -f "$(deb "${runtime[0]}")" Depends | grep -q 'protosvc-workstation (>= '
+}
+
+@test "the package of symbols tells since when there is a function" {
+  [ -n "$TOOLCHAIN" ] || dpkg-deb -I "$(deb "${runtime[0]}")" symbols | grep -x ' client_echo_deserialize@Base 1.0.0'
 }
 
 @test "a package for ARM without the device's log service is for an emulator, and says so" {

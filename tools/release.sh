@@ -45,7 +45,7 @@ make_source() {
   SOURCE_DATE_EPOCH=$(release_says Timestamp)
   export SOURCE_DATE_EPOCH
   tar -c -C "$work/source" --transform="s|^[.]|$name|" --sort=name --format=gnu \
-    --mtime="@$SOURCE_DATE_EPOCH" --owner=0 --group=0 --numeric-owner --mode=u=rwX,go=rX . |
+    --mtime="@$SOURCE_DATE_EPOCH" --owner=0 --group=0 --numeric-owner . |
     gzip -9n >"$work/qel-message-protosvc_$version.orig.tar.gz"
   cp -r "$work/source/packaging/debian" "$work/source/debian"
   (cd "$work" && dpkg-source -b source)
