@@ -66,6 +66,13 @@ def instructions_are_within_the_thresholds():
                f"{case}: {ours:.0f} instructions, more than {threshold} of {listed['baseline']:.0f}")
 
 
+def instructions_through_the_header_are_within_the_threshold():
+    for case in published_instructions():
+        ours, header = (build.instructions(program, case) for program in ("ours", "message"))
+        expect(header <= measure.HEADER_THRESHOLD * ours,
+               f"{case}: {header:.0f} instructions through qel-message.h, {ours:.0f} without it")
+
+
 def blocks_are_those_published():
     results = published_results()
     for case, listed in results["blocks"].items():
@@ -100,6 +107,8 @@ CASES = {
     "blocks_are_those_published": blocks_are_those_published,
     "instructions_are_those_published": instructions_are_those_published,
     "instructions_are_within_the_thresholds": instructions_are_within_the_thresholds,
+    "instructions_through_the_header_are_within_the_threshold":
+        instructions_through_the_header_are_within_the_threshold,
 }
 
 CASES[sys.argv[1]]()

@@ -1,6 +1,5 @@
 /*
- * The lists that the library hands out, and the baseline in the same form. Each function adds the
- * list to the digest, unless that is NULL, and releases the list.
+ * The lists that the library hands out, and the baseline in the same form.
  */
 #ifndef BENCH_RECORDS_H
 #define BENCH_RECORDS_H
@@ -12,6 +11,14 @@
 extern "C" {
 #endif
 
+/* Each adds the list to the digest. */
+void digest_processed(const int64_t* ids, const int64_t* times, int count, struct digest* digest);
+void digest_messages(qel_message_inboxentry_t* const* messages, int count, struct digest* digest);
+void digest_watermarks(qel_message_watermarkentry_t* const* marks, int count,
+                       struct digest* digest);
+void digest_members(qel_message_chatroommember_t* const* members, int count, struct digest* digest);
+
+/* The same, unless the digest is NULL; then each releases the list. */
 void finish_processed(int64_t* ids, int64_t* times, int count, struct digest* digest);
 void finish_messages(qel_message_inboxentry_t** messages, int count, struct digest* digest);
 void finish_watermarks(qel_message_watermarkentry_t** marks, int count, struct digest* digest);

@@ -192,7 +192,7 @@ def measure_all(build, arm_builds, rounds):
                           if program != "by_hand" or case in BY_HAND} for case in measure.CASES},
         "allocations": {case: build.blocks("ours", case, 1)[0] for case in measure.GROWTH},
         "instructions": {each.name: {case: {program: round(each.instructions(program, case))
-                                                   for program in ("ours", "baseline")}
+                                                   for program in ("ours", "message", "baseline")}
                                             for case in measure.CASES} for each in builds},
     }
 
@@ -251,6 +251,9 @@ def thresholds(results):
             if preset in ("armhf", "armel"):
                 yield Threshold(f"{CASE_NAMES[case]}: instructions on {PRESETS[preset]}, ratio",
                                 counted["ours"] / counted["baseline"], threshold, is_ratio=True)
+                yield Threshold(
+                    f"{CASE_NAMES[case]}: instructions on {PRESETS[preset]} through qel-message.h, ratio",
+                    counted["message"] / counted["ours"], measure.HEADER_THRESHOLD, is_ratio=True)
     for name, threshold in LOADING_RATIOS.items():
         yield Threshold(f"loading {name}, ratio", results["loading"][name]["ratio"], threshold,
                         is_ratio=True)
@@ -277,14 +280,18 @@ def time_table(results):
 
 
 def count_tables(results):
-    def ratio(preset, case):
-        counted = results["instructions"][preset][case]
-        return f"{counted['ours']:,} ({counted['ours'] / counted['baseline']:.3f})"
-
     presets = {preset: name for preset, name in PRESETS.items() if preset in results["instructions"]}
+
+    def instructions(program, to):
+        for case in measure.CASES:
+            counts = [results["instructions"][preset][case] for preset in presets]
+            yield [CASE_NAMES[case],
+                   *(f"{counted[program]:,} ({counted[program] / counted[to]:.3f})" for counted in counts)]
+
     yield table(["instructions a call (ratio to the generated classes)", *presets.values()],
-                [[CASE_NAMES[case], *(ratio(preset, case) for preset in presets)]
-                 for case in measure.CASES])
+                instructions("ours", "baseline"))
+    yield table(["through qel-message.h (ratio to the plain call)", *presets.values()],
+                instructions("message", "ours"))
     yield table(["blocks allocated a call", *NAMES.values(), "kept by this library"],
                 [[CASE_NAMES[case], *(f"{blocks[program][0]:,}" if program in blocks else ""
                                       for program in NAMES), f"{blocks['ours'][1]}"]

@@ -1,5 +1,5 @@
 #!/usr/bin/env python3
-"""Prints a Markdown page or the header in the form that Doxygen needs.
+"""Prints a Markdown page or a header in the form that Doxygen needs.
 
 usage: doxygen_filter.py FILE
 
@@ -7,8 +7,9 @@ In a page, Mermaid's sequence diagrams become PlantUML's; only the lines of part
 Headings get names, to which links then lead, and names of functions become links. A link to a file
 that is not in the reference becomes plain text.
 
-In the header, two paragraphs are added to each function: what its caller frees, from the table of
-docs/interface.md, and "see also" with the other functions of its section.
+In a header, "see also" is added to each function, with the other functions of its section. To those
+of qel-message-serialize.h, what the caller frees is added, from the table of docs/interface.md; to
+those of qel-message.h, the arguments, from the functions that they stand on.
 """
 
 import collections
@@ -16,6 +17,8 @@ import os
 import re
 import sys
 
+FUNCTIONS = "proto-lib/qel-message-serialize.h"
+RECORDS = "proto-lib/qel-message.h"
 IMAGE_OR_LINK = re.compile(r"(!?)\[((?:[^][]|\[[^][]*\])*)\]\(([^()\s]+)\)")
 
 
@@ -33,10 +36,10 @@ def name_of(page, anchor=""):
 
 
 def sources():
-    """The sources in the reference: the header, and the examples."""
+    """The sources in the reference: the headers, and the examples."""
     with open("docs/examples.dox", encoding="utf-8") as file:
         examples = re.findall(r"@example (\S+)", file.read())
-    return ["proto-lib/qel-message-serialize.h"] + [f"examples/{name}" for name in examples]
+    return [RECORDS, FUNCTIONS] + [f"examples/{name}" for name in examples]
 
 
 def link(match, page):
@@ -82,26 +85,58 @@ def owners():
     return {row[0].strip("`"): row[column] for row in rows[1:]}
 
 
-def header(text, name):
-    frees = owners()
+def described(comment):
+    """The comment's words about each argument, by the names of the arguments."""
+    words = " ".join(comment.replace("\n *", "\n").split())
+    return dict(re.findall(r"@param (\S+) (.*?) *(?=@|$)", words))
+
+
+def about_function(function, _comment, _names):
+    frees = owners()[function]
+    return f"@par Who frees what @newline The caller frees {frees}. What holds for all functions is in", []
+
+
+def about_record(function, comment, names):
+    """The arguments of a function of qel-message.h, in the words of the function that it stands on
+    unless its own comment has others. Also says which function that is."""
+    stem, _, kind = function.partition("qel_")[2].rpartition("_")
+    below = {"write": [f"{stem}_serialize"], "read": [f"{stem}_deserialize"]}.get(kind, [])
+    words = {"number": "any number",
+             names[0]: {"release": "what to release"}.get(kind, "receives the message; begins zeroed"),
+             "data,size": "the received bytes"}
+    if kind == "write":
+        with open(FUNCTIONS, encoding="utf-8") as file:
+            match = re.search(rf"/\*\*((?:(?!\*/).)*)\*/\n(?:int|void) {below[0]}\(", file.read(), re.DOTALL)
+        words.update(described(match[1]))
+    told = [f"@param {name} {text}" for name, text in words.items()
+            if set(name.split(",")) <= set(names) and name not in described(comment)]
+    if kind != "release":
+        told.append("@return " + ("QEL_OK, or why there is no message" if below else "whether it is"))
+    return " @newline ".join([*told, "@par What holds for all @newline It is in"]), below
+
+
+def header(text, name, about):
+    """The header with what is known about each function, in one line, so that line numbers stay the
+    same."""
+    text = re.sub(r"^(QEL_MUST_USE )?static inline ", "", text, flags=re.MULTILINE)
+    text = re.sub(r"/\*\* @cond \*/.*?/\*\* @endcond \*/", lambda match: "\n" * match[0].count("\n"), text, flags=re.DOTALL)
 
     def section(match):
-        functions = re.findall(r"^(?:int|void) (\w+)\(", match[0], flags=re.MULTILINE)
+        functions = re.findall(r"^\w+ (\w+)\(", match[0], flags=re.MULTILINE)
 
         def end_of_comment(match):
-            others = [function for function in functions if function != match[1]]
-            # All in one line, so that line numbers stay the same.
+            comment, declared, function, names = match.groups()
+            told, below = about(function, comment, re.findall(r"(\w+)(?=,|$)", names))
+            others = below + [other for other in functions if other != function] + [name]
             return (
-                f" * @par Who frees what @newline The caller frees {frees[match[1]]}."
-                f" What holds for all functions is in {name}."
-                f" @newline @see {', '.join(others + [name])} */\n"
+                f"/**{comment.rstrip(' ')}{'' if comment.endswith(chr(10)) else ' @newline'}"
+                f" {told} {name}. @newline @see {', '.join(others)} */{declared}"
             )
 
-        return re.sub(
-            r"^ \*/\n(?=(?:int|void) (\w+)\()", end_of_comment, match[0], flags=re.MULTILINE
-        )
+        return re.sub(r"/\*\*((?:(?!\*/).)*)\*/(\n\w+ (\w+)\(([^)]*)\))", end_of_comment, match[0],
+                      flags=re.DOTALL)
 
-    return re.sub(r"@defgroup.*?@}", section, text, flags=re.DOTALL)
+    return re.sub(r"@(?:defgroup|addtogroup).*?@}", section, text, flags=re.DOTALL)
 
 
 def page(text, name):
@@ -121,7 +156,8 @@ def main(path):
     if path.endswith(".md") or not os.path.exists(path):  # then Doxygen complains of its name
         sys.stdout.write(page(text, path))
     else:
-        sys.stdout.write(header(text, os.path.basename(path)))
+        about = about_record if path == RECORDS else about_function
+        sys.stdout.write(header(text, os.path.basename(path), about))
 
 
 main(os.path.relpath(sys.argv[1]))

@@ -11,7 +11,12 @@ import pathlib
 import re
 import sys
 
-INCLUDE = ".nf\n.B #include <qel\\-message\\-serialize.h>\n.fi\n"
+
+def include(name):
+    """The line that brings what has this name."""
+    below = name.endswith("serialize") or name.startswith("qel_message_")
+    header = "qel\\-message\\-serialize.h" if below else "qel\\-message.h"
+    return f".nf\n.B #include <{header}>\n.fi\n"
 
 
 def description(body):
@@ -26,7 +31,7 @@ def description(body):
         flags=re.S,
     )
     body = re.sub(
-        r"\\fB([\w-]+(_serialize|_deserialize|\\&\.h)\\fP)",
+        r"\\fB([\w-]+(_serialize|_deserialize|_read|_write|_release|\\&\.h)\\fP)",
         lambda match: match[0].replace("-", r"\-") + "(3)",
         body,
     )
@@ -36,16 +41,16 @@ def description(body):
 def functions(page):
     """Name and page of each function on a section's page."""
     version, project = re.match(r'\.TH ".*?" 3 ".*?" "Version (.*?)" "(.*?)"', page).groups()
-    blocks = re.split(r'^\.SS "\w+ (\w+) .*"\n', page, flags=re.M)
+    blocks = re.split(r'^\.SS "(?:\\fB)?\w+(?:\\fP)? (\w+) .*"\n', page, flags=re.M)
     for name, body in zip(blocks[1::2], blocks[2::2]):
         result, arguments, brief = re.search(
-            rf'^\.RI "(\w+) \\fB{name}\\fP \((.*)\)"\n\.br\n\.RI "(.*?)(?:\\&\.)? "', page, re.M
+            rf'^\.RI "(?:\\fB)?(\w+)(?:\\fP)? \\fB{name}\\fP \((.*)\)"\n\.br\n\.RI "(.*?)(?:\\&\.)? "', page, re.M
         ).groups()
         arguments = arguments.replace(" ", r"\ ").replace(r",\ ", ", ")  # break at commas only
         yield name, (
             f'.TH "{name}" 3 "" "{project} {version}" " "\n.ad l\n.nh\n'
             f".SH NAME\n{name} \\- {brief}\n"
-            f".SH SYNOPSIS\n{INCLUDE}.HP\n{result} \\fB{name}\\fP({arguments});\n"
+            f".SH SYNOPSIS\n{include(name)}.HP\n{result} \\fB{name}\\fP({arguments});\n"
             f".SH DESCRIPTION\n{description(body)}"
         )
 
@@ -58,7 +63,7 @@ def main(source, target):
             for name, text in functions(page):
                 (target / f"{name}.3").write_text(text, encoding="utf-8")
         else:
-            page = page.replace(".SH SYNOPSIS\n.br\n.PP\n.SH", f".SH SYNOPSIS\n{INCLUDE}.SH")
+            page = page.replace(".SH SYNOPSIS\n.br\n.PP\n.SH", f".SH SYNOPSIS\n{include(path.stem)}.SH")
             (target / path.name).write_text(page, encoding="utf-8")
 
 

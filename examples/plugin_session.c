@@ -28,56 +28,32 @@ enum { SESSION_SECONDS = 60 };
 /* One byte more than the library sends. */
 enum { TOO_LONG = 40001 };
 
-/* Values of the schema's enumerations. */
-enum { CHAT_TYPE_GROUP = 1, MSG_TYPE_TEXT = 0, CONTENT_TYPE_TEXT = 0 };
-
 /* ---- The connection */
 
 static int authenticate(session_t* session, const char* access_token) {
-  unsigned char* message = NULL;
-  int size = 0;
-  frame_t reply;
-  int64_t request_id = NOT_WRITTEN;
-  int code = NOT_WRITTEN;
-  char* text = NULL;
-  int status = channel_auth_request_serialize(++session->last_request_id, 5001, 77,
-                                              "org.example.chat", access_token, &message, &size);
-
-  if (send_message(session, "ChannelAuthRequest", status, message, size) != 0 ||
-      await_message(session, "ChannelAuthReply", &reply) != 0) {
+  if (exchange(session, "ChannelAuthRequest",
+               qel_channel_auth_request_write(&session->message, ++session->last_request_id, 5001,
+                                              77, "org.example.chat", access_token),
+               "ChannelAuthReply") != 0) {
     return -1;
   }
-  channel_auth_reply_deserialize(reply.message, reply.size, &request_id, &code, &text);
-  free(reply.message);
-  status = check_result(session, "channel authentication", request_id, code, text, RESULT_OK);
-  free(text);
-  return status;
+  return take_result(session, "channel authentication", qel_channel_auth_reply_read);
 }
 
 static int read_clock(session_t* session) {
-  unsigned char* message = NULL;
-  int size = 0;
-  frame_t reply;
-  int64_t request_id = NOT_WRITTEN;
-  int64_t now_millis = NOT_WRITTEN;
-  int code = NOT_WRITTEN;
-  char* text = NULL;
+  QEL_SCOPED(current_time, now);
+  const frame_t* frame = &session->received;
   char printed[32] = "unknown";
-  int status = current_time_request_serialize(++session->last_request_id, &message, &size);
 
-  if (send_message(session, "CurrentTimeRequest", status, message, size) != 0 ||
-      await_message(session, "CurrentTimeReply", &reply) != 0) {
+  if (exchange(session, "CurrentTimeRequest",
+               qel_current_time_request_write(&session->message, ++session->last_request_id),
+               "CurrentTimeReply") != 0 ||
+      check_reply(session, "current time", qel_current_time_read(&now, frame->message, frame->size),
+                  &now.reply, RESULT_OK) != 0) {
     return -1;
   }
-  current_time_deserialize(reply.message, reply.size, &request_id, &now_millis, &code, &text);
-  free(reply.message);
-  status = check_result(session, "current time", request_id, code, text, RESULT_OK);
-  free(text);
-  if (status != 0) {
-    return -1;
-  }
-  if (now_millis >= 0) {
-    time_t seconds = (time_t)(now_millis / 1000);
+  if (now.currentTimeMillis >= 0) {
+    time_t seconds = (time_t)(now.currentTimeMillis / 1000);
     struct tm utc;
     strftime(printed, sizeof printed, "%Y-%m-%d %H:%M:%S UTC", gmtime_r(&seconds, &utc));
   }
@@ -105,261 +81,157 @@ static void print_violations(const qel_message_didviolationuser_t* pairs, int co
 /* Some of the receivers may be refused: the reply lists them, one list for each reason. */
 static int create_chatroom(session_t* session, const char* title, int64_t* chatroom) {
   static const int64_t receivers[] = {6001, 6002, 6003, 6004, 6005, 999};
-  unsigned char* message = NULL;
-  int size = 0;
-  frame_t reply;
-  int64_t request_id = NOT_WRITTEN;
-  int lifetime = NOT_WRITTEN;
-  int code = NOT_WRITTEN;
-  char* text = NULL;
-  int64_t *invalid = NULL, *disabled = NULL, *denied = NULL;
-  int invalid_count = 0, disabled_count = 0, violation_count = 0, denied_count = 0;
-  qel_message_didviolationuser_t* violations = NULL;
-  int status = create_chatroom_request_serialize(
-      ++session->last_request_id, CHAT_TYPE_GROUP, receivers,
-      (int)(sizeof receivers / sizeof receivers[0]), title, &message, &size);
+  QEL_SCOPED(create_chatroom_reply, created);
+  const frame_t* frame = &session->received;
 
-  if (send_message(session, "CreateChatroomRequest", status, message, size) != 0 ||
-      await_message(session, "CreateChatroomReply", &reply) != 0) {
+  if (exchange(session, "CreateChatroomRequest",
+               qel_create_chatroom_request_write(
+                   &session->message, ++session->last_request_id, QEL_CHAT_TYPE_GROUP, receivers,
+                   (int)(sizeof receivers / sizeof receivers[0]), title),
+               "CreateChatroomReply") != 0 ||
+      check_reply(session, "chatroom",
+                  qel_create_chatroom_reply_read(&created, frame->message, frame->size),
+                  &created.reply, QEL_RESULT_REFUSED_1001) != 0) {
     return -1;
   }
-  create_chatroom_reply_deserialize(reply.message, reply.size, &request_id, chatroom, &lifetime,
-                                    &code, &text, &invalid, &invalid_count, &disabled,
-                                    &disabled_count, &violations, &violation_count, &denied,
-                                    &denied_count);
-  free(reply.message);
-  status = check_result(session, "chatroom", request_id, code, text, RESULT_SOME_REFUSED);
-  print_users("no such user", invalid, invalid_count);
-  print_users("disabled", disabled, disabled_count);
-  print_violations(violations, violation_count);
-  print_users("invitations denied", denied, denied_count);
-  free(text);
-  free(invalid);
-  free(disabled);
-  free(violations);
-  free(denied);
-  if (status == 0) {
-    printf("plug-in: chatroom %lld created, its messages live %d\n", (long long)*chatroom,
-           lifetime);
-  }
-  return status;
+  print_users("no such user", created.invalidReceivers, created.invalidReceiversCount);
+  print_users("disabled", created.disabledReceivers, created.disabledReceiversCount);
+  print_violations(created.didViolationUsers, created.didViolationUsersCount);
+  print_users("invitations denied", created.invitationDenied, created.invitationDeniedCount);
+  *chatroom = created.reply.chatroomId;
+  printf("plug-in: chatroom %lld created, its messages live %d\n", (long long)*chatroom,
+         created.msgTtl);
+  return 0;
 }
 
-/* Prints and releases one list of marks. */
-static void take_marks(const char* what, qel_message_watermarkentry_t** marks, int count) {
+static void print_marks(const char* what, qel_message_watermarkentry_t* const* marks, int count) {
   int i;
   for (i = 0; i < count; ++i) {
     printf("plug-in:   user %lld has %s message %lld\n", (long long)marks[i]->userId, what,
            (long long)marks[i]->msgId);
-    free(marks[i]);
   }
-  free(marks);
 }
 
 static int enter_chatroom(session_t* session, int64_t chatroom) {
   const bool auto_allow = true;
   const int entries = 100;
-  unsigned char* message = NULL;
-  int size = 0;
-  frame_t reply;
-  int64_t request_id = NOT_WRITTEN;
-  int64_t replied_chatroom = NOT_WRITTEN;
-  int code = NOT_WRITTEN;
-  char* text = NULL;
-  qel_message_watermarkentry_t **deliveries = NULL, **reads = NULL;
-  qel_message_chatroommember_t** members = NULL;
-  int delivery_count = 0, read_count = 0, member_count = 0;
-  int64_t last_delivery = 0, last_read = 0;
-  char* title = NULL;
-  int lifetime = NOT_WRITTEN;
+  QEL_SCOPED(allow_chat_reply, room);
+  const frame_t* frame = &session->received;
   int i;
-  int status = allow_chat_request_serialize(++session->last_request_id, chatroom, &auto_allow,
-                                            entries, true, 0, true, 0, true, true, &message, &size);
 
-  if (send_message(session, "AllowChatRequest", status, message, size) != 0 ||
-      await_message(session, "AllowChatReply", &reply) != 0) {
+  if (exchange(session, "AllowChatRequest",
+               qel_allow_chat_request_write(&session->message, ++session->last_request_id, chatroom,
+                                            &auto_allow, entries, true, 0, true, 0, true, true),
+               "AllowChatReply") != 0 ||
+      check_reply(session, "entry", qel_allow_chat_reply_read(&room, frame->message, frame->size),
+                  &room.reply, RESULT_OK) != 0) {
     return -1;
   }
-  allow_chat_reply_deserialize(reply.message, reply.size, &request_id, &replied_chatroom, &code,
-                               &text, &deliveries, &delivery_count, &last_delivery, &reads,
-                               &read_count, &last_read, &members, &member_count, &title, &lifetime);
-  free(reply.message);
-  status = check_result(session, "entry", request_id, code, text, RESULT_OK);
-  if (status == 0) {
-    printf("plug-in: chatroom %lld is \"%s\", its messages live %d\n", (long long)replied_chatroom,
-           title != NULL ? title : "", lifetime);
+  printf("plug-in: chatroom %lld is \"%s\", its messages live %d\n",
+         (long long)room.reply.chatroomId, room.title != NULL ? room.title : "", room.msgTtl);
+  for (i = 0; i < room.memberCount; ++i) {
+    printf("plug-in:   member %lld, %s, %s\n", (long long)room.members[i]->userId,
+           room.members[i]->name, room.members[i]->available != 0 ? "available" : "not available");
   }
-  for (i = 0; i < member_count; ++i) {
-    printf("plug-in:   member %lld, %s, %s\n", (long long)members[i]->userId, members[i]->name,
-           members[i]->available != 0 ? "available" : "not available");
-    free(members[i]->name);
-    free(members[i]);
-  }
-  free(members);
-  take_marks("received", deliveries, delivery_count);
-  take_marks("read", reads, read_count);
-  free(text);
-  free(title);
-  return status;
+  print_marks("received", room.deliveryAckEntries, room.deliveryAckCount);
+  print_marks("read", room.readAckEntries, room.readAckCount);
+  return 0;
 }
 
 /* Changes the title or the lifetime: the one that is not NULL. */
 static int change_chatroom(session_t* session, int64_t chatroom, const char* title,
                            const int* lifetime) {
-  unsigned char* message = NULL;
-  int size = 0;
-  frame_t reply;
-  int64_t request_id = NOT_WRITTEN;
-  int64_t replied_chatroom = NOT_WRITTEN;
-  int code = NOT_WRITTEN;
-  char* text = NULL;
-  int status = change_chatroom_meta_request_serialize(++session->last_request_id, chatroom, title,
-                                                      lifetime, &message, &size);
-
-  if (send_message(session, "ChangeChatroomMetaRequest", status, message, size) != 0 ||
-      await_message(session, "ChangeChatroomMetaReply", &reply) != 0) {
+  if (exchange(session, "ChangeChatroomMetaRequest",
+               qel_change_chatroom_meta_request_write(&session->message, ++session->last_request_id,
+                                                      chatroom, title, lifetime),
+               "ChangeChatroomMetaReply") != 0) {
     return -1;
   }
-  change_chatroom_meta_reply_deserialize(reply.message, reply.size, &request_id, &replied_chatroom,
-                                         &code, &text);
-  free(reply.message);
-  status = check_result(session, title != NULL ? "title" : "lifetime", request_id, code, text,
-                        RESULT_OK);
-  free(text);
-  return status;
+  return take_result(session, title != NULL ? "title" : "lifetime",
+                     qel_change_chatroom_meta_reply_read);
 }
 
 /* As with a new chatroom, some may be refused, for two more reasons. */
 static int invite(session_t* session, int64_t chatroom) {
   static const int64_t members[] = {6001, 6003, 6004, 6005, 6006, 6007, 999};
-  const int member_count = (int)(sizeof members / sizeof members[0]);
-  unsigned char* message = NULL;
-  int size = 0;
-  frame_t reply;
-  int64_t request_id = NOT_WRITTEN;
-  int64_t replied_chatroom = NOT_WRITTEN;
-  int64_t sent_time = NOT_WRITTEN;
-  int code = NOT_WRITTEN;
-  char* text = NULL;
-  int64_t *invalid = NULL, *interrupted = NULL, *disabled = NULL, *existing = NULL, *denied = NULL;
-  int invalid_count = 0, interrupted_count = 0, disabled_count = 0, existing_count = 0;
-  int violation_count = 0, denied_count = 0;
-  qel_message_didviolationuser_t* violations = NULL;
-  int status = invite_chat_request_serialize(++session->last_request_id, chatroom, members,
-                                             &member_count, &message, &size);
+  QEL_SCOPED(invite_reply, invited);
+  const frame_t* frame = &session->received;
 
-  if (send_message(session, "InviteRequest", status, message, size) != 0 ||
-      await_message(session, "InviteReply", &reply) != 0) {
+  if (exchange(
+          session, "InviteRequest",
+          qel_invite_chat_request_write(&session->message, ++session->last_request_id, chatroom,
+                                        members, (int)(sizeof members / sizeof members[0])),
+          "InviteReply") != 0 ||
+      check_reply(session, "invitation",
+                  qel_invite_reply_read(&invited, frame->message, frame->size), &invited.reply,
+                  QEL_RESULT_REFUSED_3003) != 0) {
     return -1;
   }
-  invite_reply_deserialize(reply.message, reply.size, &request_id, &replied_chatroom, &sent_time,
-                           &code, &text, &invalid, &invalid_count, &interrupted, &interrupted_count,
-                           &disabled, &disabled_count, &existing, &existing_count, &violations,
-                           &violation_count, &denied, &denied_count);
-  free(reply.message);
-  status = check_result(session, "invitation", request_id, code, text, RESULT_SOME_NOT_INVITED);
-  print_users("no such user", invalid, invalid_count);
-  print_users("interrupted", interrupted, interrupted_count);
-  print_users("disabled", disabled, disabled_count);
-  print_users("already a member", existing, existing_count);
-  print_violations(violations, violation_count);
-  print_users("invitations denied", denied, denied_count);
-  free(text);
-  free(invalid);
-  free(interrupted);
-  free(disabled);
-  free(existing);
-  free(violations);
-  free(denied);
-  return status;
+  print_users("no such user", invited.invalidReceivers, invited.invalidReceiversCount);
+  print_users("interrupted", invited.interruptedReceivers, invited.interruptedReceiversCount);
+  print_users("disabled", invited.disabledReceivers, invited.disabledReceiversCount);
+  print_users("already a member", invited.existingChatmembers, invited.existingChatmembersCount);
+  print_violations(invited.didViolationUsers, invited.didViolationUsersCount);
+  print_users("invitations denied", invited.invitationDenied, invited.invitationDeniedCount);
+  return 0;
 }
 
 static int end_chats(session_t* session, int64_t chatroom) {
-  qel_message_endchatentry_t entries[2];
-  unsigned char* message = NULL;
-  int size = 0;
-  frame_t reply;
-  int64_t request_id = NOT_WRITTEN;
-  int code = NOT_WRITTEN;
-  char* text = NULL;
-  int status;
-
-  entries[0].chatroomId = chatroom;
-  entries[0].denyInvitation = false;
-  entries[1].chatroomId = 41; /* of an earlier day */
-  entries[1].denyInvitation = true;
-  status = end_chat_request_serialize(++session->last_request_id, entries, 2, &message, &size);
-  if (send_message(session, "EndChatRequest", status, message, size) != 0 ||
-      await_message(session, "EndChatReply", &reply) != 0) {
+  const qel_message_endchatentry_t entries[] = {
+      {.chatroomId = chatroom, .denyInvitation = false},
+      {.chatroomId = 41, .denyInvitation = true}, /* of an earlier day */
+  };
+  if (exchange(
+          session, "EndChatRequest",
+          qel_end_chat_request_write(&session->message, ++session->last_request_id, entries, 2),
+          "EndChatReply") != 0) {
     return -1;
   }
-  end_chat_reply_deserialize(reply.message, reply.size, &request_id, &code, &text);
-  free(reply.message);
-  status = check_result(session, "end of chats", request_id, code, text, RESULT_OK);
-  free(text);
-  return status;
+  return take_result(session, "end of chats", qel_end_chat_reply_read);
 }
 
 /* ---- Messages */
 
 static int send_chat_message(session_t* session, int64_t chatroom, int64_t message_id,
-                             const char* text_to_send) {
+                             const char* text) {
   const int lifetime = 0;
-  unsigned char* message = NULL;
-  int size = 0;
-  frame_t reply;
-  int64_t request_id = NOT_WRITTEN;
-  int64_t replied_chatroom = NOT_WRITTEN;
-  int code = NOT_WRITTEN;
-  char* text = NULL;
-  int count = 0;
-  int64_t* ids = NULL;
-  int64_t* times = NULL;
-  int confirmed = 0;
+  QEL_SCOPED(chat_reply, chat);
+  const frame_t* frame = &session->received;
+  bool is_confirmed = false;
   int i;
-  int status = chat_request_serialize(++session->last_request_id, chatroom, message_id,
-                                      MSG_TYPE_TEXT, text_to_send, lifetime, 0, &message, &size);
 
-  if (send_message(session, "ChatRequest", status, message, size) != 0 ||
-      await_message(session, "ChatReply", &reply) != 0) {
+  if (exchange(session, "ChatRequest",
+               qel_chat_request_write(&session->message, ++session->last_request_id, chatroom,
+                                      message_id, QEL_MSG_TYPE_TEXT, text, lifetime),
+               "ChatReply") != 0 ||
+      check_reply(session, "chat message", qel_chat_reply_read(&chat, frame->message, frame->size),
+                  &chat.reply, RESULT_OK) != 0) {
     return -1;
   }
-  chat_reply_deserialize(reply.message, reply.size, &request_id, &replied_chatroom, &code, &text,
-                         &count, &ids, &times);
-  free(reply.message);
-  status = check_result(session, "chat message", request_id, code, text, RESULT_OK);
-  for (i = 0; i < count; ++i) {
-    printf("plug-in: message %lld recorded at %lld\n", (long long)ids[i], (long long)times[i]);
-    confirmed = confirmed || ids[i] == message_id;
+  for (i = 0; i < chat.count; ++i) {
+    printf("plug-in: message %lld recorded at %lld\n", (long long)chat.msgIds[i],
+           (long long)chat.sentTimes[i]);
+    is_confirmed = is_confirmed || chat.msgIds[i] == message_id;
   }
-  free(text);
-  free(ids);
-  free(times);
-  if (status != 0) {
-    return -1;
-  }
-  return confirmed && replied_chatroom == chatroom
+  return is_confirmed && chat.reply.chatroomId == chatroom
              ? 0
              : failed("the service did not confirm the message");
 }
 
 /* The library refuses a text of more than 40000 bytes; nothing is sent then. */
-static int try_too_long_message(const session_t* session, int64_t chatroom) {
-  unsigned char* message = NULL;
-  int size = 0;
-  int status;
+static int try_too_long_message(session_t* session, int64_t chatroom) {
   char* text = malloc(TOO_LONG + 1);
+  qel_status_t status;
   if (text == NULL) {
     return failed("out of memory");
   }
   memset(text, 'x', TOO_LONG);
   text[TOO_LONG] = '\0';
-  status = chat_request_serialize(session->last_request_id + 1, chatroom, 9003, MSG_TYPE_TEXT, text,
-                                  0, 0, &message, &size);
+  status = qel_chat_request_write(&session->message, session->last_request_id + 1, chatroom, 9003,
+                                  QEL_MSG_TYPE_TEXT, text, 0);
   free(text);
-  if (status == 0) {
-    free(message);
-    return failed("a text of 40001 bytes was accepted");
+  if (status != QEL_BAD_ARGUMENT) {
+    return failed("a text of 40001 bytes was not refused");
   }
   printf("plug-in: a text of %d bytes is too long and was not sent\n", TOO_LONG);
   return 0;
@@ -367,91 +239,53 @@ static int try_too_long_message(const session_t* session, int64_t chatroom) {
 
 /* Reports the last message that was pushed as read. */
 static int report_read(session_t* session) {
-  unsigned char* message = NULL;
-  int size = 0;
-  frame_t reply;
-  int64_t request_id = NOT_WRITTEN;
-  int64_t replied_chatroom = NOT_WRITTEN;
-  int code = NOT_WRITTEN;
-  char* text = NULL;
-  int status =
-      read_message_request_serialize(++session->last_request_id, session->last_message.chatroomId,
-                                     &session->last_message, &message, &size);
-
-  if (send_message(session, "ReadMessageRequest", status, message, size) != 0 ||
-      await_message(session, "ReadMessageReply", &reply) != 0) {
+  if (exchange(session, "ReadMessageRequest",
+               qel_read_message_request_write(&session->message, ++session->last_request_id,
+                                              session->last_push.chatroomId,
+                                              &session->last_push.inboxEntry),
+               "ReadMessageReply") != 0) {
     return -1;
   }
-  read_message_reply_deserialize(reply.message, reply.size, &request_id, &replied_chatroom, &code,
-                                 &text);
-  free(reply.message);
-  status = check_result(session, "read receipt", request_id, code, text, RESULT_OK);
-  free(text);
-  return status;
+  return take_result(session, "read receipt", qel_read_message_reply_read);
 }
 
 /* Takes one page of stored messages and acknowledges it; with a key that asks for the next page. */
 static int take_page(session_t* session, int page_size, bool* has_next) {
-  frame_t page;
-  int64_t request_id = NOT_WRITTEN;
-  qel_message_inboxentry_t** entries = NULL;
-  int count = 0;
-  char* next_key = NULL;
-  const char* sent_key;
-  unsigned char* message = NULL;
-  int size = 0;
+  QEL_SCOPED(forward_unread_message, page);
+  const frame_t* frame = &session->received;
   int i;
-  int status;
 
-  if (await_message(session, "ForwardUnreadMessage", &page) != 0) {
+  if (await_message(session, "ForwardUnreadMessage") != 0) {
     return -1;
   }
-  forward_unread_message_deserialize(page.message, page.size, &request_id, &entries, &count,
-                                     &next_key);
-  free(page.message);
-  if (request_id == NOT_WRITTEN) {
+  if (qel_forward_unread_message_read(&page, frame->message, frame->size) != QEL_OK) {
     return failed("the page could not be parsed");
   }
-  if (entries == NULL) {
-    count = 0; /* nothing stored, or no memory */
-  }
-  for (i = 0; i < count; ++i) {
+  for (i = 0; i < page.count; ++i) {
+    const qel_message_inboxentry_t* entry = page.inboxEntries[i];
     printf("plug-in: stored message %lld from user %lld in chatroom %lld: \"%s\"\n",
-           (long long)entries[i]->msgId, (long long)entries[i]->sender,
-           (long long)entries[i]->chatroomId, shown_text(entries[i]));
-    free(entries[i]->chatMsg);
-    free(entries[i]);
+           (long long)entry->msgId, (long long)entry->sender, (long long)entry->chatroomId,
+           shown_text(entry));
   }
-  free(entries);
-  *has_next = next_key != NULL;
-  sent_key = next_key;
-  status =
-      forward_unread_message_reply_serialize(request_id, &sent_key, &page_size, &message, &size);
-  free(next_key);
-  return send_message(session, "ForwardUnreadMessageReply", status, message, size);
+  *has_next = page.nextPaginationKey != NULL;
+  return send_message(session, "ForwardUnreadMessageReply",
+                      qel_forward_unread_message_reply_write(&session->message, page.requestId,
+                                                             page.nextPaginationKey, &page_size));
 }
 
 /* Asks for the stored messages; they come as pushes, page by page. */
 static int fetch_unread(session_t* session) {
   const int page_size = 2;
-  unsigned char* message = NULL;
-  int size = 0;
-  frame_t reply;
-  int64_t request_id = NOT_WRITTEN;
-  int code = NOT_WRITTEN;
-  char* text = NULL;
   bool has_next = true;
-  int status = get_all_unread_message_request_serialize(++session->last_request_id, &page_size,
-                                                        &message, &size);
+  int status;
 
-  if (send_message(session, "GetAllUnreadMessageRequest", status, message, size) != 0 ||
-      await_message(session, "GetAllUnreadMessageReply", &reply) != 0) {
+  if (exchange(session, "GetAllUnreadMessageRequest",
+               qel_get_all_unread_message_request_write(&session->message,
+                                                        ++session->last_request_id, &page_size),
+               "GetAllUnreadMessageReply") != 0) {
     return -1;
   }
-  get_all_unread_message_reply_deserialize(reply.message, reply.size, &request_id, &code, &text);
-  free(reply.message);
-  status = check_result(session, "unread messages", request_id, code, text, RESULT_OK);
-  free(text);
+  status = take_result(session, "unread messages", qel_get_all_unread_message_reply_read);
   while (status == 0 && has_next) {
     status = take_page(session, page_size, &has_next);
   }
@@ -459,83 +293,47 @@ static int fetch_unread(session_t* session) {
 }
 
 static int unseal(session_t* session, int64_t chatroom, int64_t sender, int64_t message_id) {
-  unsigned char* message = NULL;
-  int size = 0;
-  frame_t reply;
-  int64_t request_id = NOT_WRITTEN;
-  int64_t replied_chatroom = NOT_WRITTEN;
-  int code = NOT_WRITTEN;
-  char* text = NULL;
-  int status = unseal_message_request_serialize(++session->last_request_id, chatroom, sender,
-                                                message_id, "opened by hand", &message, &size);
-
-  if (send_message(session, "UnsealMessageRequest", status, message, size) != 0 ||
-      await_message(session, "UnsealMessageReply", &reply) != 0) {
+  if (exchange(session, "UnsealMessageRequest",
+               qel_unseal_message_request_write(&session->message, ++session->last_request_id,
+                                                chatroom, sender, message_id, "opened by hand"),
+               "UnsealMessageReply") != 0) {
     return -1;
   }
-  unseal_message_reply_deserialize(reply.message, reply.size, &request_id, &replied_chatroom, &code,
-                                   &text);
-  free(reply.message);
-  status = check_result(session, "unsealing", request_id, code, text, RESULT_OK);
-  free(text);
-  return status;
+  return take_result(session, "unsealing", qel_unseal_message_reply_read);
 }
 
 /* ---- Typing and calls */
 
 /* Tells that the user types, and waits until somebody else does. */
 static int type_together(session_t* session, int64_t chatroom) {
-  const int content_type = CONTENT_TYPE_TEXT;
+  const int content_type = QEL_CONTENT_TYPE_TEXT;
   const int refresh = 10;
-  unsigned char* message = NULL;
-  int size = 0;
-  frame_t push;
-  int64_t request_id = NOT_WRITTEN;
-  int64_t typing_chatroom = 0;
-  int64_t sender = 0;
-  char* state = NULL;
-  int typed_content = NOT_WRITTEN;
-  int typed_refresh = NOT_WRITTEN;
+  QEL_SCOPED(typing_updated, typing);
+  const frame_t* frame = &session->received;
 
-  /* This serializer returns no status: the buffer tells whether it failed. */
-  is_typing_request_serialize(++session->last_request_id, chatroom, "typing", &content_type,
-                              &refresh, &message, &size);
-  if (send_message(session, "IsTyping", message != NULL ? 0 : -1, message, size) != 0 ||
-      await_message(session, "TypingUpdated", &push) != 0) {
+  if (exchange(session, "IsTyping",
+               qel_is_typing_request_write(&session->message, ++session->last_request_id, chatroom,
+                                           "typing", &content_type, &refresh),
+               "TypingUpdated") != 0) {
     return -1;
   }
-  typing_updated_deserialize(push.message, push.size, &request_id, &typing_chatroom, &sender,
-                             &state, &typed_content, &typed_refresh);
-  free(push.message);
-  if (request_id == NOT_WRITTEN) {
+  if (qel_typing_updated_read(&typing, frame->message, frame->size) != QEL_OK) {
     return failed("the typing status could not be parsed");
   }
-  printf("plug-in: user %lld in chatroom %lld: %s\n", (long long)sender, (long long)typing_chatroom,
-         state != NULL ? state : "unknown");
-  free(state);
+  printf("plug-in: user %lld in chatroom %lld: %s\n", (long long)typing.sender,
+         (long long)typing.chatroomId, typing.state != NULL ? typing.state : "unknown");
   return 0;
 }
 
 static int log_call(session_t* session, int64_t chatroom) {
   const int seconds = 75;
-  unsigned char* message = NULL;
-  int size = 0;
-  frame_t reply;
-  int64_t request_id = NOT_WRITTEN;
-  int code = NOT_WRITTEN;
-  char* text = NULL;
-  int status = save_call_log_request_serialize(++session->last_request_id, chatroom, "call-1",
-                                               "voice", 5001, 6001, seconds, &message, &size);
-
-  if (send_message(session, "SaveCallLogRequest", status, message, size) != 0 ||
-      await_message(session, "SaveCallLogReply", &reply) != 0) {
+  if (exchange(session, "SaveCallLogRequest",
+               qel_save_call_log_request_write(&session->message, ++session->last_request_id,
+                                               chatroom, "call-1", "voice", 5001, 6001, seconds),
+               "SaveCallLogReply") != 0) {
     return -1;
   }
-  save_call_log_reply_deserialize(reply.message, reply.size, &request_id, &code, &text);
-  free(reply.message);
-  status = check_result(session, "call log", request_id, code, text, RESULT_OK);
-  free(text);
-  return status;
+  return take_result(session, "call log", qel_save_call_log_reply_read);
 }
 
 /* ---- The day */
@@ -627,7 +425,7 @@ int main(int argc, char** argv) {
     return 1;
   }
   status = run_session(&session, access_token);
-  free(session.last_message.chatMsg);
+  session_release(&session);
   close(session.socket);
   return status == 0 ? 0 : 1;
 }

@@ -4,56 +4,68 @@
 #include <stdlib.h>
 #include <string.h>
 
+void session_release(session_t* session) {
+  qel_buffer_release(&session->message);
+  qel_forward_online_message_get_release(&session->last_push);
+  free(session->received.message);
+  session->received.message = NULL;
+}
+
 int failed(const char* what) {
   fprintf(stderr, "plug-in: %s\n", what);
   return -1;
 }
 
-int send_message(session_t* session, const char* name, int status, unsigned char* message,
-                 int size) {
-  int sent;
-  if (status != 0) {
+int send_message(session_t* session, const char* name, qel_status_t written) {
+  if (written != QEL_OK) {
     return failed("a message could not be built");
   }
-  sent = frame_send(session->socket, name, message, size);
-  free(message);
-  return sent == 0 ? 0 : failed("a message could not be sent");
+  return frame_send(session->socket, name, session->message.data, session->message.size) == 0
+             ? 0
+             : failed("a message could not be sent");
 }
 
-int await_message(session_t* session, const char* name, frame_t* frame) {
+int await_message(session_t* session, const char* name) {
   for (;;) {
-    int status;
-    if (frame_receive(session->socket, frame) != 1) {
+    free(session->received.message);
+    if (frame_receive(session->socket, &session->received) != 1) {
       return failed("the connection ended or fell silent where a message was due");
     }
-    if (strcmp(frame->name, name) == 0) {
+    if (strcmp(session->received.name, name) == 0) {
       return 0;
     }
-    status = take_push(session, frame);
-    free(frame->message);
-    if (status != 0) {
+    if (take_push(session) != 0) {
       return -1;
     }
   }
 }
 
-const char* shown_text(const qel_message_inboxentry_t* message) {
-  return message->msgType == 0 ? message->chatMsg : "(no text)";
+int exchange(session_t* session, const char* request, qel_status_t written, const char* reply) {
+  return send_message(session, request, written) == 0 ? await_message(session, reply) : -1;
 }
 
-/* If the id was not written, the reply could not be parsed. If the text was not written, the reply
-   has no result, or one without a text. */
-int check_result(const session_t* session, const char* what, int64_t request_id, int code,
-                 const char* text, int expected_code) {
-  if (request_id == NOT_WRITTEN) {
-    return failed("the reply could not be parsed");
+int check_reply(const session_t* session, const char* what, qel_status_t read,
+                const qel_reply_t* reply, int expected_code) {
+  if (read != QEL_OK) {
+    return failed(read == QEL_NO_MEMORY ? "out of memory" : "the reply could not be parsed");
   }
-  if (text == NULL) {
+  if (reply->resultMsg == NULL) {
     return failed("the reply does not say how it went");
   }
-  printf("plug-in: %s: result %d, \"%s\"\n", what, code, text);
-  if (request_id != session->last_request_id) {
+  printf("plug-in: %s: result %d, \"%s\"\n", what, reply->resultCode, reply->resultMsg);
+  if (reply->requestId != session->last_request_id) {
     return failed("the reply belongs to another request");
   }
-  return code == expected_code ? 0 : failed("the service refused the request");
+  return reply->resultCode == expected_code ? 0 : failed("the service refused the request");
+}
+
+int take_result(const session_t* session, const char* what,
+                qel_status_t (*read)(qel_reply_t* reply, const unsigned char* data, int size)) {
+  QEL_SCOPED(reply, reply);
+  const qel_status_t status = read(&reply, session->received.message, session->received.size);
+  return check_reply(session, what, status, &reply, RESULT_OK);
+}
+
+const char* shown_text(const qel_message_inboxentry_t* message) {
+  return message->msgType == QEL_MSG_TYPE_TEXT ? message->chatMsg : "(no text)";
 }

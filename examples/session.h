@@ -7,41 +7,47 @@
 #define EXAMPLES_SESSION_H
 
 #include "framing.h"
-#include "qel-message-serialize.h"
+#include "qel-message.h"
 
-/* Outputs are set to this before a call, to see whether the call wrote them. The service uses it
-   neither as an id nor as a code. */
-enum { NOT_WRITTEN = -4711 };
+/* This service's code for success. With two others it lists the users whom it refused. */
+enum { RESULT_OK = 0 };
 
-/* The service's codes: success, and two for success except for some of the users. */
-enum { RESULT_OK = 0, RESULT_SOME_REFUSED = 1001, RESULT_SOME_NOT_INVITED = 3003 };
-
+/* Begins zeroed. */
 typedef struct {
   int socket;
   int64_t last_request_id;
-  qel_message_inboxentry_t last_message; /* the last that was pushed; its chatMsg is ours */
+  qel_buffer_t message; /* the last that was written */
+  frame_t received;     /* the last that came */
+  qel_forward_online_message_get_t last_push;
 } session_t;
+
+void session_release(session_t* session);
 
 int failed(const char* what);
 
-/* Sends what a serializer handed out, and releases it. status is what the serializer returned. */
-int send_message(session_t* session, const char* name, int status, unsigned char* message,
-                 int size);
+/* Sends session->message, if that is how it could be written. */
+int send_message(session_t* session, const char* name, qel_status_t written);
 
-/* Waits for the message of that name, and takes the pushes that come before it. On success the
-   caller releases frame->message. */
-int await_message(session_t* session, const char* name, frame_t* frame);
+/* Waits for the message of that name, and takes the pushes that come before it. Then it is in
+   session->received. */
+int await_message(session_t* session, const char* name);
 
-/* Prints a reply's outcome, which should be the expected code. text may be NULL: it stays the
-   caller's. */
-int check_result(const session_t* session, const char* what, int64_t request_id, int code,
-                 const char* text, int expected_code);
+/* The two in turn. */
+int exchange(session_t* session, const char* request, qel_status_t written, const char* reply);
+
+/* Prints a reply's outcome, which should be the expected code. */
+int check_reply(const session_t* session, const char* what, qel_status_t read,
+                const qel_reply_t* reply, int expected_code);
+
+/* Reads what came as a reply that has nothing but its result, which should be a success. */
+int take_result(const session_t* session, const char* what,
+                qel_status_t (*read)(qel_reply_t* reply, const unsigned char* data, int size));
 
 /* What a user sees of a message: its text, if it is a TEXT. A type that this library does not know
    reads as TEXT too, so nothing more is done with the text than to show it. */
 const char* shown_text(const qel_message_inboxentry_t* message);
 
 /* Takes a message that the service sends of its own accord. Fails if it is another message. */
-int take_push(session_t* session, const frame_t* push);
+int take_push(session_t* session);
 
 #endif

@@ -11,7 +11,8 @@ set(_cmake_package "${CMAKE_INSTALL_LIBDIR}/cmake/${PROJECT_NAME}")
 install(TARGETS qel-message-protosvc LIBRARY COMPONENT runtime)
 
 install(
-  FILES proto-lib/qel-message-serialize.h "${PROJECT_BINARY_DIR}/proto-lib/msgspec_frontend.pb.h"
+  FILES proto-lib/qel-message.h proto-lib/qel-message-serialize.h
+    "${PROJECT_BINARY_DIR}/proto-lib/msgspec_frontend.pb.h"
   DESTINATION "${_headers}" COMPONENT development)
 install(FILES "${QEL_CONTRACT}"
   DESTINATION "${CMAKE_INSTALL_DATADIR}/${PROJECT_NAME}" COMPONENT development)

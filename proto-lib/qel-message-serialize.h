@@ -73,11 +73,7 @@
  * An argument that is no member of its enumeration ends the process with an assertion failure
  * (SIGABRT), unless the function says that it checks the range. A received number that is no member
  * reads as if the field were absent. So a message whose type is newer than this library has the
- * msgType 0 and cannot be told from a TEXT.
- * - ChatType: SINGLE 0, GROUP 1, BROADCAST 2, SECURE 3, MONOLOGUE 4
- * - MsgType: TEXT 0, MEDIA 1, CUSTOM 2, RECALL 3, NOTI 4, READ_ACK 5, DELIVERY_ACK 6, UNSEAL 10,
- *   VOIP_CALL_SETUP 30
- * - IsTypingContentType: CONTENT_TEXT 0, CONTENT_IMAGE 1, CONTENT_VIDEO 2, CONTENT_AUDIO 3
+ * msgType 0 and cannot be told from a TEXT. qel-message.h has names of the members.
  *
  * @par Exceptions
  * C++ exceptions of the protocol runtime are not caught, for example std::bad_alloc while a text is

@@ -43,13 +43,14 @@ configure() {
   [ "$(sed -n 's/.*(R.*PATH).*\[\(.*\)\]/\1/p' <<<"$output")" = "\$ORIGIN" ]
 }
 
-@test "a plug-in in C runs, and reads one header of the tree" {
+@test "a plug-in in C runs, and reads two headers of the tree" {
   cp -r "$tree" 'a prefix' # users' have a blank, too
   compile_c "$PWD/a prefix" -o plugin
   prints 'probe 7, answer of 2 bytes' "$tree" ./plugin
   # The compiler's and the C library's lie elsewhere.
   compile_c "$tree" -o plugin -H 2>&1 | sed -n 's/^\.\.* //p' | xargs -d '\n' realpath |
-    grep -v '^/usr/' | diff - <(echo "$tree/include/qel-message-protosvc/qel-message-serialize.h")
+    grep -v '^/usr/' |
+    diff - <(printf '%s\n' "$tree"/include/qel-message-protosvc/qel-message{,-serialize}.h)
 }
 
 @test "a module in C++ runs by the CMake package" {

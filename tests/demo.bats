@@ -49,3 +49,9 @@ said_by() {
   [ "$status" -ne 0 ]
   says "front_end: port $(cat port) is taken: choose another with --port, or leave --port out"
 }
+
+@test "the example without qel-message.h reads a reply and writes an answer" {
+  DLOG_STANDIN_PRIORITY=S run -0 ${EMULATOR:+"$EMULATOR"} "$BUILD/examples/direct_calls"
+  diff - <(printf '%s\n' 'reply to 7: ok' 'message 9 recorded at 5' 'answer of 2 bytes: 08 07') \
+    <<<"$output"
+}

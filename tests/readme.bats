@@ -1,9 +1,9 @@
 #!/usr/bin/env bats
-# The first program in README.md, with this build for the README's.
+# The code in README.md and in docs/migration.md, with this build for theirs.
 load build
 
-# block LANGUAGE: the blocks of that language.
-block() { awk -v fence="\`\`\`$1" '/^```/ {on = $0 == fence; next} on' "$SOURCE/README.md"; }
+# block LANGUAGE [PAGE]: the page's blocks of that language.
+block() { awk -v fence="\`\`\`$1" '/^```/ {on = $0 == fence; next} on' "$SOURCE/${2:-README.md}"; }
 
 @test "the first program compiles by its command and prints what README.md says" {
   mkdir build
@@ -18,4 +18,10 @@ block() { awk -v fence="\`\`\`$1" '/^```/ {on = $0 == fence; next} on' "$SOURCE/
   . ./built_by
   DLOG_STANDIN_PRIORITY=S ${EMULATOR:+"$EMULATOR"} ./first >printed
   diff expected printed
+}
+
+@test "the code of docs/migration.md compiles" {
+  block c docs/migration.md >code.c
+  [ -s code.c ]
+  "$CC" "${C_FLAGS[@]}" -std=c99 -pedantic -Wall -Wextra -Werror -I "$SOURCE/proto-lib" -c code.c
 }

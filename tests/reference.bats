@@ -43,8 +43,25 @@ man_pages_with() {
   [ "$(man_pages_with 'WHO FREES WHAT' '[*]state')" = typing_updated_deserialize ]
 }
 
+@test "every function of qel-message.h has a man page, which names the function that it stands on" {
+  cd "$docs/man/man3"
+  diff <(grep -oE '\bqel_[a-z_]+_(read|write|release)\(' "$SOURCE/proto-lib/qel-message.h" |
+    grep -v internal | tr -d '(' | sort -u) \
+    <(printf '%s\n' qel_*_{read,write,release}.3 | sed 's/[.]3$//' | sort)
+  grep -LF '#include <qel\-message.h>' qel_*_{read,write,release}.3 | none
+  sed -sn '/^\.SH "SEE ALSO"/,$p' qel_*_{read,write}.3 | grep -oE '[a-z_]+serialize' | sort -u |
+    diff <(functions | grep -v '^forward_stored_message_' | sort) -
+}
+
+@test "an argument has the words of the function below, unless qel-message.h has others" {
+  cd "$docs/man/man3"
+  grep -A 1 'chatroomId\\fP' qel_chat_request_write.3 | grep -q 'the chatroom'
+  grep -A 1 'msgType\\fP' qel_chat_request_write.3 | grep -q 'any other number is refused'
+}
+
 @test "every record has an entry" {
-  diff <(sed -nE 's/^\} (qel_message_[a-z]+_t);/\1/p' "$header" | sort) \
+  diff <(sed -nE 's/^\} (qel_[a-z_]+_t);/\1/p' "$header" "$SOURCE/proto-lib/qel-message.h" |
+    grep -vE '^qel_(status|result_code|chat_type|msg_type|content_type)_t' | sort) \
     <(sed -nE 's/.*<title>.*: (.*) Struct Reference<.*/\1/p' struct*.html | sort)
 }
 
@@ -76,6 +93,7 @@ man_pages_with() {
   mkdir proto-lib
   cp -r "$SOURCE/docs" docs
   sed '/@param callId /d' "$header" >proto-lib/qel-message-serialize.h
+  cp "$SOURCE/proto-lib/qel-message.h" proto-lib
   touch doxygen-awesome.css
   QEL_VERSION='' QEL_PLANTUML='' QEL_DOXYGEN_THEME=$PWD QEL_DOCS_PAGES='' QEL_DOCS_FOLDER=$PWD \
     run ! doxygen docs/Doxyfile

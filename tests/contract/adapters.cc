@@ -11,22 +11,26 @@
 namespace contract {
 namespace {
 
-void* address(const std::string& function) {
-  static void* library = [] {
+void* library() {
+  static void* loaded = [] {
     const char* named = std::getenv("QEL_LIBRARY");
-    void* loaded = dlopen(named != nullptr ? named : QEL_BUILT_LIBRARY, RTLD_NOW);
-    if (loaded == nullptr) {
+    void* opened = dlopen(named != nullptr ? named : QEL_BUILT_LIBRARY, RTLD_NOW);
+    if (opened == nullptr) {
       throw std::runtime_error(dlerror());
     }
     // From its first message on, the runtime keeps objects of its own: before any case has begun.
-    if (void* found = dlsym(loaded, "_ZN6google8protobuf8internal24InitLogSilencerCountOnceEv")) {
+    if (void* found = dlsym(opened, "_ZN6google8protobuf8internal24InitLogSilencerCountOnceEv")) {
       void (*keep)() = nullptr;
       std::memcpy(&keep, &found, sizeof keep);
       keep();
     }
-    return loaded;
+    return opened;
   }();
-  void* found = dlsym(library, function.c_str());
+  return loaded;
+}
+
+void* address(const std::string& function) {
+  void* found = dlsym(library(), function.c_str());
   if (found == nullptr) {
     throw std::runtime_error(dlerror());
   }
@@ -248,6 +252,10 @@ std::vector<std::string> function_names() {
 
 const std::vector<Parameter>& parameters_of(const std::string& function) {
   return adapter_of(function).parameters;
+}
+
+void load_library() {
+  library();
 }
 
 Invocation invocation_of(const std::string& function, Call* call) {

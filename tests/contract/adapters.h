@@ -39,8 +39,11 @@ const std::vector<Parameter>& parameters_of(const std::string& function);
 // The call itself, which allocates nothing of its own. The status, if the function has one.
 using Invocation = std::function<std::optional<int>()>;
 
-// Finds the function in the library under test: the one that the environment's QEL_LIBRARY names,
-// or else the one that was built beside this program. The arguments are kept in the call.
+// Loads the library under test, if it has not been: the one that the environment's QEL_LIBRARY
+// names, or else the one that was built beside this program.
+void load_library();
+
+// Finds the function in it. The arguments are kept in the call.
 Invocation invocation_of(const std::string& function, Call* call);
 
 }  // namespace contract

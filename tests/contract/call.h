@@ -129,6 +129,10 @@ class Call {
   template <typename T>
   T argument(const std::string& name);
 
+  // An output that is kept elsewhere.
+  template <typename T>
+  void place(const std::string& name, T* output);
+
   // What every output holds. Those that were not written are left out. The blocks handed out are
   // noted in the reader.
   Json outputs(Reader* reader) const;
@@ -180,7 +184,7 @@ T* Call::keep(std::vector<T> values) {
 }
 
 template <typename T>
-T* Call::output(const std::string& name) {
+void Call::place(const std::string& name, T* output) {
   names_.push_back(name);
   if constexpr (std::is_pointer_v<T>) {
     blanks_[name] = [](const void* block, size_t size, bool is_element) {
@@ -188,20 +192,30 @@ T* Call::output(const std::string& name) {
                                             size, is_element);
     };
   }
+  if constexpr (std::is_same_v<T, int>) {
+    numbers_[name] = output;
+  }
+  if (output != nullptr) {
+    outputs_.emplace_back(name, [name, output](Reader* reader, Json* shown) {
+      Json value = reader->read(*output);
+      if (value != Reader::kUnwritten) {
+        (*shown)[name] = std::move(value);
+      }
+    });
+  }
+}
+
+template <typename T>
+T* Call::output(const std::string& name) {
   if (given_.contains(name) && given_[name].is_null()) {
+    place<T>(name, nullptr);
     return nullptr;
   }
   const auto output = std::make_shared<Output<T>>();
   std::memset(output.get(), kFreshByte, sizeof *output);
   kept_.push_back(output);
-  if constexpr (std::is_same_v<T, int>) {
-    numbers_[name] = &output->value;
-  }
-  outputs_.emplace_back(name, [this, name, output](Reader* reader, Json* shown) {
-    Json value = reader->read(output->value);
-    if (value != Reader::kUnwritten) {
-      (*shown)[name] = std::move(value);
-    }
+  place(name, &output->value);
+  outputs_.emplace_back(name, [this, name, output](Reader* /*reader*/, Json* shown) {
     expect_guards(name, output->before, shown);
     expect_guards(name, output->after, shown);
   });
@@ -250,15 +264,11 @@ T Call::argument(const std::string& name) {
     return value.is_null() ? T{0} : byte_of(value);
   } else if constexpr (std::is_same_v<T, const char*>) {
     const Json value = given(name);
-    return value.is_null() ? nullptr : keep_text(value);
+    return value.is_null() || value.contains("to") ? nullptr : keep_text(value);
   } else if constexpr (std::is_same_v<T, const char**>) {
     // {to: null} is a pointer to NULL.
-    const Json value = given(name);
-    if (value.is_null()) {
-      return nullptr;
-    }
-    const bool is_to_null = value.is_object() && value.contains("to");
-    return keep(std::vector<const char*>{is_to_null ? nullptr : keep_text(value)});
+    const bool is_given = !given(name).is_null();
+    return is_given ? keep(std::vector<const char*>{argument<const char*>(name)}) : nullptr;
   } else if constexpr (std::is_same_v<T, const bool*>) {
     return reinterpret_cast<const bool*>(input<unsigned char>(name));
   } else if constexpr (std::is_const_v<std::remove_pointer_t<T>>) {

@@ -10,6 +10,7 @@
 #include <string>
 
 #include "cases.h"
+#include "qel-message.h"
 #include "run.h"
 
 namespace {
@@ -106,6 +107,13 @@ TEST(MessageLength, WhenOne_IsTakenForALength) {
     // Without the block, since no message is that short.
     expect_course(contract_case, course_without_block(course, 0));
   });
+}
+
+TEST(MessageLength, WhenBelowZero_TheHeaderSaysThatTheMessageIsTooLong) {
+  qel_buffer_t buffer = {};
+  added_to_next_id = -10;
+  EXPECT_EQ(qel_client_echo_reply_write(&buffer, 1), QEL_TOO_LONG);
+  EXPECT_EQ(buffer.size, 0);
 }
 
 // Seen where no other argument is the same number.

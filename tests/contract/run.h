@@ -9,6 +9,7 @@
 #include <string>
 #include <vector>
 
+#include "adapters.h"
 #include "call.h"
 #include "doubles.h"
 
@@ -43,6 +44,9 @@ struct Course {
 
 Course course_of(const Json& contract_case);
 
+// Whether the process ends, with an abort or a fault.
+bool ends_process(const Course& course);
+
 // How many blocks of calloc, malloc and strdup the course asks for.
 int blocks_of(const Course& course);
 
@@ -51,7 +55,8 @@ Course course_without_block(const Course& course, int n);
 
 class CaseRun : public Observer {
  public:
-  // With refused_new, the n-th block of operator new, from 1, is refused.
+  // With refused_new, the n-th block of operator new, from 1, is refused. The case is to live as
+  // long.
   CaseRun(const Json& contract_case, Course course, int refused_new = 0);
 
   // Makes the call in this process and compares.
@@ -66,6 +71,23 @@ class CaseRun : public Observer {
   // Whether operator new was called where something is copied.
   bool has_copied() const { return has_copied_; }
 
+ protected:
+  // The call, with what the case gives.
+  virtual Invocation make_invocation(Call* call) { return invocation_of(function(), call); }
+  // When it comes to the first line.
+  virtual void begin() {}
+  // What the call returns, and what its outputs hold then. The model's are those of the function.
+  virtual std::optional<int> expected_return(Json* model);
+  // What was asked for is in an output, once, or was freed; but for the stream.
+  virtual void check_blocks();
+
+  const Course& course() const { return course_; }
+  std::string function() const { return case_.at("call"); }
+  Json outputs() const;
+  void set_model(const Json& model) { model_ = model; }
+  bool owns_blocks() const { return !blocks_.empty(); }
+  void problem(const std::string& text);
+
  private:
   void on_line(const LogLine& line) override;
   bool on_request(Allocator allocator, size_t count, size_t size, const char* text) override;
@@ -79,20 +101,16 @@ class CaseRun : public Observer {
   void store(const std::string& path, const Json& value);
   void compare_outputs(const std::string& when);
   Reader reader() const;
-  Json outputs() const;
   void check_thrown(const std::string& thrown);
   void check_return(std::optional<int> status);
   void check_end();
   void watch_death();
   bool has_place_for(const std::string& path) const;
-  void check_blocks();
-  void problem(const std::string& text);
   bool is_done() const { return next_ == course_.steps.size(); }
 
   const Json& case_;
   const Course course_;
   const int refused_new_;
-  std::string function_;
   Call call_;
   std::map<const void*, size_t> blocks_;  // of calloc, malloc and strdup
   std::set<void*> objects_;               // of operator new

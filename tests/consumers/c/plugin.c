@@ -1,20 +1,17 @@
-/* A plug-in in strict C99, of the installed header alone: answers an echo probe. */
+/* A plug-in in strict C99, of the installed headers alone: answers an echo probe. */
 #include <stdio.h>
-#include <stdlib.h>
 
-#include "qel-message-serialize.h"
+#include "qel-message.h"
 
 int main(void) {
   const unsigned char probe[] = {0x08, 0x07};
-  int64_t request_id = -1;
-  unsigned char* answer = NULL;
-  int size = 0;
+  QEL_SCOPED(client_echo, echo);
+  QEL_SCOPED(buffer, answer);
 
-  client_echo_deserialize(probe, (int)sizeof probe, &request_id);
-  if (client_echo_reply_serialize(request_id, &answer, &size) != 0) {
+  if (qel_client_echo_read(&echo, probe, (int)sizeof probe) != QEL_OK ||
+      qel_client_echo_reply_write(&answer, echo.requestId) != QEL_OK) {
     return 1;
   }
-  printf("probe %d, answer of %d bytes\n", (int)request_id, size);
-  free(answer);
+  printf("probe %d, answer of %d bytes\n", (int)echo.requestId, answer.size);
   return 0;
 }

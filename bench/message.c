@@ -1,0 +1,77 @@
+/* The library's functions, called through qel-message.h. */
+
+#include <stdlib.h>
+
+#include "qel-message.h"
+#include "records.h"
+
+/* The caller frees the block. */
+static unsigned char* taken(qel_status_t status, const qel_buffer_t* buffer, int* size) {
+  if (status != QEL_OK) {
+    abort();
+  }
+  *size = buffer->size;
+  return buffer->data;
+}
+
+static unsigned char* echo_reply(int64_t request_id, int* size) {
+  qel_buffer_t buffer = {0};
+  return taken(qel_client_echo_reply_write(&buffer, request_id), &buffer, size);
+}
+
+static unsigned char* chat_request(const char* text, int* size) {
+  qel_buffer_t buffer = {0};
+  return taken(qel_chat_request_write(&buffer, kRequestId, kChatroomId, kMessageId, kMessageType,
+                                      text, kMessageTtl),
+               &buffer, size);
+}
+
+static void digest_reply(const qel_reply_t* reply, struct digest* digest) {
+  digest_number(digest, reply->requestId);
+  digest_number(digest, reply->chatroomId);
+  digest_number(digest, reply->resultCode);
+  digest_text(digest, reply->resultMsg);
+}
+
+static void chat_reply(const unsigned char* data, int size, struct digest* digest) {
+  QEL_SCOPED(chat_reply, chat);
+  if (qel_chat_reply_read(&chat, data, size) != QEL_OK) {
+    abort();
+  }
+  if (digest != NULL) {
+    digest_reply(&chat.reply, digest);
+    digest_processed(chat.msgIds, chat.sentTimes, chat.count, digest);
+  }
+}
+
+static void message_page(const unsigned char* data, int size, struct digest* digest) {
+  QEL_SCOPED(forward_unread_message, page);
+  if (qel_forward_unread_message_read(&page, data, size) != QEL_OK) {
+    abort();
+  }
+  if (digest != NULL) {
+    digest_number(digest, page.requestId);
+    digest_messages(page.inboxEntries, page.count, digest);
+    digest_text(digest, page.nextPaginationKey);
+  }
+}
+
+static void chatroom_entry(const unsigned char* data, int size, struct digest* digest) {
+  QEL_SCOPED(allow_chat_reply, room);
+  if (qel_allow_chat_reply_read(&room, data, size) != QEL_OK) {
+    abort();
+  }
+  if (digest != NULL) {
+    digest_reply(&room.reply, digest);
+    digest_number(digest, room.lastDeliveryAckTimestamp);
+    digest_watermarks(room.deliveryAckEntries, room.deliveryAckCount, digest);
+    digest_number(digest, room.lastReadAckTimestamp);
+    digest_watermarks(room.readAckEntries, room.readAckCount, digest);
+    digest_members(room.members, room.memberCount, digest);
+    digest_text(digest, room.title);
+    digest_number(digest, room.msgTtl);
+  }
+}
+
+const struct implementation implementation = {"qel-message.h", echo_reply,   chat_request,
+                                              chat_reply,      message_page, chatroom_entry};
