@@ -39,6 +39,7 @@ is_refused() {
 }
 
 @test "a record that is not zeroed is refused" {
+  [[ $("$CC" --version) != *clang* ]] || skip "clang does not see it"
   is_refused 'uninitialized' \
     'qel_chat_reply_t chat; return qel_chat_reply_read(&chat, data, size) == QEL_OK;'
 }

@@ -173,8 +173,7 @@ bool is_refused(const std::string& function, const Json& given) {
   if (function == "save_call_log_request_serialize") {
     return lacks("callId") || lacks("callLogType");
   }
-  return function == "is_typing_request_serialize" &&
-         !IsTypingContentType_IsValid(number(given, "contentType"));
+  return !IsTypingContentType_IsValid(number(given, "contentType"));
 }
 
 // Whether the case can be had through the header: it has all outputs and a count by value.

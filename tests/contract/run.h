@@ -81,7 +81,6 @@ class CaseRun : public Observer {
   // What was asked for is in an output, once, or was freed; but for the stream.
   virtual void check_blocks();
 
-  const Course& course() const { return course_; }
   std::string function() const { return case_.at("call"); }
   Json outputs() const;
   void set_model(const Json& model) { model_ = model; }
