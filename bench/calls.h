@@ -68,6 +68,20 @@ struct implementation {
 /* The program's implementation. A call that it does not have is NULL. */
 extern const struct implementation implementation;
 
+/*
+ * Parsers of small messages, in which qel-message.h is compared with the functions below it. In
+ * other programs they are NULL.
+ */
+
+/* ClientEcho: requestId */
+void echo(const unsigned char* data, int size, struct digest* digest) __attribute__((weak));
+
+/* EndChatReply: requestId, result.code, result.msg */
+void end_of_chats(const unsigned char* data, int size, struct digest* digest) __attribute__((weak));
+
+/* InviteReply: requestId, chatroomId, result.code, result.msg. The lists are absent. */
+void invitation(const unsigned char* data, int size, struct digest* digest) __attribute__((weak));
+
 #ifdef __cplusplus
 }
 #endif

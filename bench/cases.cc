@@ -73,6 +73,18 @@ Case chatroom_entry(int members) {
   return parser(chatroom_entry_of(members), implementation.chatroom_entry);
 }
 
+Case small_echo(int /*amount*/) {
+  return parser(echo_received(), echo);
+}
+
+Case small_end_of_chats(int /*amount*/) {
+  return parser(end_of_chats_received(), end_of_chats);
+}
+
+Case small_invitation(int /*amount*/) {
+  return parser(invitation_received(), invitation);
+}
+
 const std::vector<Call>& calls() {
   static const std::vector<Call> all = {
       {"echo_reply", implementation.echo_reply != nullptr, {0}, echo_reply},
@@ -88,7 +100,10 @@ const std::vector<Call>& calls() {
       {"chatroom_entry",
        implementation.chatroom_entry != nullptr,
        {1, 10, 100, 500, 5000},
-       chatroom_entry}};
+       chatroom_entry},
+      {"echo", echo != nullptr, {0}, small_echo},
+      {"end_of_chats", end_of_chats != nullptr, {0}, small_end_of_chats},
+      {"invitation", invitation != nullptr, {0}, small_invitation}};
   return all;
 }
 

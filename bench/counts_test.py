@@ -60,14 +60,15 @@ def instructions_are_those_published():
 
 
 def instructions_are_within_the_thresholds():
-    for case, listed in published_instructions().items():
-        ours, threshold = build.instructions("ours", case), measure.INSTRUCTION_THRESHOLDS[case]
+    published = published_instructions()
+    for case, threshold in measure.INSTRUCTION_THRESHOLDS.items():
+        ours, listed = build.instructions("ours", case), published[case]
         expect(round(ours / listed["baseline"], 2) <= threshold,
                f"{case}: {ours:.0f} instructions, more than {threshold} of {listed['baseline']:.0f}")
 
 
 def instructions_through_the_header_are_within_the_threshold():
-    for case in published_instructions():
+    for case in [*measure.CASES, *measure.SMALL]:
         ours, header = (build.instructions(program, case) for program in ("ours", "message"))
         expect(header <= measure.HEADER_THRESHOLD * ours,
                f"{case}: {header:.0f} instructions through qel-message.h, {ours:.0f} without it")

@@ -178,3 +178,31 @@ Received chatroom_entry_of(int members) {
               title.encoding() + delivery.encoding() + delivery_time.encoding() + ttl.encoding(),
           digest};
 }
+
+Received echo_received() {
+  struct digest digest = {0};
+  Message echo;
+  echo.number(1, kRequestId);
+  digest_number(&digest, kRequestId);
+  return {echo.encoding(), digest};
+}
+
+Received end_of_chats_received() {
+  struct digest digest = {0};
+  Message reply;
+  reply.number(11, kRequestId);
+  digest_number(&digest, kRequestId);
+  reply.bytes(12, result_bytes(&digest));
+  return {reply.encoding(), digest};
+}
+
+Received invitation_received() {
+  struct digest digest = {0};
+  Message reply;
+  reply.number(11, kRequestId);
+  reply.number(12, kChatroomId);
+  digest_number(&digest, kRequestId);
+  digest_number(&digest, kChatroomId);
+  reply.bytes(13, result_bytes(&digest));
+  return {reply.encoding(), digest};
+}

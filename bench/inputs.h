@@ -26,5 +26,8 @@ std::string chat_request_bytes(const std::string& text);
 Received chat_reply_of(int entries);
 Received message_page_of(int messages);
 Received chatroom_entry_of(int members);
+Received echo_received();
+Received end_of_chats_received();
+Received invitation_received();
 
 #endif

@@ -16,6 +16,8 @@ INSTRUCTION_THRESHOLDS = {"echo_reply": 1.11, "chat_request/100": 1.02, "chat_re
                           "chatroom_entry/500": 0.98}
 # The most that a call through qel-message.h may take: the ratio to the plain call.
 HEADER_THRESHOLD = 1.02
+# Those of small messages, in which qel-message.h is compared with the functions below it.
+SMALL = ["echo", "end_of_chats", "invitation"]
 LISTS = ["chat_reply/50", "message_page/500", "chatroom_entry/500"]
 
 # The cases that show how a call grows with its work.

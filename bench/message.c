@@ -73,5 +73,37 @@ static void chatroom_entry(const unsigned char* data, int size, struct digest* d
   }
 }
 
+void echo(const unsigned char* data, int size, struct digest* digest) {
+  QEL_SCOPED(client_echo, echo);
+  if (qel_client_echo_read(&echo, data, size) != QEL_OK) {
+    abort();
+  }
+  if (digest != NULL) {
+    digest_number(digest, echo.requestId);
+  }
+}
+
+void end_of_chats(const unsigned char* data, int size, struct digest* digest) {
+  QEL_SCOPED(reply, reply);
+  if (qel_end_chat_reply_read(&reply, data, size) != QEL_OK) {
+    abort();
+  }
+  if (digest != NULL) {
+    digest_number(digest, reply.requestId);
+    digest_number(digest, reply.resultCode);
+    digest_text(digest, reply.resultMsg);
+  }
+}
+
+void invitation(const unsigned char* data, int size, struct digest* digest) {
+  QEL_SCOPED(invite_reply, invited);
+  if (qel_invite_reply_read(&invited, data, size) != QEL_OK) {
+    abort();
+  }
+  if (digest != NULL) {
+    digest_reply(&invited.reply, digest);
+  }
+}
+
 const struct implementation implementation = {"qel-message.h", echo_reply,   chat_request,
                                               chat_reply,      message_page, chatroom_entry};

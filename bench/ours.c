@@ -104,5 +104,64 @@ static void chatroom_entry(const unsigned char* data, int size, struct digest* d
   free(title);
 }
 
+void echo(const unsigned char* data, int size, struct digest* digest) {
+  int64_t request_id = -1;
+  client_echo_deserialize(data, size, &request_id);
+  if (request_id == -1) {
+    abort();
+  }
+  if (digest != NULL) {
+    digest_number(digest, request_id);
+  }
+}
+
+void end_of_chats(const unsigned char* data, int size, struct digest* digest) {
+  int64_t request_id = -1;
+  int code = -1;
+  char* msg = NULL;
+  end_chat_reply_deserialize(data, size, &request_id, &code, &msg);
+  if (request_id == -1) {
+    abort();
+  }
+  if (digest != NULL) {
+    digest_number(digest, request_id);
+    digest_number(digest, code);
+    digest_text(digest, msg);
+  }
+  free(msg);
+}
+
+void invitation(const unsigned char* data, int size, struct digest* digest) {
+  int64_t request_id = -1;
+  int64_t chatroom_id = -1;
+  int64_t sent_time = -1;
+  int code = -1;
+  char* msg = NULL;
+  int64_t *invalid = NULL, *interrupted = NULL, *disabled = NULL, *existing = NULL, *denied = NULL;
+  qel_message_didviolationuser_t* violations = NULL;
+  int invalid_count = 0, interrupted_count = 0, disabled_count = 0, existing_count = 0;
+  int violation_count = 0, denied_count = 0;
+  invite_reply_deserialize(data, size, &request_id, &chatroom_id, &sent_time, &code, &msg, &invalid,
+                           &invalid_count, &interrupted, &interrupted_count, &disabled,
+                           &disabled_count, &existing, &existing_count, &violations,
+                           &violation_count, &denied, &denied_count);
+  if (request_id == -1) {
+    abort();
+  }
+  if (digest != NULL) {
+    digest_number(digest, request_id);
+    digest_number(digest, chatroom_id);
+    digest_number(digest, code);
+    digest_text(digest, msg);
+  }
+  free(msg);
+  free(invalid);
+  free(interrupted);
+  free(disabled);
+  free(existing);
+  free(violations);
+  free(denied);
+}
+
 const struct implementation implementation = {"this library", echo_reply,   chat_request,
                                               chat_reply,     message_page, chatroom_entry};

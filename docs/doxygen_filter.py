@@ -101,8 +101,8 @@ def about_record(function, comment, names):
     unless its own comment has others. Also says which function that is."""
     stem, _, kind = function.partition("qel_")[2].rpartition("_")
     below = {"write": [f"{stem}_serialize"], "read": [f"{stem}_deserialize"]}.get(kind, [])
-    words = {"number": "any number",
-             names[0]: {"release": "what to release"}.get(kind, "receives the message; begins zeroed"),
+    first = {"release": "what to release", "type": "any number"}
+    words = {names[0]: first.get(kind, "receives the message; begins zeroed"),
              "data,size": "the received bytes"}
     if kind == "write":
         with open(FUNCTIONS, encoding="utf-8") as file:
@@ -119,7 +119,8 @@ def header(text, name, about):
     """The header with what is known about each function, in one line, so that line numbers stay the
     same."""
     text = re.sub(r"^(QEL_MUST_USE )?static inline ", "", text, flags=re.MULTILINE)
-    text = re.sub(r"/\*\* @cond \*/.*?/\*\* @endcond \*/", lambda match: "\n" * match[0].count("\n"), text, flags=re.DOTALL)
+    text = re.sub(r"/\*\* @cond \*/.*?/\*\* @endcond \*/",
+                  lambda match: "\n" * match[0].count("\n"), text, flags=re.DOTALL)
 
     def section(match):
         functions = re.findall(r"^\w+ (\w+)\(", match[0], flags=re.MULTILINE)

@@ -44,7 +44,8 @@ def functions(page):
     blocks = re.split(r'^\.SS "(?:\\fB)?\w+(?:\\fP)? (\w+) .*"\n', page, flags=re.M)
     for name, body in zip(blocks[1::2], blocks[2::2]):
         result, arguments, brief = re.search(
-            rf'^\.RI "(?:\\fB)?(\w+)(?:\\fP)? \\fB{name}\\fP \((.*)\)"\n\.br\n\.RI "(.*?)(?:\\&\.)? "', page, re.M
+            rf'^\.RI "(?:\\fB)?(\w+)(?:\\fP)? \\fB{name}\\fP \((.*)\)"\n'
+            r'\.br\n\.RI "(.*?)(?:\\&\.)? "', page, re.M
         ).groups()
         arguments = arguments.replace(" ", r"\ ").replace(r",\ ", ", ")  # break at commas only
         yield name, (
@@ -55,16 +56,23 @@ def functions(page):
         )
 
 
+def without_functions(page):
+    """What a section's page has beside its functions: enumerations and macros."""
+    return re.sub(r'^\.S[HS] "Function.*?(?=^\.SH |\Z)', "", page, flags=re.M | re.S)
+
+
 def main(source, target):
     target.mkdir(parents=True)
     for path in source.glob("qel*"):
         page = path.read_text(encoding="utf-8")
-        if '.SH "Function Documentation"' in page:
+        if "Function Documentation" in page:
             for name, text in functions(page):
                 (target / f"{name}.3").write_text(text, encoding="utf-8")
-        else:
-            page = page.replace(".SH SYNOPSIS\n.br\n.PP\n.SH", f".SH SYNOPSIS\n{include(path.stem)}.SH")
-            (target / path.name).write_text(page, encoding="utf-8")
+            page = without_functions(page)
+            if '.SH "' not in page:
+                continue
+        page = page.replace(".SH SYNOPSIS\n.br\n.PP\n.SH", f".SH SYNOPSIS\n{include(path.stem)}.SH")
+        (target / path.name).write_text(page, encoding="utf-8")
 
 
 main(*map(pathlib.Path, sys.argv[1:]))

@@ -78,7 +78,8 @@ static void print_violations(const qel_message_didviolationuser_t* pairs, int co
   }
 }
 
-/* Some of the receivers may be refused: the reply lists them, one list for each reason. */
+/* Some of the receivers may be refused. Then the chatroom is created without them, and the reply
+   lists them, one list for each reason. */
 static int create_chatroom(session_t* session, const char* title, int64_t* chatroom) {
   static const int64_t receivers[] = {6001, 6002, 6003, 6004, 6005, 999};
   QEL_SCOPED(create_chatroom_reply, created);
@@ -151,7 +152,7 @@ static int change_chatroom(session_t* session, int64_t chatroom, const char* tit
                      qel_change_chatroom_meta_reply_read);
 }
 
-/* As with a new chatroom, some may be refused, for two more reasons. */
+/* As with a new chatroom, the others are invited if some are refused, for two more reasons. */
 static int invite(session_t* session, int64_t chatroom) {
   static const int64_t members[] = {6001, 6003, 6004, 6005, 6006, 6007, 999};
   QEL_SCOPED(invite_reply, invited);

@@ -25,7 +25,7 @@ void session_release(session_t* session);
 
 int failed(const char* what);
 
-/* Sends session->message, if that is how it could be written. */
+/* Sends session->message, unless the status of the call that wrote it says that there is none. */
 int send_message(session_t* session, const char* name, qel_status_t written);
 
 /* Waits for the message of that name, and takes the pushes that come before it. Then it is in

@@ -8,39 +8,43 @@
  * it keeps no state, and it allocates nothing.
  *
  * @par Names
- * A deserializer chat_reply_deserialize() becomes a record, qel_chat_reply_t, whose fields have the
- * names of the outputs, and the functions qel_chat_reply_read() and qel_chat_reply_release(). A
- * serializer chat_request_serialize() becomes qel_chat_request_write(), with the same arguments,
- * but for a qel_buffer_t in front instead of the two outputs at the end. The two placeholders for
- * stored messages have nothing here.
+ * A deserializer chat_reply_deserialize() becomes a record, qel_chat_reply_t, and the functions
+ * qel_chat_reply_read() and qel_chat_reply_release(). Its fields have the names of the outputs; the
+ * request, the chatroom and the result are in its reply. Replies that have nothing more are all
+ * qel_reply_t. A serializer client_echo_reply_serialize() becomes qel_client_echo_reply_write(),
+ * with a qel_buffer_t in front of its arguments instead of the two outputs behind them. If another
+ * argument differs, the comment says so. The two placeholders for stored messages have nothing
+ * here.
  *
  * @par Life of a record or a buffer
- * It begins zeroed: with QEL_SCOPED(), by "= {0}", or as part of something that was zeroed. To read
- * or to write releases what it held before. To release leaves it zeroed, and may be done at any
- * time and twice. So only one copy of a record may be released. What is zeroed holds nothing, and
- * need not be released.
+ * It begins zeroed: with QEL_SCOPED(), by "= {0}" (in C++ "= {}"), or as part of something that was
+ * zeroed. To read or to write releases what it held before. To release leaves it zeroed, and may be
+ * done at any time and twice. So only one copy of a record may be released. What is zeroed holds
+ * nothing, and need not be released. Unless the status is QEL_OK, the record or the buffer is
+ * zeroed.
  *
  * @par
- * Unless the status is QEL_OK, the record or the buffer is zeroed. To keep a text, an array or a
- * buffer's bytes for longer, take the pointer and set it to NULL in the record; then release it
- * with free(). To keep entries or members, take the array with its count: all of them are blocks of
- * their own.
+ * To keep a text, an array or a buffer's bytes for longer than the record, take the pointer and set
+ * it to NULL in the record; then release it with free(). An array that is taken so comes with its
+ * count, and entries, marks and members are blocks of their own.
  *
  * @par What is absent
- * A text that a message does not have is NULL. A number is QEL_ABSENT if the function tells whether
- * the message has it; the comments at the fields say which. All other numbers are 0 then. A list
- * that a message does not have is NULL with the count 0, and no list is NULL with another count.
+ * A text that a message does not have is NULL, but for a member's name and a message's chatMsg,
+ * which are "". A number is QEL_ABSENT where the comment at the field says so, and 0 elsewhere. A
+ * list is NULL with the count 0, and no list is NULL with another count.
  *
  * @par What cannot be told
- * - A message with the requestId QEL_ABSENT reads as unreadable bytes.
- * - A number that the service sends as QEL_ABSENT cannot be told from an absent one.
- * - The bytes do not say which message they are: the transport has to.
- * - Bytes that were cut between two fields are a message.
- * - A message whose msgType is newer than this library has the type TEXT.
+ * - a number that is 0 from one that is absent, where it is not QEL_ABSENT: a result without a code
+ *   has the code 0
+ * - a message with the requestId QEL_ABSENT from unreadable bytes, and a number that is sent as
+ *   QEL_ABSENT from an absent one
+ * - which message the bytes are: the transport has to say
+ * - whether the message is whole: bytes that were cut between two fields are a message
+ * - a msgType or chatType that is newer than this library from TEXT and SINGLE
  *
- * @par
- * If there is no memory for a record or for most arrays, the process ends, and if an exception of
- * the runtime comes, it passes through; see qel-message-serialize.h.
+ * @par Memory and exceptions
+ * Without memory for a record, and for most arrays, the process ends. An exception of the protocol
+ * runtime passes through; then do nothing with the record but release it, where it is.
  */
 #ifndef QEL_MESSAGE_H
 #define QEL_MESSAGE_H
@@ -60,9 +64,11 @@ extern "C" {
 
 /** @cond */
 #ifdef __cplusplus
+#define QEL_INTERNAL_NULL nullptr
 #define QEL_INTERNAL_ZEROED \
   {}
 #else
+#define QEL_INTERNAL_NULL NULL
 #define QEL_INTERNAL_ZEROED \
   { 0 }
 #endif
@@ -161,7 +167,7 @@ typedef struct qel_buffer {
 /** Releases the message. */
 static inline void qel_buffer_release(qel_buffer_t* buffer) {
   free(buffer->data);
-  buffer->data = NULL;
+  buffer->data = QEL_INTERNAL_NULL;
   buffer->size = 0;
 }
 
@@ -175,13 +181,28 @@ static inline void qel_internal_free(void* block, const void* record) {
   }
 }
 
+/* Most replies have few lists, and no call of free() is made for the others. */
+static inline void qel_internal_free_list(void* list) {
+  if (list) {
+    free(list);
+  }
+}
+
+static inline char* qel_internal_unwritten(void* record) {
+#ifdef __cplusplus
+  return static_cast<char*>(record);
+#else
+  return record;
+#endif
+}
+
 /* Whether a text that began so could be copied, if there was one. Without one it becomes NULL. */
 static inline bool qel_internal_is_copied(char** text, const void* record) {
-  if (*text != record) {
-    return *text != NULL;
+  if (*text == record) {
+    *text = QEL_INTERNAL_NULL;
+    return true;
   }
-  *text = NULL;
-  return true;
+  return *text;
 }
 
 /** @endcond */
@@ -205,7 +226,7 @@ static inline void qel_reply_release(qel_reply_t* reply) {
 /** @cond */
 
 static inline bool qel_internal_has_bytes(const unsigned char* data, int size) {
-  return data != NULL ? size >= 0 : size == 0;
+  return data ? size >= 0 : size == 0;
 }
 
 /* The requestId is always written, if anything is. */
@@ -216,17 +237,11 @@ static inline qel_status_t qel_internal_read_status(int64_t request_id, bool had
   return had_memory ? QEL_OK : QEL_NO_MEMORY;
 }
 
-/* Whether there is something to read; then the outputs are set. */
-static inline bool qel_internal_begin_reply(qel_reply_t* reply, const unsigned char* data,
-                                            int size) {
-  qel_reply_release(reply);
-  if (!qel_internal_has_bytes(data, size)) {
-    return false;
-  }
+/* Of a reply that is zeroed. */
+static inline void qel_internal_preset_reply(qel_reply_t* reply) {
   reply->requestId = QEL_ABSENT;
   reply->resultCode = QEL_ABSENT;
-  reply->resultMsg = (char*)reply;
-  return true;
+  reply->resultMsg = qel_internal_unwritten(reply);
 }
 
 static inline qel_status_t qel_internal_reply_status(qel_reply_t* reply, bool had_memory) {
@@ -260,7 +275,7 @@ static inline qel_status_t qel_internal_write_status(int status, qel_buffer_t* b
 }
 
 static inline bool qel_internal_is_list(const void* elements, int count) {
-  return count == 0 || (count > 0 && elements != NULL);
+  return elements ? count >= 0 : count == 0;
 }
 
 /** @endcond */
@@ -277,7 +292,7 @@ QEL_MUST_USE static inline qel_status_t qel_channel_auth_request_write(
     qel_buffer_t* buffer, int64_t requestId, int64_t userId, int64_t deviceId, const char* appId,
     const char* accessToken) {
   qel_buffer_release(buffer);
-  if (appId == NULL || accessToken == NULL) {
+  if (!appId || !accessToken) {
     return QEL_BAD_ARGUMENT;
   }
   return qel_internal_write_status(
@@ -287,23 +302,23 @@ QEL_MUST_USE static inline qel_status_t qel_channel_auth_request_write(
 }
 
 /**
- * Reads a ChannelAuthReply. The function hands out the code 0 if the reply has none. It becomes
- * QEL_ABSENT if the reply has no requestId and no text either: so empty bytes are no successful
- * login. An absent text and one for which there was no memory cannot be told apart here.
+ * Reads a ChannelAuthReply. If it has no code, the code is 0; but QEL_ABSENT if it has no requestId
+ * and no text either, so that empty bytes are no successful login. A text for which there was no
+ * memory reads as absent.
  */
 QEL_MUST_USE static inline qel_status_t qel_channel_auth_reply_read(qel_reply_t* reply,
                                                                     const unsigned char* data,
                                                                     int size) {
-  if (!qel_internal_begin_reply(reply, data, size)) {
+  qel_reply_release(reply);
+  if (!qel_internal_has_bytes(data, size)) {
     return QEL_UNREADABLE;
   }
+  qel_internal_preset_reply(reply);
   channel_auth_reply_deserialize(data, size, &reply->requestId, &reply->resultCode,
                                  &reply->resultMsg);
-  if (reply->requestId == 0 && reply->resultCode == 0 && reply->resultMsg == NULL) {
-    reply->resultCode = QEL_ABSENT;
-  }
-  if (reply->resultMsg == NULL) {
-    return QEL_OK;
+  if (!reply->resultMsg) {
+    reply->resultMsg = qel_internal_unwritten(reply); /* NULL stands for an absent text too */
+    reply->resultCode = reply->requestId || reply->resultCode ? reply->resultCode : QEL_ABSENT;
   }
   return qel_internal_end_reply(reply);
 }
@@ -389,10 +404,10 @@ typedef struct qel_create_chatroom_reply {
 /** Releases the reply. */
 static inline void qel_create_chatroom_reply_release(qel_create_chatroom_reply_t* created) {
   qel_internal_free(created->reply.resultMsg, created);
-  free(created->invalidReceivers);
-  free(created->disabledReceivers);
-  free(created->didViolationUsers);
-  free(created->invitationDenied);
+  qel_internal_free_list(created->invalidReceivers);
+  qel_internal_free_list(created->disabledReceivers);
+  qel_internal_free_list(created->didViolationUsers);
+  qel_internal_free_list(created->invitationDenied);
   memset(created, 0, sizeof *created);
 }
 
@@ -401,9 +416,10 @@ QEL_MUST_USE static inline qel_status_t qel_create_chatroom_reply_read(
     qel_create_chatroom_reply_t* created, const unsigned char* data, int size) {
   qel_status_t status = QEL_UNREADABLE;
   qel_create_chatroom_reply_release(created);
-  if (!qel_internal_begin_reply(&created->reply, data, size)) {
+  if (!qel_internal_has_bytes(data, size)) {
     return status;
   }
+  qel_internal_preset_reply(&created->reply);
   created->msgTtl = QEL_ABSENT;
   create_chatroom_reply_deserialize(data, size, &created->reply.requestId,
                                     &created->reply.chatroomId, &created->msgTtl,
@@ -412,7 +428,7 @@ QEL_MUST_USE static inline qel_status_t qel_create_chatroom_reply_read(
                                     &created->disabledReceivers, &created->disabledReceiversCount,
                                     &created->didViolationUsers, &created->didViolationUsersCount,
                                     &created->invitationDenied, &created->invitationDeniedCount);
-  if (created->invalidReceivers == NULL) {
+  if (!created->invalidReceivers) {
     created->unlistedInvalidReceivers = created->invalidReceiversCount;
     created->invalidReceiversCount = 0;
   }
@@ -471,15 +487,16 @@ QEL_MUST_USE static inline qel_status_t qel_chat_reply_read(qel_chat_reply_t* ch
   qel_status_t status = QEL_UNREADABLE;
   bool had_memory = true;
   qel_chat_reply_release(chat);
-  if (!qel_internal_begin_reply(&chat->reply, data, size)) {
+  if (!qel_internal_has_bytes(data, size)) {
     return status;
   }
-  chat->msgIds = (int64_t*)chat;
+  qel_internal_preset_reply(&chat->reply);
+  chat->msgIds = &chat->reply.requestId;
   chat_reply_deserialize(data, size, &chat->reply.requestId, &chat->reply.chatroomId,
                          &chat->reply.resultCode, &chat->reply.resultMsg, &chat->count,
                          &chat->msgIds, &chat->sentTimes);
-  if (chat->msgIds == (int64_t*)chat) {
-    chat->msgIds = NULL;
+  if (chat->msgIds == &chat->reply.requestId) {
+    chat->msgIds = QEL_INTERNAL_NULL;
   } else {
     had_memory = chat->count > 0; /* it is 0 without memory for one of the arrays */
   }
@@ -527,7 +544,7 @@ typedef struct qel_allow_chat_reply {
 /** @cond */
 static inline void qel_internal_release_marks(qel_message_watermarkentry_t** marks, int count) {
   int i = 0;
-  for (i = 0; i < count; ++i) {
+  for (i = 0; marks && i < count; ++i) {
     free(marks[i]);
   }
   free(marks);
@@ -540,7 +557,7 @@ static inline void qel_allow_chat_reply_release(qel_allow_chat_reply_t* room) {
   qel_internal_free(room->reply.resultMsg, room);
   qel_internal_release_marks(room->deliveryAckEntries, room->deliveryAckCount);
   qel_internal_release_marks(room->readAckEntries, room->readAckCount);
-  for (i = 0; i < room->memberCount; ++i) {
+  for (i = 0; room->members && i < room->memberCount; ++i) {
     free(room->members[i]->name);
     free(room->members[i]);
   }
@@ -557,12 +574,13 @@ QEL_MUST_USE static inline qel_status_t qel_allow_chat_reply_read(qel_allow_chat
   bool had_memory = true;
   int i = 0;
   qel_allow_chat_reply_release(room);
-  if (!qel_internal_begin_reply(&room->reply, data, size)) {
+  if (!qel_internal_has_bytes(data, size)) {
     return status;
   }
+  qel_internal_preset_reply(&room->reply);
   room->lastDeliveryAckTimestamp = QEL_ABSENT;
   room->lastReadAckTimestamp = QEL_ABSENT;
-  room->title = (char*)room;
+  room->title = qel_internal_unwritten(room);
   room->msgTtl = QEL_ABSENT;
   allow_chat_reply_deserialize(
       data, size, &room->reply.requestId, &room->reply.chatroomId, &room->reply.resultCode,
@@ -571,7 +589,7 @@ QEL_MUST_USE static inline qel_status_t qel_allow_chat_reply_read(qel_allow_chat
       &room->lastReadAckTimestamp, &room->members, &room->memberCount, &room->title, &room->msgTtl);
   had_memory = qel_internal_is_copied(&room->title, room);
   for (i = 0; i < room->memberCount; ++i) {
-    had_memory = had_memory && room->members[i]->name != NULL;
+    had_memory = had_memory && room->members[i]->name;
   }
   status = qel_internal_reply_status(&room->reply, had_memory);
   if (status != QEL_OK) {
@@ -597,9 +615,11 @@ QEL_MUST_USE static inline qel_status_t qel_get_all_unread_message_request_write
 /** Reads a GetAllUnreadMessageReply. */
 QEL_MUST_USE static inline qel_status_t qel_get_all_unread_message_reply_read(
     qel_reply_t* reply, const unsigned char* data, int size) {
-  if (!qel_internal_begin_reply(reply, data, size)) {
+  qel_reply_release(reply);
+  if (!qel_internal_has_bytes(data, size)) {
     return QEL_UNREADABLE;
   }
+  qel_internal_preset_reply(reply);
   get_all_unread_message_reply_deserialize(data, size, &reply->requestId, &reply->resultCode,
                                            &reply->resultMsg);
   return qel_internal_end_reply(reply);
@@ -640,7 +660,7 @@ QEL_MUST_USE static inline qel_status_t qel_forward_online_message_get_read(
     qel_forward_online_message_get_t* push, const unsigned char* data, int size) {
   qel_message_inboxentry_t* entry = &push->inboxEntry;
   int error_code = 0;
-  char* error_msg = NULL;
+  char* error_msg = QEL_INTERNAL_NULL;
   qel_status_t status = QEL_UNREADABLE;
   qel_forward_online_message_get_release(push);
   if (!qel_internal_has_bytes(data, size)) {
@@ -652,7 +672,7 @@ QEL_MUST_USE static inline qel_status_t qel_forward_online_message_get_read(
                                          &error_msg);
   entry->chatroomId = push->chatroomId;
   entry->chatType = push->chatType;
-  status = qel_internal_read_status(push->requestId, entry->chatMsg != NULL);
+  status = qel_internal_read_status(push->requestId, entry->chatMsg);
   if (status != QEL_OK) {
     qel_forward_online_message_get_release(push);
   }
@@ -689,7 +709,7 @@ typedef struct qel_forward_unread_message {
 /** Releases the page. */
 static inline void qel_forward_unread_message_release(qel_forward_unread_message_t* page) {
   int i = 0;
-  for (i = 0; i < page->count; ++i) {
+  for (i = 0; page->inboxEntries && i < page->count; ++i) {
     free(page->inboxEntries[i]->chatMsg);
     free(page->inboxEntries[i]);
   }
@@ -709,16 +729,16 @@ QEL_MUST_USE static inline qel_status_t qel_forward_unread_message_read(
     return status;
   }
   page->requestId = QEL_ABSENT;
-  page->nextPaginationKey = (char*)page;
+  page->nextPaginationKey = qel_internal_unwritten(page);
   forward_unread_message_deserialize(data, size, &page->requestId, &page->inboxEntries,
                                      &page->count, &page->nextPaginationKey);
   had_memory = qel_internal_is_copied(&page->nextPaginationKey, page);
-  if (page->inboxEntries == NULL && page->count > 0) {
+  if (!page->inboxEntries && page->count > 0) {
     page->count = 0;
     had_memory = false;
   }
   for (i = 0; i < page->count; ++i) {
-    had_memory = had_memory && page->inboxEntries[i]->chatMsg != NULL;
+    had_memory = had_memory && page->inboxEntries[i]->chatMsg;
   }
   status = qel_internal_read_status(page->requestId, had_memory);
   if (status != QEL_OK) {
@@ -743,7 +763,7 @@ QEL_MUST_USE static inline qel_status_t qel_read_message_request_write(
     qel_buffer_t* buffer, int64_t requestId, int64_t chatroomId,
     const qel_message_inboxentry_t* inboxEntry) {
   qel_buffer_release(buffer);
-  if (inboxEntry != NULL && !qel_is_msg_type(inboxEntry->msgType)) {
+  if (inboxEntry && !qel_is_msg_type(inboxEntry->msgType)) {
     return QEL_BAD_ARGUMENT;
   }
   return qel_internal_write_status(read_message_request_serialize(requestId, chatroomId, inboxEntry,
@@ -755,9 +775,11 @@ QEL_MUST_USE static inline qel_status_t qel_read_message_request_write(
 QEL_MUST_USE static inline qel_status_t qel_read_message_reply_read(qel_reply_t* reply,
                                                                     const unsigned char* data,
                                                                     int size) {
-  if (!qel_internal_begin_reply(reply, data, size)) {
+  qel_reply_release(reply);
+  if (!qel_internal_has_bytes(data, size)) {
     return QEL_UNREADABLE;
   }
+  qel_internal_preset_reply(reply);
   read_message_reply_deserialize(data, size, &reply->requestId, &reply->chatroomId,
                                  &reply->resultCode, &reply->resultMsg);
   return qel_internal_end_reply(reply);
@@ -788,9 +810,11 @@ QEL_MUST_USE static inline qel_status_t qel_end_chat_request_write(
 QEL_MUST_USE static inline qel_status_t qel_end_chat_reply_read(qel_reply_t* reply,
                                                                 const unsigned char* data,
                                                                 int size) {
-  if (!qel_internal_begin_reply(reply, data, size)) {
+  qel_reply_release(reply);
+  if (!qel_internal_has_bytes(data, size)) {
     return QEL_UNREADABLE;
   }
+  qel_internal_preset_reply(reply);
   end_chat_reply_deserialize(data, size, &reply->requestId, &reply->resultCode, &reply->resultMsg);
   return qel_internal_end_reply(reply);
 }
@@ -841,12 +865,12 @@ typedef struct qel_invite_reply {
 /** Releases the reply. */
 static inline void qel_invite_reply_release(qel_invite_reply_t* invited) {
   qel_internal_free(invited->reply.resultMsg, invited);
-  free(invited->invalidReceivers);
-  free(invited->interruptedReceivers);
-  free(invited->disabledReceivers);
-  free(invited->existingChatmembers);
-  free(invited->didViolationUsers);
-  free(invited->invitationDenied);
+  qel_internal_free_list(invited->invalidReceivers);
+  qel_internal_free_list(invited->interruptedReceivers);
+  qel_internal_free_list(invited->disabledReceivers);
+  qel_internal_free_list(invited->existingChatmembers);
+  qel_internal_free_list(invited->didViolationUsers);
+  qel_internal_free_list(invited->invitationDenied);
   memset(invited, 0, sizeof *invited);
 }
 
@@ -855,9 +879,10 @@ QEL_MUST_USE static inline qel_status_t qel_invite_reply_read(qel_invite_reply_t
                                                               const unsigned char* data, int size) {
   qel_status_t status = QEL_UNREADABLE;
   qel_invite_reply_release(invited);
-  if (!qel_internal_begin_reply(&invited->reply, data, size)) {
+  if (!qel_internal_has_bytes(data, size)) {
     return status;
   }
+  qel_internal_preset_reply(&invited->reply);
   invited->sentTime = QEL_ABSENT;
   invite_reply_deserialize(data, size, &invited->reply.requestId, &invited->reply.chatroomId,
                            &invited->sentTime, &invited->reply.resultCode,
@@ -891,7 +916,7 @@ QEL_MUST_USE static inline qel_status_t qel_current_time_request_write(qel_buffe
 /** A CurrentTimeReply. */
 typedef struct qel_current_time {
   qel_reply_t reply;         /**< the result */
-  int64_t currentTimeMillis; /**< the service's clock, -1 if the reply has none */
+  int64_t currentTimeMillis; /**< the service's clock, or QEL_ABSENT */
 } qel_current_time_t;
 
 /** Releases the reply. */
@@ -905,11 +930,15 @@ QEL_MUST_USE static inline qel_status_t qel_current_time_read(qel_current_time_t
                                                               const unsigned char* data, int size) {
   qel_status_t status = QEL_UNREADABLE;
   qel_current_time_release(now);
-  if (!qel_internal_begin_reply(&now->reply, data, size)) {
+  if (!qel_internal_has_bytes(data, size)) {
     return status;
   }
+  qel_internal_preset_reply(&now->reply);
   current_time_deserialize(data, size, &now->reply.requestId, &now->currentTimeMillis,
                            &now->reply.resultCode, &now->reply.resultMsg);
+  if (now->currentTimeMillis == -1) { /* which stands for an absent one */
+    now->currentTimeMillis = QEL_ABSENT;
+  }
   status = qel_internal_reply_status(&now->reply, true);
   if (status != QEL_OK) {
     qel_current_time_release(now);
@@ -937,9 +966,11 @@ QEL_MUST_USE static inline qel_status_t qel_unseal_message_request_write(
 QEL_MUST_USE static inline qel_status_t qel_unseal_message_reply_read(qel_reply_t* reply,
                                                                       const unsigned char* data,
                                                                       int size) {
-  if (!qel_internal_begin_reply(reply, data, size)) {
+  qel_reply_release(reply);
+  if (!qel_internal_has_bytes(data, size)) {
     return QEL_UNREADABLE;
   }
+  qel_internal_preset_reply(reply);
   unseal_message_reply_deserialize(data, size, &reply->requestId, &reply->chatroomId,
                                    &reply->resultCode, &reply->resultMsg);
   return qel_internal_end_reply(reply);
@@ -955,7 +986,7 @@ QEL_MUST_USE static inline qel_status_t qel_save_call_log_request_write(
     qel_buffer_t* buffer, int64_t requestId, int64_t chatroomId, const char* callId,
     const char* callLogType, int64_t sender, int64_t receiver, int conversationSeconds) {
   qel_buffer_release(buffer);
-  if (callId == NULL || callLogType == NULL) {
+  if (!callId || !callLogType) {
     return QEL_BAD_ARGUMENT;
   }
   return qel_internal_write_status(
@@ -968,9 +999,11 @@ QEL_MUST_USE static inline qel_status_t qel_save_call_log_request_write(
 QEL_MUST_USE static inline qel_status_t qel_save_call_log_reply_read(qel_reply_t* reply,
                                                                      const unsigned char* data,
                                                                      int size) {
-  if (!qel_internal_begin_reply(reply, data, size)) {
+  qel_reply_release(reply);
+  if (!qel_internal_has_bytes(data, size)) {
     return QEL_UNREADABLE;
   }
+  qel_internal_preset_reply(reply);
   save_call_log_reply_deserialize(data, size, &reply->requestId, &reply->resultCode,
                                   &reply->resultMsg);
   return qel_internal_end_reply(reply);
@@ -990,12 +1023,12 @@ QEL_MUST_USE static inline qel_status_t qel_is_typing_request_write(
     qel_buffer_t* buffer, int64_t requestId, int64_t chatroomId, const char* state,
     const int* contentType, const int* refresh) {
   qel_buffer_release(buffer);
-  if (contentType != NULL && !qel_is_content_type(*contentType)) {
+  if (contentType && !qel_is_content_type(*contentType)) {
     return QEL_BAD_ARGUMENT;
   }
   is_typing_request_serialize(requestId, chatroomId, state, contentType, refresh, &buffer->data,
                               &buffer->size);
-  return qel_internal_write_status(buffer->data != NULL ? 0 : -1, buffer);
+  return qel_internal_write_status(buffer->data ? 0 : -1, buffer);
 }
 
 /** A TypingUpdated. */
@@ -1025,7 +1058,7 @@ QEL_MUST_USE static inline qel_status_t qel_typing_updated_read(qel_typing_updat
   }
   typing->requestId = QEL_ABSENT;
   typing->sender = QEL_ABSENT;
-  typing->state = (char*)typing;
+  typing->state = qel_internal_unwritten(typing);
   typing->contentType = QEL_ABSENT;
   typing->refresh = QEL_ABSENT;
   typing_updated_deserialize(data, size, &typing->requestId, &typing->chatroomId, &typing->sender,
@@ -1043,7 +1076,8 @@ QEL_MUST_USE static inline qel_status_t qel_typing_updated_read(qel_typing_updat
 /** @addtogroup qel_chatroom_meta
  *  @{ */
 
-/** Writes a ChangeChatroomMetaRequest. */
+/** Writes a ChangeChatroomMetaRequest: the title, or else the lifetime. With neither it is refused.
+ */
 QEL_MUST_USE static inline qel_status_t qel_change_chatroom_meta_request_write(qel_buffer_t* buffer,
                                                                                int64_t requestId,
                                                                                int64_t chatroomId,
@@ -1059,9 +1093,11 @@ QEL_MUST_USE static inline qel_status_t qel_change_chatroom_meta_request_write(q
 /** Reads a ChangeChatroomMetaReply. */
 QEL_MUST_USE static inline qel_status_t qel_change_chatroom_meta_reply_read(
     qel_reply_t* reply, const unsigned char* data, int size) {
-  if (!qel_internal_begin_reply(reply, data, size)) {
+  qel_reply_release(reply);
+  if (!qel_internal_has_bytes(data, size)) {
     return QEL_UNREADABLE;
   }
+  qel_internal_preset_reply(reply);
   change_chatroom_meta_reply_deserialize(data, size, &reply->requestId, &reply->chatroomId,
                                          &reply->resultCode, &reply->resultMsg);
   return qel_internal_end_reply(reply);

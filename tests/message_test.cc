@@ -18,14 +18,12 @@ namespace {
 using contract::Allocator;
 using support::Fields;
 
-// What is handed out and not released, and the log's lines.
+// What is handed out and not released.
 class Watch : public contract::Observer {
  public:
   size_t blocks() const { return blocks_.size(); }
-  int lines() const { return lines_; }
 
  private:
-  void on_line(const contract::LogLine& /*line*/) override { ++lines_; }
   void on_block(Allocator allocator, void* block, size_t /*size*/) override {
     if (allocator != Allocator::kNew) {
       blocks_.insert(block);
@@ -34,7 +32,6 @@ class Watch : public contract::Observer {
   void on_release(Allocator /*allocator*/, void* block) override { blocks_.erase(block); }
 
   std::set<void*> blocks_;
-  int lines_ = 0;
 };
 
 // What the calls leave behind.
@@ -78,21 +75,6 @@ TEST(Message, WhenBytesAreUnreadable_TheStatusSaysSoAndNoNumberIsLeft) {
   ASSERT_EQ(read(qel_current_time_read, &now, Fields().number(11, 7).number(13, 9)), QEL_OK);
   EXPECT_EQ(read(qel_current_time_read, &now, unreadable()), QEL_UNREADABLE);
   EXPECT_EQ(now.currentTimeMillis, 0);
-}
-
-TEST(Message, WhenThereAreNoBytes_NothingIsCalled) {
-  const unsigned char byte = 0;
-  qel_chat_reply_t chat = {};
-  qel_reply_t reply = {};
-  qel_client_echo_t echo = {};
-  qel_typing_updated_t typing = {};
-  const Watch watch = watched([&] {
-    EXPECT_EQ(qel_chat_reply_read(&chat, nullptr, 1), QEL_UNREADABLE);
-    EXPECT_EQ(qel_end_chat_reply_read(&reply, &byte, -1), QEL_UNREADABLE);
-    EXPECT_EQ(qel_client_echo_read(&echo, nullptr, 1), QEL_UNREADABLE);
-    EXPECT_EQ(qel_typing_updated_read(&typing, &byte, -1), QEL_UNREADABLE);
-  });
-  EXPECT_EQ(watch.lines(), 0);
 }
 
 TEST(Message, WhenTheMessageIsEmpty_ItNeedsNoBytes) {
@@ -198,6 +180,39 @@ TEST(Message, WhenATextIsTakenFromItsRecord_ItStays) {
   }
   EXPECT_STREQ(state, "on");
   std::free(state);
+}
+
+TEST(Message, WhenAListIsTakenFromItsRecord_ItsEntriesStay) {
+  qel_message_inboxentry_t** entries = nullptr;
+  {
+    QEL_SCOPED(forward_unread_message, page);
+    ASSERT_EQ(read(qel_forward_unread_message_read, &page,
+                   Fields().message(12, Fields().number(1, 9).text(6, "hi"))),
+              QEL_OK);
+    entries = page.inboxEntries;
+    page.inboxEntries = nullptr;
+  }
+  EXPECT_STREQ(entries[0]->chatMsg, "hi");
+  std::free(entries[0]->chatMsg);
+  std::free(entries[0]);
+  std::free(entries);
+}
+
+TEST(Message, WhenMarksAndMembersAreTakenFromTheirRecord_ItCanBeReleased) {
+  QEL_SCOPED(allow_chat_reply, room);
+  ASSERT_EQ(read(qel_allow_chat_reply_read, &room,
+                 Fields().message(16, Fields().number(1, 5)).message(17, Fields().number(1, 5))),
+            QEL_OK);
+  ASSERT_EQ(room.deliveryAckCount + room.readAckCount, 1);
+  qel_message_watermarkentry_t**& marks =
+      room.deliveryAckCount > 0 ? room.deliveryAckEntries : room.readAckEntries;
+  std::free(marks[0]);
+  std::free(marks);
+  marks = nullptr;
+  std::free(room.members[0]->name);
+  std::free(room.members[0]);
+  std::free(room.members);
+  room.members = nullptr;
 }
 
 // ---- Numbers outside their enumerations

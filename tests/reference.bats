@@ -53,10 +53,20 @@ man_pages_with() {
     diff <(functions | grep -v '^forward_stored_message_' | sort) -
 }
 
+@test "every value and macro of qel-message.h has an entry and is on a man page" {
+  grep -oE '(^ *|[#]define |enum \{ )QEL_[A-Z0-9_]+( |,|\()' "$SOURCE/proto-lib/qel-message.h" |
+    grep -oE 'QEL_[A-Z0-9_]+' | grep -vE 'QEL_(INTERNAL_|MUST_USE)' | sort -u >"$BATS_TEST_TMPDIR/values"
+  for page in group__qel__common.html ../man/man3/qel_common.3; do
+    tr -d "\\\\" <"$page" | grep -oE 'QEL_[A-Z0-9_]+' | grep -v INTERNAL | sort -u |
+      diff "$BATS_TEST_TMPDIR/values" -
+  done
+}
+
 @test "an argument has the words of the function below, unless qel-message.h has others" {
   cd "$docs/man/man3"
   grep -A 1 'chatroomId\\fP' qel_chat_request_write.3 | grep -q 'the chatroom'
   grep -A 1 'msgType\\fP' qel_chat_request_write.3 | grep -q 'any other number is refused'
+  grep -A 1 'fInumber\\fP' qel_is_msg_type.3 | grep -q 'any number'
 }
 
 @test "every record has an entry" {

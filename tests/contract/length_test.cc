@@ -114,6 +114,9 @@ TEST(MessageLength, WhenBelowZero_TheHeaderSaysThatTheMessageIsTooLong) {
   added_to_next_id = -10;
   EXPECT_EQ(qel_client_echo_reply_write(&buffer, 1), QEL_TOO_LONG);
   EXPECT_EQ(buffer.size, 0);
+  added_to_next_id = -10;
+  EXPECT_EQ(qel_is_typing_request_write(&buffer, 1, 2, nullptr, nullptr, nullptr), QEL_TOO_LONG);
+  EXPECT_EQ(buffer.size, 0);
 }
 
 // Seen where no other argument is the same number.
