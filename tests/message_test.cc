@@ -231,7 +231,7 @@ std::vector<int> numbers_taken(Write write) {
   return taken;
 }
 
-std::vector<int> members(const google::protobuf::EnumDescriptor* enumeration) {
+std::vector<int> numbers_of(const google::protobuf::EnumDescriptor* enumeration) {
   std::vector<int> numbers;
   for (int i = 0; i < enumeration->value_count(); ++i) {
     numbers.push_back(enumeration->value(i)->number());
@@ -243,7 +243,7 @@ TEST(Message, WhenATypeIsNoMember_NoChatMessageIsWritten) {
   EXPECT_EQ(numbers_taken([](qel_buffer_t* buffer, int type) {
               return qel_chat_request_write(buffer, 1, 2, 3, type, "hi", 60);
             }),
-            members(MsgType_descriptor()));
+            numbers_of(MsgType_descriptor()));
 }
 
 TEST(Message, WhenATypeIsNoMember_NoReceiptIsWritten) {
@@ -252,7 +252,7 @@ TEST(Message, WhenATypeIsNoMember_NoReceiptIsWritten) {
               entry.msgType = type;
               return qel_read_message_request_write(buffer, 1, 2, &entry);
             }),
-            members(MsgType_descriptor()));
+            numbers_of(MsgType_descriptor()));
 }
 
 TEST(Message, WhenATypeIsNoMember_NoChatroomIsWritten) {
@@ -260,20 +260,20 @@ TEST(Message, WhenATypeIsNoMember_NoChatroomIsWritten) {
               const int64_t receiver = 5;
               return qel_create_chatroom_request_write(buffer, 1, type, &receiver, 1, nullptr);
             }),
-            members(ChatType_descriptor()));
+            numbers_of(ChatType_descriptor()));
 }
 
 TEST(Message, WhenATypeIsNoMember_NoTypingIsWritten) {
   EXPECT_EQ(numbers_taken([](qel_buffer_t* buffer, int type) {
               return qel_is_typing_request_write(buffer, 1, 2, "on", &type, nullptr);
             }),
-            members(IsTypingContentType_descriptor()));
+            numbers_of(IsTypingContentType_descriptor()));
 }
 
 // The numbers are in the order of the schema.
 void expect_names(const google::protobuf::EnumDescriptor* enumeration,
                   const std::vector<int>& named) {
-  EXPECT_EQ(members(enumeration), named) << enumeration->name();
+  EXPECT_EQ(numbers_of(enumeration), named) << enumeration->name();
 }
 
 TEST(Message, EnumerationsInC_AreThoseOfTheSchema) {

@@ -13,8 +13,10 @@ namespace {
 
 void* library() {
   static void* loaded = [] {
+    const bool is_linked = dlsym(RTLD_DEFAULT, "client_echo_deserialize") != nullptr;
     const char* named = std::getenv("QEL_LIBRARY");
-    void* opened = dlopen(named != nullptr ? named : QEL_BUILT_LIBRARY, RTLD_NOW);
+    void* opened = is_linked ? dlopen(nullptr, RTLD_NOW)
+                             : dlopen(named != nullptr ? named : QEL_BUILT_LIBRARY, RTLD_NOW);
     if (opened == nullptr) {
       throw std::runtime_error(dlerror());
     }

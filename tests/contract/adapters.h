@@ -39,8 +39,8 @@ const std::vector<Parameter>& parameters_of(const std::string& function);
 // The call itself, which allocates nothing of its own. The status, if the function has one.
 using Invocation = std::function<std::optional<int>()>;
 
-// Loads the library under test, if it has not been: the one that the environment's QEL_LIBRARY
-// names, or else the one that was built beside this program.
+// Loads the library under test, if it has not been: the one that this program is linked with, or
+// that the environment's QEL_LIBRARY names, or that was built beside this program.
 void load_library();
 
 // Finds the function in it. The arguments are kept in the call.
