@@ -67,5 +67,9 @@ int take_result(const session_t* session, const char* what,
 }
 
 const char* shown_text(const qel_message_inboxentry_t* message) {
-  return message->msgType == QEL_MSG_TYPE_TEXT ? message->chatMsg : "(no text)";
+  const char* c = message->chatMsg;
+  while ((unsigned char)*c >= ' ' || *c == '\n' || *c == '\r' || *c == '\t') {
+    ++c;
+  }
+  return message->msgType == QEL_MSG_TYPE_TEXT && *c == '\0' ? message->chatMsg : "(no text)";
 }

@@ -44,7 +44,7 @@ int take_result(const session_t* session, const char* what,
                 qel_status_t (*read)(qel_reply_t* reply, const unsigned char* data, int size));
 
 /* What a user sees of a message: its text, if it is a TEXT. A type that this library does not know
-   reads as TEXT too, so nothing more is done with the text than to show it. */
+   reads as TEXT too, so a text with control characters is not shown. */
 const char* shown_text(const qel_message_inboxentry_t* message);
 
 /* Takes a message that the service sends of its own accord. Fails if it is another message. */

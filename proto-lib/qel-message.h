@@ -9,24 +9,24 @@
  *
  * @par Names
  * A deserializer chat_reply_deserialize() becomes a record, qel_chat_reply_t, and the functions
- * qel_chat_reply_read() and qel_chat_reply_release(). Its fields have the names of the outputs; the
- * request, the chatroom and the result are in its reply. Replies that have nothing more are all
- * qel_reply_t. A serializer client_echo_reply_serialize() becomes qel_client_echo_reply_write(),
- * with a qel_buffer_t in front of its arguments instead of the two outputs behind them. If another
- * argument differs, the comment says so. The two placeholders for stored messages have nothing
- * here.
+ * qel_chat_reply_read() and qel_chat_reply_release(). Its fields have the names of the outputs. In
+ * a reply, requestId, chatroomId, resultCode and resultMsg are in its field reply; replies that
+ * have nothing more are all qel_reply_t. A serializer client_echo_reply_serialize() becomes
+ * qel_client_echo_reply_write(), with a qel_buffer_t in front of its arguments instead of the two
+ * outputs behind them. If another argument differs, the comment says so. The two placeholders for
+ * stored messages have nothing here.
  *
  * @par Life of a record or a buffer
  * It begins zeroed: with QEL_SCOPED(), by "= {0}" (in C++ "= {}"), or as part of something that was
  * zeroed. To read or to write releases what it held before. To release leaves it zeroed, and may be
- * done at any time and twice. So only one copy of a record may be released. What is zeroed holds
- * nothing, and need not be released. Unless the status is QEL_OK, the record or the buffer is
- * zeroed.
+ * done at any time and twice. A copy is not zeroed with it: release only one of them. What is
+ * zeroed holds nothing, and need not be released. Unless the status is QEL_OK, the record or the
+ * buffer is zeroed.
  *
  * @par
- * To keep a text, an array or a buffer's bytes for longer than the record, take the pointer and set
- * it to NULL in the record; then release it with free(). An array that is taken so comes with its
- * count, and entries, marks and members are blocks of their own.
+ * To keep a text, an array, an element of it or a buffer's bytes for longer than the record, take
+ * the pointer and set it to NULL in the record; then release it with free(). An array comes with
+ * its count. Entries, marks, members and their texts are blocks of their own.
  *
  * @par What is absent
  * A text that a message does not have is NULL, but for a member's name and a message's chatMsg,
@@ -36,15 +36,17 @@
  * @par What cannot be told
  * - a number that is 0 from one that is absent, where it is not QEL_ABSENT: a result without a code
  *   has the code 0
- * - a message with the requestId QEL_ABSENT from unreadable bytes, and a number that is sent as
- *   QEL_ABSENT from an absent one
+ * - a login's reply without a result from one with the code 0
+ * - a message with the requestId QEL_ABSENT from unreadable bytes, a number that is sent as
+ *   QEL_ABSENT from an absent one, and a clock of -1 too
  * - which message the bytes are: the transport has to say
  * - whether the message is whole: bytes that were cut between two fields are a message
  * - a msgType or chatType that is newer than this library from TEXT and SINGLE
  *
  * @par Memory and exceptions
- * Without memory for a record, and for most arrays, the process ends. An exception of the protocol
- * runtime passes through; then do nothing with the record but release it, where it is.
+ * Without memory for an entry, a mark or a member of a list, and for most arrays, the process ends.
+ * So it does by an exception of the protocol runtime, if the caller is written in C. To a caller in
+ * C++ the exception passes through: then do nothing with the record but release it, where it is.
  */
 #ifndef QEL_MESSAGE_H
 #define QEL_MESSAGE_H
@@ -78,7 +80,7 @@ extern "C" {
 
 /**
  * Declares a zeroed variable that is released where its scope ends: QEL_SCOPED(buffer, request); is
- * a qel_buffer_t request. With GCC and clang.
+ * a qel_buffer_t request. No goto and no case may jump over it into its scope. With GCC and clang.
  */
 #define QEL_SCOPED(kind, variable) \
   __attribute__((cleanup(qel_##kind##_release))) qel_##kind##_t variable = QEL_INTERNAL_ZEROED
@@ -92,7 +94,8 @@ extern "C" {
 /** How a call went. */
 typedef enum qel_status {
   QEL_OK = 0,       /**< the record has been read, or the buffer written */
-  QEL_UNREADABLE,   /**< there are no bytes, or they could not be parsed to their end */
+  QEL_UNREADABLE,   /**< the bytes could not be parsed to their end; or data is NULL, or size below
+                         0. Size 0 is a message without fields. */
   QEL_BAD_ARGUMENT, /**< an argument that the message cannot have; the log may say which */
   QEL_NO_MEMORY,    /**< none for the buffer, or for an array or a text of the record */
   QEL_TOO_LONG      /**< the message would have more than 2 GiB */
@@ -173,8 +176,9 @@ static inline void qel_buffer_release(qel_buffer_t* buffer) {
 
 /** @cond */
 
-/* Outputs that may become NULL without memory are set to the record itself before a call: this is
- * no block of theirs. They may hold it still when an exception comes. */
+/* Before a call, texts and msgIds hold the address of their record. Afterwards it stands for "not
+ * written", and NULL for "no memory". It is never freed; after an exception it may still be there.
+ */
 static inline void qel_internal_free(void* block, const void* record) {
   if (block != record) {
     free(block);
@@ -188,6 +192,7 @@ static inline void qel_internal_free_list(void* list) {
   }
 }
 
+/* The address that stands for "not written". */
 static inline char* qel_internal_unwritten(void* record) {
 #ifdef __cplusplus
   return static_cast<char*>(record);
@@ -196,7 +201,7 @@ static inline char* qel_internal_unwritten(void* record) {
 #endif
 }
 
-/* Whether a text that began so could be copied, if there was one. Without one it becomes NULL. */
+/* False if there was no memory for the text. One that was not written becomes NULL. */
 static inline bool qel_internal_is_copied(char** text, const void* record) {
   if (*text == record) {
     *text = QEL_INTERNAL_NULL;
@@ -211,7 +216,8 @@ static inline bool qel_internal_is_copied(char** text, const void* record) {
 typedef struct qel_reply {
   int64_t requestId;  /**< the request that is answered */
   int64_t chatroomId; /**< its chatroom, 0 if the function hands out none */
-  int resultCode;     /**< QEL_ABSENT if the reply has no result */
+  int resultCode;     /**< QEL_ABSENT if the reply has no result; a login's is 0 then, for which see
+                           qel_channel_auth_reply_read() */
   char* resultMsg;    /**< the service's text, or NULL */
 } qel_reply_t;
 
@@ -237,7 +243,7 @@ static inline qel_status_t qel_internal_read_status(int64_t request_id, bool had
   return had_memory ? QEL_OK : QEL_NO_MEMORY;
 }
 
-/* Of a reply that is zeroed. */
+/* The reply must be zeroed. */
 static inline void qel_internal_preset_reply(qel_reply_t* reply) {
   reply->requestId = QEL_ABSENT;
   reply->resultCode = QEL_ABSENT;
@@ -286,7 +292,8 @@ static inline bool qel_internal_is_list(const void* elements, int count) {
 /**
  * Writes a ChannelAuthRequest. NULL is refused.
  *
- * @param requestId  the request's id, not 0: an empty reply has that
+ * @param requestId  the request's id. It must not be 0, as an empty reply reads as the answer to 0.
+ *                   This is not checked.
  */
 QEL_MUST_USE static inline qel_status_t qel_channel_auth_request_write(
     qel_buffer_t* buffer, int64_t requestId, int64_t userId, int64_t deviceId, const char* appId,
@@ -302,9 +309,9 @@ QEL_MUST_USE static inline qel_status_t qel_channel_auth_request_write(
 }
 
 /**
- * Reads a ChannelAuthReply. If it has no code, the code is 0; but QEL_ABSENT if it has no requestId
- * and no text either, so that empty bytes are no successful login. A text for which there was no
- * memory reads as absent.
+ * Reads a ChannelAuthReply. Without a result its code is 0, like that of a success, so compare its
+ * requestId with the request's. Only without a requestId and a text too, as empty bytes are, the
+ * code is QEL_ABSENT. A text for which there was no memory reads as absent.
  */
 QEL_MUST_USE static inline qel_status_t qel_channel_auth_reply_read(qel_reply_t* reply,
                                                                     const unsigned char* data,
@@ -370,7 +377,8 @@ QEL_MUST_USE static inline qel_status_t qel_client_echo_read(qel_client_echo_t* 
  * Writes a CreateChatroomRequest.
  *
  * @param chatType        a qel_chat_type_t; any other number is refused
- * @param receivers       the users to bring into it: receiversCount ids, in order; NULL is refused
+ * @param receivers       the users to bring into it: receiversCount ids, in order. NULL is
+ *                        refused, even if receiversCount is 0.
  * @param receiversCount  may be 0; a negative number is refused
  */
 QEL_MUST_USE static inline qel_status_t qel_create_chatroom_request_write(
@@ -445,7 +453,7 @@ QEL_MUST_USE static inline qel_status_t qel_create_chatroom_reply_read(
  *  @{ */
 
 /**
- * Writes a ChatRequest.
+ * Writes a ChatRequest. There is no reserved here.
  *
  * @param msgType  a qel_msg_type_t; any other number is refused
  * @param chatMsg  at most 40000 bytes; it may be empty. More are refused, and so is NULL.
@@ -558,15 +566,17 @@ static inline void qel_allow_chat_reply_release(qel_allow_chat_reply_t* room) {
   qel_internal_release_marks(room->deliveryAckEntries, room->deliveryAckCount);
   qel_internal_release_marks(room->readAckEntries, room->readAckCount);
   for (i = 0; room->members && i < room->memberCount; ++i) {
-    free(room->members[i]->name);
-    free(room->members[i]);
+    if (room->members[i]) {
+      free(room->members[i]->name);
+      free(room->members[i]);
+    }
   }
   free(room->members);
   qel_internal_free(room->title, room);
   memset(room, 0, sizeof *room);
 }
 
-/** Reads an AllowChatReply. All names of members are there. */
+/** Reads an AllowChatReply. A member's name is never NULL. */
 QEL_MUST_USE static inline qel_status_t qel_allow_chat_reply_read(qel_allow_chat_reply_t* room,
                                                                   const unsigned char* data,
                                                                   int size) {
@@ -655,7 +665,7 @@ static inline void qel_forward_online_message_get_release(qel_forward_online_mes
   memset(push, 0, sizeof *push);
 }
 
-/** Reads a ForwardOnlineMessage. Its chatMsg is there. */
+/** Reads a ForwardOnlineMessage. Its chatMsg is never NULL. */
 QEL_MUST_USE static inline qel_status_t qel_forward_online_message_get_read(
     qel_forward_online_message_get_t* push, const unsigned char* data, int size) {
   qel_message_inboxentry_t* entry = &push->inboxEntry;
@@ -687,7 +697,7 @@ QEL_MUST_USE static inline qel_status_t qel_forward_online_message_get_read(
 /**
  * Writes a ForwardUnreadMessageReply.
  *
- * @param nextPaginationKey  the key that came with the page; with NULL no key is sent
+ * @param nextPaginationKey  the key itself that came with the page; with NULL no key is sent
  */
 QEL_MUST_USE static inline qel_status_t qel_forward_unread_message_reply_write(
     qel_buffer_t* buffer, int64_t requestId, const char* nextPaginationKey, const int* maxCount) {
@@ -710,15 +720,17 @@ typedef struct qel_forward_unread_message {
 static inline void qel_forward_unread_message_release(qel_forward_unread_message_t* page) {
   int i = 0;
   for (i = 0; page->inboxEntries && i < page->count; ++i) {
-    free(page->inboxEntries[i]->chatMsg);
-    free(page->inboxEntries[i]);
+    if (page->inboxEntries[i]) {
+      free(page->inboxEntries[i]->chatMsg);
+      free(page->inboxEntries[i]);
+    }
   }
   free(page->inboxEntries);
   qel_internal_free(page->nextPaginationKey, page);
   memset(page, 0, sizeof *page);
 }
 
-/** Reads a ForwardUnreadMessage. The chatMsg of each message is there. */
+/** Reads a ForwardUnreadMessage. A chatMsg is never NULL. */
 QEL_MUST_USE static inline qel_status_t qel_forward_unread_message_read(
     qel_forward_unread_message_t* page, const unsigned char* data, int size) {
   qel_status_t status = QEL_UNREADABLE;
@@ -829,7 +841,7 @@ QEL_MUST_USE static inline qel_status_t qel_end_chat_reply_read(qel_reply_t* rep
  *
  * @param invitingMembers       the users to invite: invitingMembersCount ids, in order; may be NULL
  *                              if the count is 0
- * @param invitingMembersCount  may be 0; a negative number is refused
+ * @param invitingMembersCount  the count itself; may be 0; a negative number is refused
  */
 QEL_MUST_USE static inline qel_status_t qel_invite_chat_request_write(
     qel_buffer_t* buffer, int64_t requestId, int64_t chatroomId, const int64_t* invitingMembers,

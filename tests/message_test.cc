@@ -182,37 +182,45 @@ TEST(Message, WhenATextIsTakenFromItsRecord_ItStays) {
   std::free(state);
 }
 
-TEST(Message, WhenAListIsTakenFromItsRecord_ItsEntriesStay) {
-  qel_message_inboxentry_t** entries = nullptr;
-  {
-    QEL_SCOPED(forward_unread_message, page);
-    ASSERT_EQ(read(qel_forward_unread_message_read, &page,
-                   Fields().message(12, Fields().number(1, 9).text(6, "hi"))),
-              QEL_OK);
-    entries = page.inboxEntries;
-    page.inboxEntries = nullptr;
-  }
-  EXPECT_STREQ(entries[0]->chatMsg, "hi");
-  std::free(entries[0]->chatMsg);
-  std::free(entries[0]);
-  std::free(entries);
+TEST(Message, WhenAnEntryOrItsListIsTaken_ItStays) {
+  QEL_SCOPED(forward_unread_message, page);
+  const Fields entry = Fields().number(1, 9).text(6, "hi");
+  ASSERT_EQ(
+      read(qel_forward_unread_message_read, &page, Fields().message(12, entry).message(12, entry)),
+      QEL_OK);
+  qel_message_inboxentry_t* first = page.inboxEntries[0];
+  page.inboxEntries[0] = nullptr;
+  qel_forward_unread_message_t rest = page;
+  page.inboxEntries = nullptr;
+  qel_forward_unread_message_release(&page);
+  EXPECT_STREQ(first->chatMsg, "hi");
+  EXPECT_STREQ(rest.inboxEntries[1]->chatMsg, "hi");
+  std::free(first->chatMsg);
+  std::free(first);
+  qel_forward_unread_message_release(&rest);
 }
 
-TEST(Message, WhenMarksAndMembersAreTakenFromTheirRecord_ItCanBeReleased) {
+TEST(Message, WhenMembersAndMarksAreTaken_TheyStay) {
   QEL_SCOPED(allow_chat_reply, room);
-  ASSERT_EQ(read(qel_allow_chat_reply_read, &room,
-                 Fields().message(16, Fields().number(1, 5)).message(17, Fields().number(1, 5))),
-            QEL_OK);
-  ASSERT_EQ(room.deliveryAckCount + room.readAckCount, 1);
-  qel_message_watermarkentry_t**& marks =
-      room.deliveryAckCount > 0 ? room.deliveryAckEntries : room.readAckEntries;
-  std::free(marks[0]);
-  std::free(marks);
-  marks = nullptr;
-  std::free(room.members[0]->name);
-  std::free(room.members[0]);
-  std::free(room.members);
+  const Fields member = Fields().number(1, 5).text(3, "a");
+  const Fields mark = Fields().number(1, 5);
+  ASSERT_EQ(
+      read(qel_allow_chat_reply_read, &room,
+           Fields().message(16, member).message(16, member).message(17, mark).message(20, mark)),
+      QEL_OK);
+  qel_message_chatroommember_t* first = room.members[0];
+  room.members[0] = nullptr;
+  qel_allow_chat_reply_t rest = room;
   room.members = nullptr;
+  room.deliveryAckEntries = nullptr;
+  room.readAckEntries = nullptr;
+  qel_allow_chat_reply_release(&room);
+  EXPECT_STREQ(first->name, "a");
+  EXPECT_STREQ(rest.members[1]->name, "a");
+  EXPECT_EQ(rest.readAckEntries[0]->userId, 5);
+  std::free(first->name);
+  std::free(first);
+  qel_allow_chat_reply_release(&rest);
 }
 
 // ---- Numbers outside their enumerations
@@ -286,6 +294,25 @@ TEST(Message, EnumerationsInC_AreThoseOfTheSchema) {
                 QEL_MSG_TYPE_UNSEAL, QEL_MSG_TYPE_VOIP_CALL_SETUP});
   expect_names(IsTypingContentType_descriptor(), {QEL_CONTENT_TYPE_TEXT, QEL_CONTENT_TYPE_IMAGE,
                                                   QEL_CONTENT_TYPE_VIDEO, QEL_CONTENT_TYPE_AUDIO});
+}
+
+TEST(Message, CodesOfRefusedUsers_AreThoseWithTheirLists) {
+  for (const int code : {QEL_RESULT_REFUSED_1000, QEL_RESULT_REFUSED_1001, QEL_RESULT_REFUSED_3003,
+                         QEL_RESULT_REFUSED_3009}) {
+    QEL_SCOPED(invite_reply, invited);
+    const Fields result = Fields().number(1, code).message(3, Fields().number(1, 40));
+    ASSERT_EQ(read(qel_invite_reply_read, &invited, Fields().message(13, result)), QEL_OK);
+    EXPECT_EQ(invited.invalidReceiversCount, 1) << code;
+  }
+}
+
+TEST(Message, MinusOne_IsANumberLikeOthers) {
+  QEL_SCOPED(reply, reply);
+  const Fields result = Fields().number(1, -1);
+  ASSERT_EQ(read(qel_end_chat_reply_read, &reply, Fields().number(11, -1).message(12, result)),
+            QEL_OK);
+  EXPECT_EQ(reply.requestId, -1);
+  EXPECT_EQ(reply.resultCode, -1);
 }
 
 // ---- Exceptions

@@ -28,6 +28,12 @@ is_refused() {
   done
 }
 
+@test "each call that has a status asks for somebody to look at it" {
+  calls='qel_[a-z_]+_(read|write)\('
+  [ "$(grep -cE "^QEL_MUST_USE static inline qel_status_t $calls" "$SOURCE/proto-lib/qel-message.h")" -eq 32 ]
+  grep -E "^static inline .*$calls" "$SOURCE/proto-lib/qel-message.h" | none
+}
+
 @test "a status of reading that nobody looks at is refused" {
   is_refused 'ignoring return value' \
     'qel_client_echo_t echo = {0}; qel_client_echo_read(&echo, data, size); return 0;'

@@ -1,6 +1,7 @@
 #include "header_calls.h"
 
 #include <algorithm>
+#include <cstdlib>
 #include <map>
 #include <memory>
 #include <tuple>
@@ -107,6 +108,44 @@ void place(Call* call, qel_typing_updated_t* typing) {
   call->place("refresh", &typing->refresh);
 }
 
+char* text() {
+  return static_cast<char*>(std::calloc(2, 1));
+}
+
+void fill(qel_buffer_t* buffer) {
+  *buffer = {reinterpret_cast<unsigned char*>(text()), 2};
+}
+
+void fill(qel_reply_t* reply) {
+  *reply = {1, 1, 1, text()};
+}
+
+void fill(qel_client_echo_t* echo) {
+  echo->requestId = 1;
+}
+
+void fill(qel_forward_online_message_get_t* push) {
+  push->requestId = 1;
+  push->inboxEntry.sender = 1;
+  push->inboxEntry.chatMsg = text();
+}
+
+void fill(qel_forward_unread_message_t* page) {
+  page->requestId = 1;
+  page->nextPaginationKey = text();
+}
+
+void fill(qel_typing_updated_t* typing) {
+  typing->requestId = 1;
+  typing->sender = 1;
+  typing->state = text();
+}
+
+template <typename Record>
+void fill(Record* record) {
+  fill(&record->reply);
+}
+
 // The names of the function's inputs that the header has too.
 std::vector<std::string> inputs_of(const std::string& function) {
   const bool is_serializer = function.find("_deserialize") == std::string::npos;
@@ -141,7 +180,7 @@ MakeCall header_call(qel_status_t (*function)(Record*, A...), void (*release)(Re
                   [&](auto... argument) { return function(record.get(), A(argument)...); },
                   arguments);
             },
-            [=] { release(record.get()); }};
+            [=] { release(record.get()); }, [=] { fill(record.get()); }};
   };
 }
 

@@ -12,6 +12,7 @@ namespace contract {
 struct HeaderCall {
   Invocation invocation;          // its status is a qel_status_t
   std::function<void()> release;  // of the record or the buffer
+  std::function<void()> fill;     // it, as an earlier call might have
 };
 
 // The call that stands on the function, with what the case gives. Its outputs are those of the

@@ -1,5 +1,5 @@
-// The cases of the contract through qel-message.h: what a call hands out, that another call
-// releases it, and that it can be released.
+// The cases of the contract through qel-message.h, each with a record or a buffer of an earlier
+// call: what a call hands out, that another call releases it, and that it can be released.
 
 #include <gtest/gtest.h>
 
@@ -99,6 +99,7 @@ class HeaderRun : public CaseRun {
     release_ = std::move(made.release);
     again_ = made.invocation;
     zeroed_ = outputs();
+    made.fill();
     return made.invocation;
   }
 
@@ -121,6 +122,9 @@ class HeaderRun : public CaseRun {
   }
 
   qel_status_t expected_status(const Json& model) const {
+    if (preset_.is_null()) {  // the function was not called
+      return QEL_BAD_ARGUMENT;
+    }
     if (is_serializer()) {
       return !model["serialized_data"].is_null() ? QEL_OK
              : model["size"] > 0                 ? QEL_NO_MEMORY
@@ -229,6 +233,7 @@ void expect_no_bytes(const std::string& function, const std::string& received, i
   const contract::HeaderCall made = header_call_of(function, &call);
   contract::Reader reader([](const void*) { return std::nullopt; });
   const Json zeroed = call.outputs(&reader);
+  made.fill();
   CountLines log;
   const contract::Observation observation(&log);
   EXPECT_EQ(made.invocation(), QEL_UNREADABLE) << function;

@@ -55,8 +55,8 @@ Course course_without_block(const Course& course, int n);
 
 class CaseRun : public Observer {
  public:
-  // With refused_new, the n-th block of operator new, from 1, is refused. The case is to live as
-  // long.
+  // With refused_new, the n-th block of operator new, from 1, is refused. The case must outlive
+  // the run.
   CaseRun(const Json& contract_case, Course course, int refused_new = 0);
 
   // Makes the call in this process and compares.
