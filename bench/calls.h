@@ -79,7 +79,8 @@ void echo(const unsigned char* data, int size, struct digest* digest) __attribut
 /* EndChatReply: requestId, result.code, result.msg */
 void end_of_chats(const unsigned char* data, int size, struct digest* digest) __attribute__((weak));
 
-/* InviteReply: requestId, chatroomId, result.code, result.msg. The lists are absent. */
+/* InviteReply: requestId, chatroomId, result.code, result.msg; the number of invalid receivers,
+ * which are absent like all lists */
 void invitation(const unsigned char* data, int size, struct digest* digest) __attribute__((weak));
 
 #ifdef __cplusplus

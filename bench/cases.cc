@@ -82,7 +82,7 @@ Case small_end_of_chats(int /*amount*/) {
 }
 
 Case small_invitation(int /*amount*/) {
-  return parser(invitation_received(), invitation);
+  return parser(chat_reply_of(0), invitation);  // the bytes of both are the same
 }
 
 const std::vector<Call>& calls() {

@@ -89,10 +89,7 @@ ReplyHead head_of(const Reply& reply) {
 }
 
 void digest_head(struct digest* digest, const ReplyHead& head) {
-  digest_number(digest, head.request_id);
-  digest_number(digest, head.chatroom_id);
-  digest_number(digest, head.code);
-  digest_text(digest, head.text);
+  digest_reply(head.request_id, head.chatroom_id, head.code, head.text, digest);
 }
 
 struct ProcessedMessages {

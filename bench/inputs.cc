@@ -195,14 +195,3 @@ Received end_of_chats_received() {
   reply.bytes(12, result_bytes(&digest));
   return {reply.encoding(), digest};
 }
-
-Received invitation_received() {
-  struct digest digest = {0};
-  Message reply;
-  reply.number(11, kRequestId);
-  reply.number(12, kChatroomId);
-  digest_number(&digest, kRequestId);
-  digest_number(&digest, kChatroomId);
-  reply.bytes(13, result_bytes(&digest));
-  return {reply.encoding(), digest};
-}

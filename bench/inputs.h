@@ -28,6 +28,5 @@ Received message_page_of(int messages);
 Received chatroom_entry_of(int members);
 Received echo_received();
 Received end_of_chats_received();
-Received invitation_received();
 
 #endif

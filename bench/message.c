@@ -26,11 +26,8 @@ static unsigned char* chat_request(const char* text, int* size) {
                &buffer, size);
 }
 
-static void digest_reply(const qel_reply_t* reply, struct digest* digest) {
-  digest_number(digest, reply->requestId);
-  digest_number(digest, reply->chatroomId);
-  digest_number(digest, reply->resultCode);
-  digest_text(digest, reply->resultMsg);
+static void digest_record(const qel_reply_t* reply, struct digest* digest) {
+  digest_reply(reply->requestId, reply->chatroomId, reply->resultCode, reply->resultMsg, digest);
 }
 
 static void chat_reply(const unsigned char* data, int size, struct digest* digest) {
@@ -39,7 +36,7 @@ static void chat_reply(const unsigned char* data, int size, struct digest* diges
     abort();
   }
   if (digest != NULL) {
-    digest_reply(&chat.reply, digest);
+    digest_record(&chat.reply, digest);
     digest_processed(chat.msgIds, chat.sentTimes, chat.count, digest);
   }
 }
@@ -62,7 +59,7 @@ static void chatroom_entry(const unsigned char* data, int size, struct digest* d
     abort();
   }
   if (digest != NULL) {
-    digest_reply(&room.reply, digest);
+    digest_record(&room.reply, digest);
     digest_number(digest, room.lastDeliveryAckTimestamp);
     digest_watermarks(room.deliveryAckEntries, room.deliveryAckCount, digest);
     digest_number(digest, room.lastReadAckTimestamp);
@@ -101,7 +98,8 @@ void invitation(const unsigned char* data, int size, struct digest* digest) {
     abort();
   }
   if (digest != NULL) {
-    digest_reply(&invited.reply, digest);
+    digest_record(&invited.reply, digest);
+    digest_number(digest, invited.invalidReceiversCount);
   }
 }
 

@@ -34,10 +34,7 @@ static void chat_reply(const unsigned char* data, int size, struct digest* diges
     abort();
   }
   if (digest != NULL) {
-    digest_number(digest, request_id);
-    digest_number(digest, chatroom_id);
-    digest_number(digest, code);
-    digest_text(digest, msg);
+    digest_reply(request_id, chatroom_id, code, msg, digest);
   }
   free(msg);
   finish_processed(ids, times, count, digest);
@@ -84,10 +81,7 @@ static void chatroom_entry(const unsigned char* data, int size, struct digest* d
     abort();
   }
   if (digest != NULL) {
-    digest_number(digest, request_id);
-    digest_number(digest, chatroom_id);
-    digest_number(digest, code);
-    digest_text(digest, msg);
+    digest_reply(request_id, chatroom_id, code, msg, digest);
     digest_number(digest, delivery_time);
   }
   finish_watermarks(deliveries, delivery_count, digest);
@@ -149,10 +143,8 @@ void invitation(const unsigned char* data, int size, struct digest* digest) {
     abort();
   }
   if (digest != NULL) {
-    digest_number(digest, request_id);
-    digest_number(digest, chatroom_id);
-    digest_number(digest, code);
-    digest_text(digest, msg);
+    digest_reply(request_id, chatroom_id, code, msg, digest);
+    digest_number(digest, invalid_count);
   }
   free(msg);
   free(invalid);

@@ -2,6 +2,14 @@
 
 #include <stdlib.h>
 
+void digest_reply(int64_t request_id, int64_t chatroom_id, int code, const char* msg,
+                  struct digest* digest) {
+  digest_number(digest, request_id);
+  digest_number(digest, chatroom_id);
+  digest_number(digest, code);
+  digest_text(digest, msg);
+}
+
 void digest_processed(const int64_t* ids, const int64_t* times, int count, struct digest* digest) {
   int i;
   digest_number(digest, count);

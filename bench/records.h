@@ -11,6 +11,10 @@
 extern "C" {
 #endif
 
+/* Adds what a reply about a chatroom begins with. */
+void digest_reply(int64_t request_id, int64_t chatroom_id, int code, const char* msg,
+                  struct digest* digest);
+
 /* Each adds the list to the digest. */
 void digest_processed(const int64_t* ids, const int64_t* times, int count, struct digest* digest);
 void digest_messages(qel_message_inboxentry_t* const* messages, int count, struct digest* digest);

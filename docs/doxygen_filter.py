@@ -13,6 +13,7 @@ those of qel-message.h, the arguments, from the functions that they stand on.
 """
 
 import collections
+import functools
 import os
 import re
 import sys
@@ -77,6 +78,7 @@ def diagram(block):
     return f"<center>{block}\n</center>"  # scrolls in a narrow window
 
 
+@functools.cache
 def owners():
     """What the caller of each function frees, by the function."""
     with open("docs/interface.md", encoding="utf-8") as file:

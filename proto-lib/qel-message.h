@@ -266,6 +266,33 @@ static inline qel_status_t qel_internal_end_reply(qel_reply_t* reply) {
   return status;
 }
 
+/* Of the functions that hand out a result, and of those that hand out its chatroom too. */
+static inline qel_status_t qel_internal_read_result(
+    void (*deserialize)(const unsigned char* data, int size, int64_t* requestId, int* resultCode,
+                        char** resultMsg),
+    qel_reply_t* reply, const unsigned char* data, int size) {
+  qel_reply_release(reply);
+  if (!qel_internal_has_bytes(data, size)) {
+    return QEL_UNREADABLE;
+  }
+  qel_internal_preset_reply(reply);
+  deserialize(data, size, &reply->requestId, &reply->resultCode, &reply->resultMsg);
+  return qel_internal_end_reply(reply);
+}
+static inline qel_status_t qel_internal_read_chatroom_result(
+    void (*deserialize)(const unsigned char* data, int size, int64_t* requestId,
+                        int64_t* chatroomId, int* resultCode, char** resultMsg),
+    qel_reply_t* reply, const unsigned char* data, int size) {
+  qel_reply_release(reply);
+  if (!qel_internal_has_bytes(data, size)) {
+    return QEL_UNREADABLE;
+  }
+  qel_internal_preset_reply(reply);
+  deserialize(data, size, &reply->requestId, &reply->chatroomId, &reply->resultCode,
+              &reply->resultMsg);
+  return qel_internal_end_reply(reply);
+}
+
 /* A refused argument leaves the size at 0; without memory it is the length. */
 static inline qel_status_t qel_internal_write_status(int status, qel_buffer_t* buffer) {
   int size = 0;
@@ -625,14 +652,7 @@ QEL_MUST_USE static inline qel_status_t qel_get_all_unread_message_request_write
 /** Reads a GetAllUnreadMessageReply. */
 QEL_MUST_USE static inline qel_status_t qel_get_all_unread_message_reply_read(
     qel_reply_t* reply, const unsigned char* data, int size) {
-  qel_reply_release(reply);
-  if (!qel_internal_has_bytes(data, size)) {
-    return QEL_UNREADABLE;
-  }
-  qel_internal_preset_reply(reply);
-  get_all_unread_message_reply_deserialize(data, size, &reply->requestId, &reply->resultCode,
-                                           &reply->resultMsg);
-  return qel_internal_end_reply(reply);
+  return qel_internal_read_result(get_all_unread_message_reply_deserialize, reply, data, size);
 }
 
 /** @} */
@@ -787,14 +807,7 @@ QEL_MUST_USE static inline qel_status_t qel_read_message_request_write(
 QEL_MUST_USE static inline qel_status_t qel_read_message_reply_read(qel_reply_t* reply,
                                                                     const unsigned char* data,
                                                                     int size) {
-  qel_reply_release(reply);
-  if (!qel_internal_has_bytes(data, size)) {
-    return QEL_UNREADABLE;
-  }
-  qel_internal_preset_reply(reply);
-  read_message_reply_deserialize(data, size, &reply->requestId, &reply->chatroomId,
-                                 &reply->resultCode, &reply->resultMsg);
-  return qel_internal_end_reply(reply);
+  return qel_internal_read_chatroom_result(read_message_reply_deserialize, reply, data, size);
 }
 
 /** @} */
@@ -822,13 +835,7 @@ QEL_MUST_USE static inline qel_status_t qel_end_chat_request_write(
 QEL_MUST_USE static inline qel_status_t qel_end_chat_reply_read(qel_reply_t* reply,
                                                                 const unsigned char* data,
                                                                 int size) {
-  qel_reply_release(reply);
-  if (!qel_internal_has_bytes(data, size)) {
-    return QEL_UNREADABLE;
-  }
-  qel_internal_preset_reply(reply);
-  end_chat_reply_deserialize(data, size, &reply->requestId, &reply->resultCode, &reply->resultMsg);
-  return qel_internal_end_reply(reply);
+  return qel_internal_read_result(end_chat_reply_deserialize, reply, data, size);
 }
 
 /** @} */
@@ -978,14 +985,7 @@ QEL_MUST_USE static inline qel_status_t qel_unseal_message_request_write(
 QEL_MUST_USE static inline qel_status_t qel_unseal_message_reply_read(qel_reply_t* reply,
                                                                       const unsigned char* data,
                                                                       int size) {
-  qel_reply_release(reply);
-  if (!qel_internal_has_bytes(data, size)) {
-    return QEL_UNREADABLE;
-  }
-  qel_internal_preset_reply(reply);
-  unseal_message_reply_deserialize(data, size, &reply->requestId, &reply->chatroomId,
-                                   &reply->resultCode, &reply->resultMsg);
-  return qel_internal_end_reply(reply);
+  return qel_internal_read_chatroom_result(unseal_message_reply_deserialize, reply, data, size);
 }
 
 /** @} */
@@ -1011,14 +1011,7 @@ QEL_MUST_USE static inline qel_status_t qel_save_call_log_request_write(
 QEL_MUST_USE static inline qel_status_t qel_save_call_log_reply_read(qel_reply_t* reply,
                                                                      const unsigned char* data,
                                                                      int size) {
-  qel_reply_release(reply);
-  if (!qel_internal_has_bytes(data, size)) {
-    return QEL_UNREADABLE;
-  }
-  qel_internal_preset_reply(reply);
-  save_call_log_reply_deserialize(data, size, &reply->requestId, &reply->resultCode,
-                                  &reply->resultMsg);
-  return qel_internal_end_reply(reply);
+  return qel_internal_read_result(save_call_log_reply_deserialize, reply, data, size);
 }
 
 /** @} */
@@ -1088,8 +1081,7 @@ QEL_MUST_USE static inline qel_status_t qel_typing_updated_read(qel_typing_updat
 /** @addtogroup qel_chatroom_meta
  *  @{ */
 
-/** Writes a ChangeChatroomMetaRequest: the title, or else the lifetime. With neither it is refused.
- */
+/** Writes a ChangeChatroomMetaRequest: the title, or else the lifetime. One is required. */
 QEL_MUST_USE static inline qel_status_t qel_change_chatroom_meta_request_write(qel_buffer_t* buffer,
                                                                                int64_t requestId,
                                                                                int64_t chatroomId,
@@ -1105,14 +1097,8 @@ QEL_MUST_USE static inline qel_status_t qel_change_chatroom_meta_request_write(q
 /** Reads a ChangeChatroomMetaReply. */
 QEL_MUST_USE static inline qel_status_t qel_change_chatroom_meta_reply_read(
     qel_reply_t* reply, const unsigned char* data, int size) {
-  qel_reply_release(reply);
-  if (!qel_internal_has_bytes(data, size)) {
-    return QEL_UNREADABLE;
-  }
-  qel_internal_preset_reply(reply);
-  change_chatroom_meta_reply_deserialize(data, size, &reply->requestId, &reply->chatroomId,
-                                         &reply->resultCode, &reply->resultMsg);
-  return qel_internal_end_reply(reply);
+  return qel_internal_read_chatroom_result(change_chatroom_meta_reply_deserialize, reply, data,
+                                           size);
 }
 
 /** @} */

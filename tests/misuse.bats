@@ -1,5 +1,6 @@
 #!/usr/bin/env bats
-# Mistakes with qel-message.h that the compiler refuses, with the warnings that most projects ask for.
+# qel-message.h in a user's source: the mistakes that the compiler refuses, with the warnings that most
+# projects ask for, and what the header brings along.
 load build
 
 # compiles LANGUAGE BODY: a function with that body, which has received some bytes.
@@ -26,6 +27,12 @@ is_refused() {
       if (qel_chat_reply_read(&chat, data, size) == QEL_OK) { count = chat.count; }
       qel_chat_reply_release(&chat); return count;'
   done
+}
+
+@test "the header brings neither data nor functions that others see" {
+  compiles c 'qel_chat_reply_t chat = {0}; return qel_chat_reply_read(&chat, data, size) == QEL_OK;'
+  diff <("$NM" -g --defined-only code.o | awk '{ print $3 }') <(echo take)
+  "$NM" code.o | grep -i ' [bcdgs] ' | none
 }
 
 @test "each call that has a status asks for somebody to look at it" {
