@@ -18,7 +18,7 @@ written) and a value. A number is a varint, seven bits a byte, the lowest first;
 message begin with their length. What a message does not have is not there.
 
 One example for each function: what it is given or receives, what it does in order, and the bytes as
-[`qel-wire explain`](../qel-wire/README.md) shows them. D, I, W and E are the levels of log lines. The examples
+[`qel-wire explain`](qel-wire.md) shows them. D, I, W and E are the levels of log lines. The examples
 are the first cases of [the contract](contract.md); `./dev docs` writes this page, and a test compares.
 """
 

@@ -49,6 +49,9 @@ def components(tools, jquery):
              "Compiled into the program."),
             ("qel-wire", "Nettle", "libnettle8", "LGPL-3.0-or-later OR GPL-2.0-or-later",
              "nettle_project:nettle", "Linked dynamically."),
+            ("qel-wire", "CLI11", "libcli11-dev", "BSD-3-Clause", "", "Compiled into the program."),
+            ("qel-wire", "libpcap", "libpcap0.8", "BSD-3-Clause", "tcpdump:libpcap", "Linked dynamically."),
+            ("qel-wire", "utf8proc", "libutf8proc2", "MIT", "", "Linked dynamically."),
             ("libqel-message-protosvc-doc", "Doxygen Awesome", "doxygen-awesome-css", "MIT", "",
              "The style of the web pages.")):
         found = re.search(rf"^({package}\w*)(?::\w+)? (\S+)$", tools, re.M)

@@ -78,7 +78,7 @@ install(FILES ${_example} DESTINATION "${CMAKE_INSTALL_DATADIR}/doc/${PROJECT_NA
 
 # Builds what is installed.
 add_custom_target(packaged DEPENDS qel-message-protosvc contract)
-foreach(_target qel-wire qel-wire-man docs)
+foreach(_target qel-wire qel-wire-says docs)
   if(TARGET ${_target})
     add_dependencies(packaged ${_target})
   endif()

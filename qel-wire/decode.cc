@@ -1,86 +1,76 @@
 #include "decode.h"
 
-#include <google/protobuf/io/coded_stream.h>
-#include <google/protobuf/message.h>
-
-#include <limits>
-#include <memory>
-#include <stdexcept>
-
-#include "forms.h"
-#include "schema.h"
 #include "token.h"
 
 namespace qel_wire {
 namespace {
 
-using google::protobuf::Descriptor;
-using google::protobuf::Message;
-using google::protobuf::io::CodedInputStream;
-
-// Looks for fields that no encoder writes there.
-class Order : public Visitor {
+// Looks for fields that no encoder writes there, and counts numbers and groups that are hidden.
+class Notes : public Visitor {
  public:
+  explicit Notes(const Hidden& hidden) : hidden_(hidden) {}
+
   void begin(const Piece& piece) override {
     const bool is_odd = piece.earlier.has_value() || piece.is_late;
     if (is_odd && count_++ == 0) {
-      first_ = piece;
+      first_ = piece.offset;
+    }
+    const bool may_be_left_out = piece.kind != Piece::kBytes && piece.kind != Piece::kMessage &&
+                                 piece.kind != Piece::kPacked;
+    const bool is_left_out = may_be_left_out && hidden_.hides_field(piece);
+    left_out_ += is_left_out && hidden_groups_ == 0 ? 1 : 0;
+    if (piece.kind == Piece::kGroup && (is_left_out || hidden_groups_ > 0)) {
+      ++hidden_groups_;
     }
   }
 
-  std::optional<std::string> note() const {
-    if (count_ == 0) {
-      return std::nullopt;
+  void end(const Piece& piece) override {
+    if (piece.kind == Piece::kGroup && hidden_groups_ > 0) {
+      --hidden_groups_;
     }
-    return counted(count_, "field") + " again or out of order, the first at offset " +
-           std::to_string(first_.offset) +
-           ": these may be two messages, of which the later one's values are kept ('qel-wire "
-           "explain' marks them)";
+  }
+
+  void add_to(std::vector<std::string>* notes) const {
+    if (count_ > 0) {
+      notes->push_back(counted(count_, "field") + " again or out of order, the first at offset " +
+                       std::to_string(first_) +
+                       ": these may be two messages, of which the later one's values are kept "
+                       "('qel-wire explain' marks them)");
+    }
+    if (left_out_ > 0) {
+      notes->push_back("without " + counted(left_out_, "field") +
+                       " that may be a piece of an access token: --show-token shows them");
+    }
   }
 
  private:
+  const Hidden& hidden_;
   size_t count_ = 0;
-  Piece first_;
+  size_t first_ = 0;  // offset
+  size_t left_out_ = 0;
+  size_t hidden_groups_ = 0;  // around the next piece
 };
-
-std::unique_ptr<Message> parsed(std::string_view bytes, const Descriptor& type) {
-  std::unique_ptr<Message> message = new_message(type);
-  CodedInputStream stream(reinterpret_cast<const google::protobuf::uint8*>(bytes.data()),
-                          static_cast<int>(bytes.size()));
-  // What stands for hidden texts may be longer than they.
-  stream.SetTotalBytesLimit(std::numeric_limits<int>::max(), -1);
-  if (!message->ParseFromCodedStream(&stream)) {
-    throw std::logic_error("the message's class does not take what was read");
-  }
-  return message;
-}
 
 }  // namespace
 
-Decoded decode(std::string_view bytes, const Descriptor& type, const DecodeOptions& options) {
+Decoded decode(std::string_view bytes, const google::protobuf::Descriptor& type,
+               const DecodeOptions& options, std::ostream* out) {
   Decoded result;
-  Order order;
-  result.problem = walk(bytes, type, &order);
-  if (result.problem.has_value()) {
-    return result;
-  }
-  if (const auto note = order.note()) {
-    result.notes.push_back(*note);
-  }
   const Hidden hidden = options.show_token ? Hidden() : Hidden(bytes, type);
-  const Censored shown = censored(bytes, type, hidden);
-  if (shown.left_out > 0) {
-    result.notes.push_back("without " + counted(shown.left_out, "field") +
-                           " that may be a piece of an access token: --show-token shows them");
+  Notes notes(hidden);
+  result.problem = walk(bytes, type, &notes);
+  if (result.problem.has_value()) {
+    if (!options.is_partial) {
+      return result;
+    }
+    bytes = bytes.substr(0, result.problem->readable);
   }
-  const auto message = parsed(shown.bytes, type);
+  notes.add_to(&result.notes);
   if (!options.as_json) {
-    result.text = text_form(*message, options.colours);
-    return result;
-  }
-  result.text = json_form(*message, options.colours);
-  if (const int unknown = unknown_fields(*message)) {
-    result.notes.push_back("without " + counted(static_cast<size_t>(unknown), "unknown field") +
+    print_text(bytes, type, hidden, options.bytes_form, options.colours, out);
+  } else if (const size_t unknown =
+                 print_json(bytes, type, hidden, options.bytes_form, options.colours, out)) {
+    result.notes.push_back("without " + counted(unknown, "unknown field") +
                            ", which JSON has no place for");
   }
   return result;

@@ -4,10 +4,12 @@
 #include <google/protobuf/descriptor.h>
 
 #include <optional>
+#include <ostream>
 #include <string>
 #include <string_view>
 #include <vector>
 
+#include "print.h"
 #include "text.h"
 #include "walk.h"
 
@@ -15,18 +17,20 @@ namespace qel_wire {
 
 struct DecodeOptions {
   Colours colours{false};
+  BytesForm bytes_form = BytesForm::kUsual;
   bool as_json = false;
   bool show_token = false;
+  bool is_partial = false;  // of broken bytes: the fields before the place
 };
 
 struct Decoded {
-  std::string text;                // of the message, in the text form or as JSON
-  std::vector<std::string> notes;  // what that does not tell
-  std::optional<Problem> problem;  // of broken bytes, which have neither
+  std::vector<std::string> notes;  // what the output does not tell
+  std::optional<Problem> problem;  // of broken bytes
 };
 
+// Writes the message in the text form or as JSON; nothing of broken bytes, unless it is partial.
 Decoded decode(std::string_view bytes, const google::protobuf::Descriptor& type,
-               const DecodeOptions& options);
+               const DecodeOptions& options, std::ostream* out);
 
 }  // namespace qel_wire
 

@@ -2,8 +2,10 @@
 
 #include <algorithm>
 #include <cstdio>
+#include <nlohmann/json.hpp>
 #include <string>
 #include <utility>
+#include <vector>
 
 #include "token.h"
 #include "walk.h"
@@ -11,47 +13,16 @@
 namespace qel_wire {
 namespace {
 
-using google::protobuf::EnumValueDescriptor;
 using google::protobuf::FieldDescriptor;
+using Doubts = std::vector<std::string>;
 
 constexpr size_t kBytesInRow = 8;
 constexpr size_t kMostShown = 4 * kBytesInRow;  // of a field's bytes, and of a text's
 
-std::string printed(const char* format, uint64_t number) {
-  char text[32];
-  std::snprintf(text, sizeof text, format, static_cast<unsigned long long>(number));
+std::string in_hex(const char* format, size_t number) {
+  char text[24];
+  std::snprintf(text, sizeof text, format, number);
   return text;
-}
-
-std::string known_number(const Piece& piece) {
-  switch (piece.field->type()) {
-    case FieldDescriptor::TYPE_INT32:
-      return std::to_string(piece.low_32_bits());
-    case FieldDescriptor::TYPE_ENUM: {
-      const int number = piece.low_32_bits();
-      const EnumValueDescriptor* member = piece.field->enum_type()->FindValueByNumber(number);
-      return member != nullptr ? member->name() + " (" + std::to_string(number) + ")"
-                               : std::to_string(number);
-    }
-    case FieldDescriptor::TYPE_BOOL:
-      return piece.value != 0 ? "true" : "false";
-    default:
-      return std::to_string(static_cast<int64_t>(piece.value));
-  }
-}
-
-// What is to be said against a piece that is doubtful.
-std::string doubt_about(const Piece& piece) {
-  switch (piece.field->type()) {
-    case FieldDescriptor::TYPE_INT32:
-      return "more than 32 bits: " + std::to_string(static_cast<int64_t>(piece.value));
-    case FieldDescriptor::TYPE_ENUM:
-      return "not in " + piece.field->enum_type()->name() + ", reads as absent";
-    case FieldDescriptor::TYPE_BOOL:
-      return "neither 0 nor 1";
-    default:
-      return "not UTF-8";
-  }
 }
 
 const char* wire_type_name(Piece::Kind kind) {
@@ -76,49 +47,150 @@ std::string type_name(const FieldDescriptor& field) {
   return field.enum_type() != nullptr ? field.enum_type()->name() : field.type_name();
 }
 
-class Explanation : public Visitor {
+std::string type_of(const Piece& piece) {
+  return piece.is_known ? type_name(*piece.field) : wire_type_name(piece.kind);
+}
+
+// ---- What is to be said against a piece
+
+void doubt_field(const Piece& piece, Doubts* doubts) {
+  if (piece.number == 0) {
+    doubts->push_back("field number 0, which no message can have");
+  } else if (piece.field == nullptr) {
+    doubts->push_back("unknown field");
+  } else if (!piece.is_known) {
+    doubts->push_back("unknown field: " + piece.field->name() + " is " + type_name(*piece.field));
+  }
+}
+
+std::string doubt_about_value(const Piece& piece) {
+  if (piece.is_no_member()) {
+    return "not in " + piece.field->enum_type()->name() + ", reads as absent";
+  }
+  switch (piece.field->type()) {
+    case FieldDescriptor::TYPE_BOOL:
+      return "neither 0 nor 1";
+    case FieldDescriptor::TYPE_STRING:
+      return "not UTF-8";
+    default:
+      return "more than 32 bits: " + std::to_string(static_cast<int64_t>(piece.value));
+  }
+}
+
+void doubt_encoding(const Piece& piece, Doubts* doubts) {
+  constexpr std::pair<Piece::Oddity, const char*> kOddities[] = {
+      {Piece::kLongTag, "the tag has more bytes than it needs"},
+      {Piece::kCutTag, "the tag has more than 32 bits, the others are dropped"},
+      {Piece::kLongLength, "the length has more bytes than it needs"},
+      {Piece::kCutLength, "the length has more than 32 bits, the others are dropped"},
+      {Piece::kLongNumber, "the number has more bytes than it needs"},
+      {Piece::kCutNumber, "the number has more than 64 bits, the others are dropped"},
+  };
+  for (const auto& [oddity, text] : kOddities) {
+    if ((piece.oddities & oddity) != 0) {
+      doubts->push_back(text);
+    }
+  }
+}
+
+void doubt_place(const Piece& piece, Doubts* doubts) {
+  if (piece.kind == Piece::kPacked) {
+    doubts->push_back("no encoder of this protocol packs");
+  }
+  if (piece.is_short()) {
+    doubts->push_back("its length is " + std::to_string(piece.length) + ", more than there is");
+  }
+  if (piece.earlier.has_value()) {
+    doubts->push_back((piece.kind == Piece::kMessage ? "again, merged with that at offset "
+                                                     : "again, replaces that at offset ") +
+                      std::to_string(*piece.earlier));
+  } else if (piece.is_late) {
+    doubts->push_back("behind a field with a higher number");
+  }
+}
+
+// A hidden text's characters are not told.
+Doubts doubts_of(const Piece& piece) {
+  Doubts doubts;
+  doubt_field(piece, &doubts);
+  if (piece.is_doubtful()) {
+    doubts.push_back(doubt_about_value(piece));
+  }
+  if (piece.is_known && piece.field->type() == FieldDescriptor::TYPE_STRING && !piece.is_hidden &&
+      is_utf8(piece.bytes)) {
+    const std::string invisible = invisible_characters(piece.bytes);
+    if (!invisible.empty()) {
+      doubts.push_back("invisible: " + invisible);
+    }
+  }
+  doubt_encoding(piece, &doubts);
+  doubt_place(piece, &doubts);
+  return doubts;
+}
+
+// ---- Rows
+
+struct Row {
+  size_t offset = 0;
+  size_t end = 0;        // of the bytes that belong to no other row
+  size_t shown_end = 0;  // of those that are shown
+  int depth = 0;
+  const Piece* piece = nullptr;  // null for the others
+  std::string meaning;           // of the others
+  bool is_problem = false;
+  Doubts doubts;
+};
+
+class Rows {
  public:
-  Explanation(std::string_view bytes, const Hidden& hidden, const ExplainOptions& options,
-              std::ostream* out)
+  virtual ~Rows() = default;
+  virtual void begin(const Piece& /*container*/) {}
+  virtual void end() {}
+  virtual void write(const Row& row) = 0;
+};
+
+// For people.
+class Table : public Rows {
+ public:
+  Table(std::string_view bytes, const Hidden& hidden, const ExplainOptions& options,
+        std::ostream* out)
       : bytes_(bytes), hidden_(hidden), options_(options), colours_(options.colours), out_(*out) {}
 
-  void begin(const Piece& piece) override {
-    const bool is_text = piece.kind == Piece::kBytes;
-    const bool is_hidden_text = is_text && hidden_.hides_text(piece);
-    const size_t end = piece.is_container() || is_hidden_text ? piece.value_offset : piece.end;
-    if (!is_text && hidden_.hides_field(piece)) {
-      leave_out(piece.offset, end, piece.depth);
-      return;
-    }
-    row(piece.offset, end, piece.depth,
-        name_of(piece) + type_of(piece) +
-            (is_hidden_text ? not_shown(piece.bytes.size()) : value_of(piece)) + doubts_of(piece));
-  }
-
-  void end(const Piece& piece) override {
-    if (piece.kind != Piece::kGroup) {  // others have no bytes at their end
-      return;
-    }
-    if (hidden_.hides_end(piece)) {
-      leave_out(piece.end_tag, piece.end, piece.depth);
-    } else {
-      row(piece.end_tag, piece.end, piece.depth, std::to_string(piece.number) + " end of group");
-    }
-  }
-
-  // What is left to be written, behind all pieces.
-  void finish(const std::optional<Problem>& problem) {
-    write_left_out();
-    if (problem.has_value()) {
-      row(problem->begin, problem->end, problem->depth,
-          colours_.wrong + "broken at offset " + std::to_string(problem->offset) + ": " +
-              problem->reason + colours_.end);
+  void write(const Row& row) override {
+    const size_t size = row.shown_end - row.offset;
+    const size_t shown = options_.show_all ? size : std::min(size, kMostShown);
+    size_t at = 0;
+    do {
+      const size_t in_row = std::min(shown - at, kBytesInRow);
+      out_ << colours_.quiet << in_hex("%06zx", row.offset + at) << colours_.end << ' ';
+      for (size_t byte = row.offset + at; byte < row.offset + at + in_row; ++byte) {
+        out_ << (hidden_.at(byte) ? " **"
+                                  : in_hex(" %02zx", static_cast<unsigned char>(bytes_[byte])));
+      }
+      if (at == 0) {
+        const size_t indent = 2 * static_cast<size_t>(row.depth);
+        out_ << std::string(3 * (kBytesInRow - in_row) + 2 + indent, ' ') << meaning_of(row);
+      }
+      out_ << '\n';
+      at += in_row;
+    } while (at < shown);
+    if (shown < size) {
+      out_ << std::string(8, ' ') << "... " << counted(size - shown, "more byte") << '\n';
     }
   }
 
  private:
-  std::string doubt(const std::string& text) const {
-    return text.empty() ? "" : "  " + colours_.doubt + "! " + text + colours_.end;
+  std::string meaning_of(const Row& row) const {
+    if (row.is_problem) {
+      return colours_.wrong + row.meaning + colours_.end;
+    }
+    std::string doubts;
+    for (const std::string& doubt : row.doubts) {
+      doubts += (doubts.empty() ? "" : "; ") + doubt;
+    }
+    return (row.piece != nullptr ? name_of(*row.piece) + type_of(*row.piece) + value_of(*row.piece)
+                                 : row.meaning) +
+           (doubts.empty() ? "" : "  " + colours_.doubt + "! " + doubts + colours_.end);
   }
 
   std::string name_of(const Piece& piece) const {
@@ -128,16 +200,6 @@ class Explanation : public Visitor {
                : std::to_string(piece.number) + " " + colours_.name + name + colours_.end + " ";
   }
 
-  static std::string type_of(const Piece& piece) {
-    const bool is_packed = piece.kind == Piece::kPacked;
-    return (piece.is_known ? type_name(*piece.field) : wire_type_name(piece.kind)) +
-           std::string(is_packed ? ", packed" : "");
-  }
-
-  static std::string not_shown(size_t size) {
-    return " = " + std::string(kNotShown) + ", " + counted(size, "byte");
-  }
-
   std::string coloured(const std::string& value) const {
     return " = " + colours_.value + value + colours_.end;
   }
@@ -145,24 +207,45 @@ class Explanation : public Visitor {
   std::string value_of(const Piece& piece) const {
     switch (piece.kind) {
       case Piece::kVarint:
-        return coloured(piece.is_known ? known_number(piece)
-                                       : std::to_string(static_cast<int64_t>(piece.value)));
+        return coloured(number_of(piece)) + time_beside(piece);
       case Piece::kFixed64:
-        return coloured(printed("0x%016llx", piece.value));
       case Piece::kFixed32:
-        return coloured(printed("0x%08llx", piece.value));
-      case Piece::kBytes: {
-        const size_t shown = options_.show_all ? piece.bytes.size() : kMostShown;
-        const bool is_cut = piece.bytes.size() > shown;
-        return coloured(in_quotes(piece.bytes.substr(0, whole_characters(piece.bytes, shown))) +
-                        (is_cut ? "..." : "")) +
-               ", " + counted(piece.bytes.size(), "byte");
-      }
+        return coloured(value_in_text(piece, options_.bytes_form));
+      case Piece::kBytes:
+        return text_of(piece);
       case Piece::kGroup:
         return "";
       default:
-        return ", " + counted(piece.end - piece.value_offset, "byte");
+        return (piece.kind == Piece::kPacked ? ", packed, " : ", ") +
+               counted(piece.end - piece.value_offset, "byte");
     }
+  }
+
+  std::string number_of(const Piece& piece) const {
+    if (!piece.is_known) {
+      return std::to_string(static_cast<int64_t>(piece.value));
+    }
+    const std::string value = value_in_text(piece, options_.bytes_form);
+    const bool has_name = piece.field->enum_type() != nullptr && !piece.is_no_member();
+    return has_name ? value + " (" + std::to_string(piece.low_32_bits()) + ")" : value;
+  }
+
+  std::string time_beside(const Piece& piece) const {
+    const std::string time = time_of(piece);
+    return time.empty() ? "" : "  " + colours_.quiet + "(" + time + ")" + colours_.end;
+  }
+
+  std::string text_of(const Piece& piece) const {
+    const std::string size = ", " + counted(piece.end - piece.value_offset, "byte");
+    if (piece.is_hidden) {
+      return " = " + std::string(piece.bytes) + size;
+    }
+    const size_t shown = options_.show_all ? piece.bytes.size() : kMostShown;
+    Piece beginning = piece;
+    beginning.bytes = piece.bytes.substr(0, whole_characters(piece.bytes, shown));
+    return coloured(value_in_text(beginning, options_.bytes_form) +
+                    (piece.bytes.size() > shown ? "..." : "")) +
+           size;
   }
 
   // Not in the middle of a character.
@@ -177,90 +260,153 @@ class Explanation : public Visitor {
     return end;
   }
 
-  std::string doubts_of(const Piece& piece) const {
-    const std::string value = doubt_about_value(piece);
-    const std::string place = doubt_about_place(piece);
-    return doubt(value + (value.empty() || place.empty() ? "" : "; ") + place);
-  }
-
-  static std::string doubt_about_value(const Piece& piece) {
-    if (piece.field == nullptr) {
-      return "unknown field";
-    }
-    if (!piece.is_known) {
-      return "unknown field: " + piece.field->name() + " is " + type_name(*piece.field);
-    }
-    if (piece.is_short()) {
-      return "its length is " + std::to_string(piece.length) + ", more than there is";
-    }
-    return piece.is_doubtful() ? doubt_about(piece) : "";
-  }
-
-  static std::string doubt_about_place(const Piece& piece) {
-    if (piece.earlier.has_value()) {
-      return (piece.kind == Piece::kMessage ? "again, merged with that at offset "
-                                            : "again, replaces that at offset ") +
-             std::to_string(*piece.earlier);
-    }
-    return piece.is_late ? "behind a field with a higher number" : "";
-  }
-
-  // Pieces that are not shown have one row for those that follow each other.
-  void leave_out(size_t offset, size_t end, int depth) {
-    if (left_out_.begin == left_out_.end) {
-      left_out_ = {offset, offset, depth};
-    }
-    left_out_.end = end;
-  }
-
-  void write_left_out() {
-    const LeftOut range = std::exchange(left_out_, {});
-    if (range.begin != range.end) {
-      write_row(range.begin, range.begin, range.depth, "?" + not_shown(range.end - range.begin));
-    }
-  }
-
-  void row(size_t offset, size_t end, int depth, const std::string& meaning) {
-    write_left_out();
-    write_row(offset, end, depth, meaning);
-  }
-
-  void write_row(size_t offset, size_t end, int depth, const std::string& meaning) {
-    const size_t size = end - offset;
-    const size_t shown = options_.show_all ? size : std::min(size, kMostShown);
-    size_t at = 0;
-    do {
-      const size_t in_row = std::min(shown - at, kBytesInRow);
-      out_ << colours_.quiet << printed("%06llx", offset + at) << colours_.end << ' ';
-      for (size_t i = 0; i < in_row; ++i) {
-        const size_t byte = offset + at + i;
-        out_ << (hidden_.at(byte) ? " **"
-                                  : printed(" %02llx", static_cast<unsigned char>(bytes_[byte])));
-      }
-      if (at == 0) {
-        out_ << std::string(3 * (kBytesInRow - in_row) + 2 + 2 * static_cast<size_t>(depth), ' ')
-             << meaning;
-      }
-      out_ << '\n';
-      at += in_row;
-    } while (at < shown);
-    if (shown < size) {
-      out_ << std::string(8, ' ') << "... " << counted(size - shown, "more byte") << '\n';
-    }
-  }
-
-  struct LeftOut {
-    size_t begin = 0;
-    size_t end = 0;
-    int depth = 0;
-  };
-
   std::string_view bytes_;
   const Hidden& hidden_;
   const ExplainOptions& options_;
   const Colours& colours_;
   std::ostream& out_;
-  LeftOut left_out_;
+};
+
+// For programs.
+class JsonLines : public Rows {
+ public:
+  JsonLines(const ExplainOptions& options, std::ostream* out)
+      : form_(options.bytes_form), message_(options.message), out_(*out) {}
+
+  void begin(const Piece& container) override { path_.push_back(step(container)); }
+  void end() override { path_.pop_back(); }
+
+  void write(const Row& row) override {
+    nlohmann::ordered_json line;
+    if (message_ > 0) {
+      line["message"] = message_;
+    }
+    line["offset"] = row.offset;
+    line["end"] = row.end;
+    if (row.piece != nullptr) {
+      line["path"] = path_to(*row.piece);
+      line["type"] = type_of(*row.piece) + (row.piece->kind == Piece::kPacked ? ", packed" : "");
+      if (!row.piece->is_container()) {
+        line["value"] = value_of(*row.piece);
+      }
+    } else if (row.is_problem) {
+      line["type"] = "broken";
+    } else {
+      line["type"] = row.meaning;
+    }
+    line["doubts"] = row.is_problem ? Doubts{row.meaning} : row.doubts;
+    out_ << line.dump(-1, ' ', true, nlohmann::json::error_handler_t::replace) << '\n';
+  }
+
+ private:
+  static std::string step(const Piece& piece) {
+    return piece.is_known ? piece.field->name() : std::to_string(piece.number);
+  }
+
+  std::string path_to(const Piece& piece) const {
+    std::string path;
+    for (const std::string& part : path_) {
+      path += part + ".";
+    }
+    // An element stands in its list.
+    return piece.is_element() ? path.substr(0, path.size() - 1) : path + step(piece);
+  }
+
+  nlohmann::json value_of(const Piece& piece) const {
+    if (piece.is_known) {
+      return nlohmann::json::parse(value_in_json(piece, form_));
+    }
+    return piece.kind == Piece::kBytes ? std::string(piece.bytes) : value_in_text(piece, form_);
+  }
+
+  BytesForm form_;
+  size_t message_;
+  std::ostream& out_;
+  std::vector<std::string> path_;
+};
+
+class Explanation : public Visitor {
+ public:
+  Explanation(const Hidden& hidden, Rows* rows) : hidden_(hidden), rows_(*rows) {}
+
+  void begin(const Piece& piece) override {
+    const bool is_text = piece.kind == Piece::kBytes;
+    const size_t end = piece.is_container() ? piece.value_offset : piece.end;
+    if (!is_text && hidden_.hides_field(piece)) {
+      leave_out(piece.offset, end, piece.depth);
+    } else {
+      Piece shown = piece;
+      if (is_text && hidden_.hides_text(piece)) {
+        shown.is_hidden = true;
+        shown.bytes = kNotShown;
+      }
+      write({piece.offset, end, shown.is_hidden ? piece.value_offset : end, piece.depth, &shown, "",
+             false, doubts_of(shown)});
+    }
+    if (piece.is_container()) {
+      rows_.begin(piece);
+    }
+  }
+
+  void end(const Piece& piece) override {
+    rows_.end();
+    if (piece.kind != Piece::kGroup) {  // others have no bytes at their end
+      return;
+    }
+    if (hidden_.hides_end(piece)) {
+      leave_out(piece.end_tag, piece.end, piece.depth);
+    } else {
+      write({piece.end_tag,
+             piece.end,
+             piece.end,
+             piece.depth,
+             nullptr,
+             std::to_string(piece.number) + " end of group",
+             false,
+             {}});
+    }
+  }
+
+  // What is left to be written, behind all pieces.
+  void finish(const std::optional<Problem>& problem, size_t size) {
+    write_left_out();
+    if (problem.has_value()) {
+      rows_.write({problem->begin,
+                   size,
+                   problem->end,
+                   problem->depth,
+                   nullptr,
+                   "broken at offset " + std::to_string(problem->offset) + ": " + problem->reason,
+                   true,
+                   {}});
+    }
+  }
+
+ private:
+  // Pieces that are not shown have one row for those that follow each other.
+  void leave_out(size_t offset, size_t end, int depth) {
+    if (left_out_.offset == left_out_.end) {
+      left_out_ = {offset, offset, offset, depth, nullptr, "", false, {}};
+    }
+    left_out_.end = end;
+  }
+
+  void write_left_out() {
+    Row row = std::exchange(left_out_, {});
+    if (row.offset != row.end) {
+      row.meaning = "? = " + std::string(kNotShown) + ", " + counted(row.end - row.offset, "byte");
+      rows_.write(row);
+    }
+  }
+
+  void write(const Row& row) {
+    write_left_out();
+    rows_.write(row);
+  }
+
+  const Hidden& hidden_;
+  Rows& rows_;
+  Row left_out_;
 };
 
 }  // namespace
@@ -268,9 +414,11 @@ class Explanation : public Visitor {
 bool explain(std::string_view bytes, const google::protobuf::Descriptor& type,
              const ExplainOptions& options, std::ostream* out) {
   const Hidden hidden = options.show_token ? Hidden() : Hidden(bytes, type);
-  Explanation explanation(bytes, hidden, options, out);
+  Table table(bytes, hidden, options, out);
+  JsonLines lines(options, out);
+  Explanation explanation(hidden, options.as_json ? static_cast<Rows*>(&lines) : &table);
   const std::optional<Problem> problem = walk(bytes, type, &explanation);
-  explanation.finish(problem);
+  explanation.finish(problem, bytes.size());
   return !problem.has_value();
 }
 

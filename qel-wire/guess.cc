@@ -1,77 +1,243 @@
 #include "guess.h"
 
 #include <algorithm>
-#include <bitset>
+#include <map>
+#include <memory>
 #include <tuple>
 
-#include "msgspec_frontend.pb.h"
 #include "walk.h"
 
 namespace qel_wire {
 namespace {
 
 using google::protobuf::Descriptor;
-using google::protobuf::FileDescriptor;
+using google::protobuf::FieldDescriptor;
 
+// Counts what the bytes of one field have in them.
 class Fitting : public Visitor {
  public:
-  explicit Fitting(Fit* fit) : fit_(*fit) {}
-
   void begin(const Piece& piece) override {
     if (!piece.is_known) {
-      ++fit_.unknown;
+      ++unknown;
     } else if (!piece.is_element()) {
-      ++fit_.known;
-      if (piece.depth == 0) {
-        different_.set(static_cast<size_t>(piece.field->index()));
-      }
+      ++known;
+      last_number = piece.depth == 0 ? piece.number : last_number;
     }
-    // Packed lists are taken and never written.
-    if (piece.kind == Piece::kPacked || piece.is_doubtful()) {
-      ++fit_.doubtful;
-    }
-    // Encoders write fields in the order of their numbers.
-    if (piece.earlier.has_value() || piece.is_late) {
-      ++fit_.doubtful;
+    doubtful += (piece.is_doubtful() ? 1U : 0U) + (piece.is_odd() ? 1U : 0U);
+  }
+
+  size_t known = 0;
+  size_t unknown = 0;
+  size_t doubtful = 0;
+  uint32_t last_number = 0;  // of a known field of the message itself
+};
+
+// A field that many messages have alike: they read its bytes in the same way.
+struct Field {
+  const FieldDescriptor* descriptor;  // of one of them
+  size_t count = 0;                   // how often it was there
+  size_t odd = 0;                     // how often no encoder writes it so
+  size_t first = 0;                   // when it was there first
+  Fitting fitting;
+  std::vector<size_t> counts;  // of all fields, when it was there first
+
+  bool is_like(const FieldDescriptor& other) const {
+    return other.number() == descriptor->number() && other.type() == descriptor->type() &&
+           other.is_repeated() == descriptor->is_repeated() &&
+           other.enum_type() == descriptor->enum_type() &&
+           other.message_type() == descriptor->message_type();
+  }
+
+  bool takes(Piece::Kind kind) const {
+    const auto type = descriptor->cpp_type();
+    const bool is_number =
+        type != FieldDescriptor::CPPTYPE_STRING && type != FieldDescriptor::CPPTYPE_MESSAGE;
+    return kind == Piece::kVarint
+               ? is_number
+               : kind == Piece::kBytes && (!is_number || descriptor->is_packable());
+  }
+};
+
+struct Candidate {
+  const Descriptor* type;
+  std::vector<size_t> fields;  // their indices, by their numbers
+  bool is_over = false;        // broken before the end
+  Fit fit;
+};
+
+// Reads the bytes once, for all messages: there are 81, and captures are large.
+class Race {
+ public:
+  explicit Race(std::string_view bytes) : bytes_(bytes) {
+    for (int i = 0; i < schema_file().message_type_count(); ++i) {
+      enter(*schema_file().message_type(i));
     }
   }
 
-  // Of the message itself: how many of its fields it had.
-  size_t different_fields() const { return different_.count(); }
+  std::vector<Candidate> run() && {
+    Reader reader(bytes_);
+    Level level(nullptr, bytes_.size(), 0);
+    size_t end = 0;
+    for (Piece piece; reader.next(&level, &piece); end = piece.end) {
+      reader.skip(&piece, level);
+      if (reader.problem().has_value()) {
+        break;
+      }
+      take(piece);
+    }
+    for (Candidate& candidate : candidates_) {
+      if (!candidate.is_over) {
+        finish(&candidate, bytes_.substr(end));
+      }
+    }
+    return std::move(candidates_);
+  }
 
  private:
-  Fit& fit_;
-  std::bitset<64> different_;  // by their indices; no message of the schema has more fields
+  void enter(const Descriptor& type) {
+    Candidate candidate{&type, {}, false, {}};
+    for (int i = 0; i < type.field_count(); ++i) {
+      const FieldDescriptor& descriptor = *type.field(i);
+      const auto alike = std::find_if(fields_.begin(), fields_.end(), [&](const Field& field) {
+        return field.is_like(descriptor);
+      });
+      candidate.fields.push_back(static_cast<size_t>(alike - fields_.begin()));
+      if (alike == fields_.end()) {
+        const auto number = static_cast<size_t>(descriptor.number());
+        by_number_.resize(std::max(by_number_.size(), number + 1));
+        by_number_[number].push_back(fields_.size());
+        fields_.push_back({&descriptor, 0, 0, 0, {}, {}});
+      }
+    }
+    std::sort(candidate.fields.begin(), candidate.fields.end(), [this](size_t a, size_t b) {
+      return fields_[a].descriptor->number() < fields_[b].descriptor->number();
+    });
+    candidates_.push_back(candidate);
+  }
+
+  void take(const Piece& piece) {
+    ++count_;
+    odd_ += piece.is_odd() ? 1 : 0;
+    if (piece.number >= by_number_.size()) {
+      return;
+    }
+    for (const size_t index : by_number_[piece.number]) {
+      if (fields_[index].takes(piece.kind)) {
+        take(piece, index);
+      }
+    }
+  }
+
+  void take(const Piece& piece, size_t index) {
+    Field& field = fields_[index];
+    if (field.count == 0) {
+      field.first = count_;
+      for (const Field& other : fields_) {
+        field.counts.push_back(other.count);
+      }
+    }
+    ++field.count;
+    field.odd += piece.is_odd() ? 1 : 0;
+    if (piece.kind == Piece::kVarint) {
+      Piece known = piece;
+      known.field = field.descriptor;
+      known.is_known = true;
+      field.fitting.begin(known);
+    } else if (walk(bytes_.substr(piece.offset, piece.end - piece.offset),
+                    *field.descriptor->containing_type(), &field.fitting)) {
+      end_all_with(index);
+    }
+  }
+
+  // A field is broken, and so are the messages that have it.
+  void end_all_with(size_t index) {
+    for (Candidate& candidate : candidates_) {
+      const auto& fields = candidate.fields;
+      if (!candidate.is_over && std::find(fields.begin(), fields.end(), index) != fields.end()) {
+        finish(&candidate, "");
+        candidate.fit.is_broken = candidate.is_over = true;
+      }
+    }
+  }
+
+  // The rest is a field that reaches behind the end, which messages and lists may do.
+  void finish(Candidate* candidate, std::string_view rest) {
+    Fitting all;
+    candidate->fit.is_broken = walk(rest, *candidate->type, &all).has_value();
+    const auto number_in_rest = static_cast<int>(all.last_number);
+    size_t unknown = count_;
+    size_t odd = odd_;  // of unknown fields; of others it is counted with them
+    for (const size_t index : candidate->fields) {
+      const Field& field = fields_[index];
+      all.known += field.fitting.known;
+      all.unknown += field.fitting.unknown;
+      all.doubtful += field.fitting.doubtful + out_of_place(*candidate, field);
+      unknown -= field.count;
+      odd -= field.odd;
+      const bool is_absent = field.count == 0 && field.descriptor->number() != number_in_rest;
+      candidate->fit.absent += is_absent ? 1 : 0;
+    }
+    candidate->fit.known = all.known;
+    candidate->fit.unknown = all.unknown + unknown;
+    candidate->fit.doubtful = all.doubtful + odd;
+  }
+
+  // How often the field was there again, though it is not repeated, or behind one with a higher
+  // number.
+  size_t out_of_place(const Candidate& candidate, const Field& field) const {
+    const Field* first_behind = nullptr;
+    for (const size_t index : candidate.fields) {
+      const Field& other = fields_[index];
+      if (other.descriptor->number() > field.descriptor->number() && other.count > 0 &&
+          (first_behind == nullptr || other.first < first_behind->first)) {
+        first_behind = &other;
+      }
+    }
+    if (field.count == 0) {
+      return 0;
+    }
+    const auto index = static_cast<size_t>(&field - fields_.data());
+    const size_t before = first_behind == nullptr ? field.count : first_behind->counts[index];
+    const size_t late = field.count - before;
+    return field.descriptor->is_repeated() ? late : field.count - (before == 0 ? 0 : 1);
+  }
+
+  std::string_view bytes_;
+  std::vector<Field> fields_;
+  std::vector<std::vector<size_t>> by_number_;
+  std::vector<Candidate> candidates_;
+  size_t count_ = 0;  // of fields in the bytes
+  size_t odd_ = 0;
 };
 
-Fit fit(std::string_view bytes, const Descriptor& type) {
-  Fit result;
-  result.type = &type;
-  Fitting fitting(&result);
-  result.is_broken = walk(bytes, type, &fitting).has_value();
-  result.absent = static_cast<size_t>(type.field_count()) - fitting.different_fields();
-  return result;
+auto quality(const Fit& fit) {
+  return std::tuple(fit.is_broken, fit.is_record, fit.unknown + fit.doubtful, fit.unknown,
+                    fit.absent, -static_cast<int64_t>(fit.known));
 }
 
-auto quality(const Fit& fit) {
-  return std::tuple(fit.is_broken, fit.unknown + fit.doubtful, fit.unknown, fit.absent);
+bool is_possible(const Descriptor& type, Use use) {
+  const Use usual = use_of(type);
+  return use == Use::kNone || usual == Use::kNone || usual == use;
 }
 
 }  // namespace
 
-std::vector<Fit> guess(std::string_view bytes) {
-  const FileDescriptor& schema = *ChannelAuthRequest::descriptor()->file();
-  std::vector<Fit> fits;
-  for (int i = 0; i < schema.message_type_count(); ++i) {
-    fits.push_back(fit(bytes, *schema.message_type(i)));
+std::vector<Fit> guess(std::string_view bytes, Use use) {
+  std::map<decltype(quality(Fit())), Fit> fits;
+  for (Candidate& candidate : Race(bytes).run()) {
+    if (is_possible(*candidate.type, use)) {
+      candidate.fit.is_record = is_record(*candidate.type);
+      fits.emplace(quality(candidate.fit), candidate.fit)
+          .first->second.types.push_back(candidate.type);
+    }
   }
-  std::stable_sort(fits.begin(), fits.end(),
-                   [](const Fit& a, const Fit& b) { return quality(a) < quality(b); });
-  for (size_t i = 0; i < fits.size(); ++i) {
-    const bool is_equal = i > 0 && quality(fits[i]) == quality(fits[i - 1]);
-    fits[i].rank = is_equal ? fits[i - 1].rank : static_cast<int>(i) + 1;
+  std::vector<Fit> result;
+  for (auto& [ignored, fit] : fits) {
+    std::stable_partition(fit.types.begin(), fit.types.end(),
+                          [](const Descriptor* type) { return use_of(*type) != Use::kNone; });
+    result.push_back(fit);
   }
-  return fits;
+  return result;
 }
 
 }  // namespace qel_wire

@@ -1,6 +1,11 @@
 #include "schema.h"
 
+#include <strings.h>
+
+#include <algorithm>
+#include <map>
 #include <set>
+#include <sstream>
 #include <utility>
 
 #include "msgspec_frontend.pb.h"
@@ -10,12 +15,22 @@ namespace {
 
 using google::protobuf::Descriptor;
 using google::protobuf::EnumDescriptor;
+using google::protobuf::FieldDescriptor;
 using google::protobuf::FileDescriptor;
 using google::protobuf::Message;
 using google::protobuf::MessageFactory;
 
-const FileDescriptor& file() {
-  return *ChannelAuthRequest::descriptor()->file();
+bool is_equal(const std::string& a, const std::string& b) {
+  return strcasecmp(a.c_str(), b.c_str()) == 0;
+}
+
+const EnumDescriptor* enumeration_named(const std::string& name) {
+  for (int i = 0; i < schema_file().enum_type_count(); ++i) {
+    if (is_equal(schema_file().enum_type(i)->name(), name)) {
+      return schema_file().enum_type(i);
+    }
+  }
+  return nullptr;
 }
 
 // With all that it contains, but for what was shown before.
@@ -34,43 +49,97 @@ std::string definition(const Descriptor& message, std::set<std::string>* shown) 
   return text;
 }
 
-// The name before the number of a field or a member.
-std::pair<size_t, size_t> find_name(const std::string& line) {
-  const size_t end = line.find(" = ");
-  return end != std::string::npos ? std::pair(line.rfind(' ', end - 1) + 1, end)
-                                  : std::pair<size_t, size_t>(0, 0);
+// Colours the names before the numbers of fields and members.
+std::string with_coloured_names(const std::string& text, const Colours& colours) {
+  std::string result;
+  std::istringstream lines(text);
+  for (std::string line; std::getline(lines, line);) {
+    const size_t end = line.find(" = ");
+    if (end != std::string::npos) {
+      line.insert(end, colours.end).insert(line.rfind(' ', end - 1) + 1, colours.name);
+    }
+    result += line + "\n";
+  }
+  return result;
 }
 
 }  // namespace
 
+const FileDescriptor& schema_file() {
+  return *ChannelAuthRequest::descriptor()->file();
+}
+
 const Descriptor* message_named(const std::string& name) {
-  return file().FindMessageTypeByName(name);
+  for (int i = 0; i < schema_file().message_type_count(); ++i) {
+    if (is_equal(schema_file().message_type(i)->name(), name)) {
+      return schema_file().message_type(i);
+    }
+  }
+  return nullptr;
 }
 
 std::unique_ptr<Message> new_message(const Descriptor& type) {
   return std::unique_ptr<Message>(MessageFactory::generated_factory()->GetPrototype(&type)->New());
 }
 
-std::string schema_names() {
-  std::string names;
-  for (int i = 0; i < file().message_type_count(); ++i) {
-    names += file().message_type(i)->name() + "\n";
+std::vector<std::string> message_names() {
+  std::vector<std::string> names;
+  for (int i = 0; i < schema_file().message_type_count(); ++i) {
+    names.push_back(schema_file().message_type(i)->name());
   }
-  for (int i = 0; i < file().enum_type_count(); ++i) {
-    names += file().enum_type(i)->name() + "\n";
+  return names;
+}
+
+std::vector<std::string> enumeration_names() {
+  std::vector<std::string> names;
+  for (int i = 0; i < schema_file().enum_type_count(); ++i) {
+    names.push_back(schema_file().enum_type(i)->name());
   }
   return names;
 }
 
 std::string schema_of(const std::string& name, const Colours& colours) {
-  std::set<std::string> shown{name};
   if (const Descriptor* message = message_named(name)) {
-    return with_coloured_names(definition(*message, &shown), colours, find_name);
+    std::set<std::string> shown{message->name()};
+    return with_coloured_names(definition(*message, &shown), colours);
   }
-  const EnumDescriptor* enumeration = file().FindEnumTypeByName(name);
-  return enumeration != nullptr
-             ? with_coloured_names(enumeration->DebugString(), colours, find_name)
-             : "";
+  const EnumDescriptor* enumeration = enumeration_named(name);
+  return enumeration != nullptr ? with_coloured_names(enumeration->DebugString(), colours) : "";
+}
+
+bool is_time(const FieldDescriptor& field) {
+  const std::string& name = field.name();
+  const auto ends_in = [&](std::string_view end) {
+    return name.size() >= end.size() &&
+           name.compare(name.size() - end.size(), end.size(), end) == 0;
+  };
+  return field.type() == FieldDescriptor::TYPE_INT64 &&
+         (ends_in("Time") || ends_in("TimeMillis") || ends_in("imestamp"));
+}
+
+bool may_be_request_id(uint32_t number) {
+  return number == static_cast<uint32_t>(ChatRequest::kRequestIdFieldNumber) ||
+         number == static_cast<uint32_t>(ClientEcho::kRequestIdFieldNumber);
+}
+
+bool is_record(const Descriptor& type) {
+  const FileDescriptor& file = schema_file();
+  for (int i = 0; i < file.message_type_count(); ++i) {
+    for (int f = 0; f < file.message_type(i)->field_count(); ++f) {
+      if (file.message_type(i)->field(f)->message_type() == &type) {
+        return true;
+      }
+    }
+  }
+  return false;
+}
+
+Use use_of(const Descriptor& type) {
+  static const std::map<std::string, Use> uses = {
+#include "interface.inc"
+  };
+  const auto found = uses.find(type.name());
+  return found != uses.end() ? found->second : Use::kNone;
 }
 
 }  // namespace qel_wire

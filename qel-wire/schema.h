@@ -6,23 +6,41 @@
 
 #include <memory>
 #include <string>
+#include <vector>
 
 #include "text.h"
 
 namespace qel_wire {
 
-// Null if there is none.
+const google::protobuf::FileDescriptor& schema_file();
+
+// In any case of letters; null if there is none.
 const google::protobuf::Descriptor* message_named(const std::string& name);
 
 // An empty one.
 std::unique_ptr<google::protobuf::Message> new_message(const google::protobuf::Descriptor& type);
 
-// The names of all messages, and then of all enumerations, a line each, in the order of the schema.
-std::string schema_names();
+// The names of all messages, and then of all enumerations, in the order of the schema.
+std::vector<std::string> message_names();
+std::vector<std::string> enumeration_names();
 
 // The definition of the message or the enumeration, and of all that a message contains; empty if
-// there is none of that name.
+// there is none of that name, in any case of letters.
 std::string schema_of(const std::string& name, const Colours& colours = Colours(false));
+
+// Whether the field's number is a time, in milliseconds since 1970.
+bool is_time(const google::protobuf::FieldDescriptor& field);
+
+// Whether it is a number of a requestId. Where a message has another field there, that is its
+// userId.
+bool may_be_request_id(uint32_t number);
+
+// Whether the message is part of others, and never sent alone.
+bool is_record(const google::protobuf::Descriptor& type);
+
+// What a plug-in does with a message by the C interface.
+enum class Use { kNone, kSends, kReceives };
+Use use_of(const google::protobuf::Descriptor& type);
 
 }  // namespace qel_wire
 

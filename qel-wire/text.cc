@@ -1,13 +1,15 @@
 #include "text.h"
 
-#include <cstdint>
-#include <sstream>
+#include <utf8proc.h>
+
+#include <cstdio>
+#include <ctime>
 
 namespace qel_wire {
 namespace {
 
 struct Character {
-  uint32_t code = 0;
+  int32_t code = 0;
   size_t size = 0;  // 0: no UTF-8
 };
 
@@ -16,40 +18,38 @@ Character first_character(std::string_view text) {
   if (lead < 0x80) {
     return {lead, 1};
   }
-  // Of so many bytes the first has these bits, and the code is at least that.
-  static constexpr struct {
-    unsigned char mask, lead;
-    uint32_t least;
-  } kLengths[] = {{0xe0, 0xc0, 0x80}, {0xf0, 0xe0, 0x800}, {0xf8, 0xf0, 0x10000}};
-  size_t size = 1;
-  for (const auto& length : kLengths) {
-    ++size;
-    if ((lead & length.mask) != length.lead) {
-      continue;
-    }
-    if (text.size() < size) {
-      return {};
-    }
-    uint32_t code = lead & static_cast<unsigned char>(~length.mask);
-    for (size_t i = 1; i < size; ++i) {
-      const auto byte = static_cast<unsigned char>(text[i]);
-      if ((byte & 0xc0U) != 0x80) {
-        return {};
-      }
-      code = code << 6U | (byte & 0x3fU);
-    }
-    const bool is_surrogate = code >= 0xd800 && code <= 0xdfff;
-    return code < length.least || code > 0x10ffff || is_surrogate ? Character{}
-                                                                  : Character{code, size};
-  }
-  return {};
+  int32_t code = 0;
+  const auto size = utf8proc_iterate(reinterpret_cast<const utf8proc_uint8_t*>(text.data()),
+                                     static_cast<utf8proc_ssize_t>(text.size()), &code);
+  return size > 0 ? Character{code, static_cast<size_t>(size)} : Character{};
 }
 
-// Control characters, and those that turn the direction of writing.
-bool is_obeyed(uint32_t code) {
-  return code < 0x20 || (code >= 0x7f && code < 0xa0) || code == 0x61c || code == 0x200e ||
-         code == 0x200f || (code >= 0x2028 && code <= 0x202e) ||
-         (code >= 0x2066 && code <= 0x2069) || code == 0xfeff;
+// Control characters, ends of lines, and characters of format, which may turn the direction of
+// writing; but those that join or part the letters around them do nothing else.
+bool is_obeyed(int32_t code) {
+  if (code < 0x80) {
+    return code < 0x20 || code == 0x7f;
+  }
+  constexpr int32_t kZeroWidthNonJoiner = 0x200c;
+  constexpr int32_t kZeroWidthJoiner = 0x200d;
+  switch (utf8proc_category(code)) {
+    case UTF8PROC_CATEGORY_CC:
+    case UTF8PROC_CATEGORY_ZL:
+    case UTF8PROC_CATEGORY_ZP:
+      return true;
+    case UTF8PROC_CATEGORY_CF:
+      return code != kZeroWidthNonJoiner && code != kZeroWidthJoiner;
+    default:
+      return false;
+  }
+}
+
+bool is_invisible(int32_t code) {
+  if (code < 0x80) {
+    return is_obeyed(code) && code != '\t' && code != '\n' && code != '\r';
+  }
+  return is_obeyed(code) || utf8proc_category(code) == UTF8PROC_CATEGORY_ZS ||
+         utf8proc_get_property(code)->ignorable;
 }
 
 void append_octal(std::string_view bytes, std::string* to) {
@@ -62,18 +62,16 @@ void append_octal(std::string_view bytes, std::string* to) {
   }
 }
 
-// The text's first character, or byte if that is none, which is taken away from it.
-std::string take_readable(std::string_view* text) {
+// Takes the text's first character, or byte if that is none, away from it.
+void append_readable(std::string_view* text, std::string* to) {
   const Character character = first_character(*text);
   const std::string_view bytes = text->substr(0, character.size == 0 ? 1 : character.size);
   text->remove_prefix(bytes.size());
-  std::string result;
   if (character.size == 0 || is_obeyed(character.code)) {
-    append_octal(bytes, &result);
+    append_octal(bytes, to);
   } else {
-    result = bytes;
+    *to += bytes;
   }
-  return result;
 }
 
 }  // namespace
@@ -81,7 +79,7 @@ std::string take_readable(std::string_view* text) {
 std::string readable(std::string_view text) {
   std::string result;
   while (!text.empty()) {
-    result += take_readable(&text);
+    append_readable(&text, &result);
   }
   return result;
 }
@@ -90,14 +88,25 @@ std::string in_quotes(std::string_view text) {
   std::string result = "\"";
   while (!text.empty()) {
     const char first = text.front();
-    const std::string character = take_readable(&text);
     if (first == '\n') {
       result += "\\n";
-    } else if (first == '"' || first == '\\') {
-      result.append("\\").append(character);
-    } else {
-      result += character;
+      text.remove_prefix(1);
+      continue;
     }
+    if (first == '"' || first == '\\') {
+      result += '\\';
+    }
+    append_readable(&text, &result);
+  }
+  return result + '"';
+}
+
+std::string in_hex_escapes(std::string_view bytes) {
+  constexpr char kDigits[] = "0123456789abcdef";
+  std::string result = "\"";
+  for (const char c : bytes) {
+    const auto byte = static_cast<unsigned char>(c);
+    result += {'\\', 'x', kDigits[byte >> 4U], kDigits[byte & 15U]};
   }
   return result + '"';
 }
@@ -118,8 +127,41 @@ bool is_utf8(std::string_view text) {
   return true;
 }
 
+std::string invisible_characters(std::string_view text) {
+  constexpr size_t kMostNamed = 3;
+  std::string names;
+  size_t count = 0;
+  for (size_t at = 0; at < text.size();) {
+    const Character character = first_character(text.substr(at));
+    if (character.size > 0 && is_invisible(character.code) && count++ < kMostNamed) {
+      char name[48];
+      std::snprintf(name, sizeof name, "%sU+%04X at byte %zu", count > 1 ? ", " : "",
+                    static_cast<unsigned>(character.code), at);
+      names += name;
+    }
+    at += character.size == 0 ? 1 : character.size;
+  }
+  return count > kMostNamed ? names + " and " + std::to_string(count - kMostNamed) + " more"
+                            : names;
+}
+
 std::string counted(size_t count, const std::string& what) {
   return std::to_string(count) + " " + what + (count == 1 ? "" : "s");
+}
+
+std::string utc(int64_t milliseconds) {
+  const std::time_t seconds = milliseconds / 1000;
+  std::tm parts{};
+  gmtime_r(&seconds, &parts);
+  char date[32];
+  char text[48];
+  std::strftime(date, sizeof date, "%Y-%m-%d %H:%M:%S", &parts);
+  std::snprintf(text, sizeof text, "%s.%03d UTC", date, static_cast<int>(milliseconds % 1000));
+  return text;
+}
+
+bool is_plausible_time(int64_t milliseconds) {
+  return milliseconds > 946684800000 && milliseconds < 4102444800000;
 }
 
 Colours::Colours(bool on) {
@@ -131,20 +173,6 @@ Colours::Colours(bool on) {
     wrong = "\033[1;31m";
     end = "\033[0m";
   }
-}
-
-std::string with_coloured_names(const std::string& text, const Colours& colours,
-                                std::pair<size_t, size_t> (*find_name)(const std::string& line)) {
-  std::string result;
-  std::istringstream lines(text);
-  for (std::string line; std::getline(lines, line);) {
-    const auto [begin, end] = find_name(line);
-    if (begin < end) {
-      line.insert(end, colours.end).insert(begin, colours.name);
-    }
-    result += line + "\n";
-  }
-  return result;
 }
 
 }  // namespace qel_wire

@@ -1,11 +1,11 @@
-// What people read: texts in quotes, amounts, colours.
+// What people read: texts in quotes, amounts, times, colours.
 #ifndef QEL_WIRE_TEXT_H
 #define QEL_WIRE_TEXT_H
 
 #include <cstddef>
+#include <cstdint>
 #include <string>
 #include <string_view>
-#include <utility>
 
 namespace qel_wire {
 
@@ -15,6 +15,8 @@ std::string readable(std::string_view text);
 
 // The same in quotes, as the text form has it.
 std::string in_quotes(std::string_view text);
+// In quotes too, with every byte as \x and two digits.
+std::string in_hex_escapes(std::string_view bytes);
 
 // The bytes of the text's first character, or 0 if that is none or one that a terminal would obey.
 size_t size_of_character(std::string_view text);
@@ -22,19 +24,24 @@ size_t size_of_character(std::string_view text);
 // Whether all of it is UTF-8.
 bool is_utf8(std::string_view text);
 
+// Which characters of the text nobody sees, or takes for a blank, and where: "U+200B at byte 3", or
+// nothing. Ends of lines and tabs are none of them.
+std::string invisible_characters(std::string_view text);
+
 // "1 byte", "2 bytes"
 std::string counted(size_t count, const std::string& what);
+
+// "2023-11-14 22:13:20.000 UTC" of milliseconds since 1970.
+std::string utc(int64_t milliseconds);
+
+// Whether it may be such a time: of the years 2000 to 2099.
+bool is_plausible_time(int64_t milliseconds);
 
 // Escapes of a terminal's colours, or empty texts where there is none.
 struct Colours {
   explicit Colours(bool on);
   std::string quiet, name, value, doubt, wrong, end;
 };
-
-// The text with a name coloured in each line: find_name says from where to where it stands there,
-// which is nowhere if both are the same.
-std::string with_coloured_names(const std::string& text, const Colours& colours,
-                                std::pair<size_t, size_t> (*find_name)(const std::string& line));
 
 }  // namespace qel_wire
 

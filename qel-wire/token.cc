@@ -1,6 +1,5 @@
 #include "token.h"
 
-#include <google/protobuf/io/coded_stream.h>
 #include <google/protobuf/wire_format_lite.h>
 
 #include <algorithm>
@@ -16,7 +15,6 @@ namespace {
 using google::protobuf::Descriptor;
 using google::protobuf::FieldDescriptor;
 using google::protobuf::internal::WireFormatLite;
-using google::protobuf::io::CodedOutputStream;
 
 // So many characters in a row may be a piece of a token.
 constexpr size_t kFewestCharacters = 4;
@@ -67,11 +65,6 @@ bool is_typed(std::string_view text) {
          });
 }
 
-// A time of this century, in milliseconds.
-bool is_plausible_time(uint64_t value) {
-  return value > 946684800000 && value < 4102444800000;
-}
-
 // Finds what is hidden.
 class Search : public Visitor {
  public:
@@ -83,8 +76,7 @@ class Search : public Visitor {
   }
 
   void begin(const Piece& piece) override {
-    is_clean_ = is_clean_ && piece.is_known && piece.kind != Piece::kPacked &&
-                !piece.earlier.has_value() && !piece.is_late && !piece.is_short();
+    is_clean_ = is_clean_ && piece.is_known && !piece.is_odd();
     if (piece.is_container()) {
       levels_.emplace_back();
     }
@@ -130,7 +122,7 @@ class Search : public Visitor {
         const bool is_time = piece.number == InboxEntry::kSentTimeFieldNumber;
         has_receiver |= piece.number == InboxEntry::kReceiverFieldNumber;
         has_time |= is_time;
-        has_plausible_time |= is_time && is_plausible_time(piece.value);
+        has_plausible_time |= is_time && is_plausible_time(static_cast<int64_t>(piece.value));
       }
     }
 
@@ -183,81 +175,6 @@ class Search : public Visitor {
   std::vector<Level> levels_;  // of nesting
 };
 
-// Writes the fields again, but for what is hidden.
-class Censor : public Visitor {
- public:
-  Censor(std::string_view bytes, const Hidden& hidden)
-      : bytes_(bytes), hidden_(hidden), contents_(1) {}
-
-  void begin(const Piece& piece) override {
-    const bool is_within_left_out = contents_.back().is_left_out;
-    switch (piece.kind) {
-      case Piece::kBytes:
-        if (hidden_.hides_text(piece)) {
-          append_with_length(piece.number, kNotShown);
-        } else {
-          append(piece.offset, piece.end);
-        }
-        return;
-      case Piece::kMessage:
-      case Piece::kPacked:
-        contents_.push_back({is_within_left_out, {}});
-        return;
-      default:
-        break;
-    }
-    const bool is_hidden = hidden_.hides_field(piece);
-    left_out_ += is_hidden && !is_within_left_out ? 1 : 0;
-    if (piece.kind == Piece::kGroup) {
-      contents_.push_back({is_hidden || is_within_left_out, {}});
-    } else if (!is_hidden) {
-      append(piece.offset, piece.end);
-    }
-  }
-
-  void end(const Piece& piece) override {
-    const Content content = std::move(contents_.back());
-    contents_.pop_back();
-    if (content.is_left_out) {
-      return;
-    }
-    if (piece.kind == Piece::kGroup) {
-      append(piece.offset, piece.value_offset);
-      contents_.back().bytes += content.bytes;
-      append(piece.end_tag, piece.end);
-    } else {
-      append_with_length(piece.number, content.bytes);
-    }
-  }
-
-  Censored result() && { return {std::move(contents_.front().bytes), left_out_}; }
-
- private:
-  struct Content {
-    bool is_left_out = false;
-    std::string bytes;
-  };
-
-  void append(size_t begin, size_t end) {
-    contents_.back().bytes += bytes_.substr(begin, end - begin);
-  }
-
-  void append_with_length(uint32_t number, std::string_view value) {
-    google::protobuf::uint8 head[20];
-    auto* end = CodedOutputStream::WriteTagToArray(
-        WireFormatLite::MakeTag(static_cast<int>(number),
-                                WireFormatLite::WIRETYPE_LENGTH_DELIMITED),
-        head);
-    end = CodedOutputStream::WriteVarint32ToArray(static_cast<uint32_t>(value.size()), end);
-    contents_.back().bytes.append(head, end).append(value);
-  }
-
-  std::string_view bytes_;
-  const Hidden& hidden_;
-  std::vector<Content> contents_;
-  size_t left_out_ = 0;
-};
-
 }  // namespace
 
 Hidden::Hidden(std::string_view bytes, const Descriptor& type) {
@@ -287,12 +204,6 @@ bool Hidden::any(size_t begin, size_t end) const {
   }
   const auto last = hidden_.begin() + static_cast<std::ptrdiff_t>(end);
   return std::find(hidden_.begin() + static_cast<std::ptrdiff_t>(begin), last, true) != last;
-}
-
-Censored censored(std::string_view bytes, const Descriptor& type, const Hidden& hidden) {
-  Censor censor(bytes, hidden);
-  walk(bytes, type, &censor);
-  return std::move(censor).result();
 }
 
 }  // namespace qel_wire

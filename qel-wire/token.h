@@ -5,7 +5,6 @@
 #include <google/protobuf/descriptor.h>
 
 #include <cstddef>
-#include <string>
 #include <string_view>
 #include <vector>
 
@@ -14,7 +13,7 @@
 namespace qel_wire {
 
 // In place of what is hidden.
-constexpr char kNotShown[] = "(not shown)";
+inline constexpr char kNotShown[] = "(not shown)";
 
 // Which bytes of the input are not shown, because they may be the access token's.
 //
@@ -27,6 +26,7 @@ class Hidden {
   Hidden() = default;  // nothing
   Hidden(std::string_view bytes, const google::protobuf::Descriptor& type);
 
+  bool hides_any() const { return !hidden_.empty(); }
   bool at(size_t offset) const { return !hidden_.empty() && hidden_[offset]; }
   // Whether the text of the piece, which is kBytes, is hidden.
   bool hides_text(const Piece& piece) const;
@@ -40,16 +40,6 @@ class Hidden {
 
   std::vector<bool> hidden_;  // for each byte, or empty if none is
 };
-
-// A message without what is hidden.
-struct Censored {
-  std::string bytes;    // hidden texts are kNotShown there
-  size_t left_out = 0;  // hidden numbers, and groups
-};
-
-// Of bytes that are read whole.
-Censored censored(std::string_view bytes, const google::protobuf::Descriptor& type,
-                  const Hidden& hidden);
 
 }  // namespace qel_wire
 

@@ -3,7 +3,7 @@
 #include <google/protobuf/wire_format_lite.h>
 
 #include <algorithm>
-#include <array>
+#include <vector>
 
 #include "text.h"
 
@@ -17,287 +17,67 @@ using google::protobuf::internal::WireFormatLite;
 constexpr size_t kLongestVarint = 10;
 constexpr int kDeepest = 100;
 
-// The known fields that a message had so far.
-class Seen {
+std::string name_of(const Piece& piece) {
+  return "field " + std::to_string(piece.number);
+}
+
+// What it is, is followed by the field's name if it ends in a blank.
+std::string described(const Piece& piece, std::string_view what) {
+  return std::string(what) + (what.back() == ' ' ? name_of(piece) : "");
+}
+
+WireFormatLite::WireType wire_type_of(const FieldDescriptor& field) {
+  return WireFormatLite::WireTypeForFieldType(static_cast<WireFormatLite::FieldType>(field.type()));
+}
+
+// The schema's fields by their numbers. The descriptor's own table takes several times as long.
+class Numbers {
  public:
-  void add(Piece* piece) {
-    // No message of the schema has more fields than there are bits.
-    const auto index = static_cast<size_t>(piece->field->index());
-    const uint64_t bit = uint64_t{1} << index;
-    if ((fields_ & bit) != 0 && !piece->field->is_repeated()) {
-      piece->earlier = offsets_.at(index);
-    }
-    piece->is_late = piece->field->number() < highest_;
-    fields_ |= bit;
-    offsets_.at(index) = piece->offset;
-    highest_ = std::max(highest_, piece->field->number());
+  static const FieldDescriptor* find(const Descriptor& type, uint32_t number) {
+    static const std::vector<Numbers> all = of_all(*type.file());
+    const auto& fields = all[static_cast<size_t>(type.index())].fields_;
+    return number < fields.size() ? fields[number] : nullptr;
   }
 
  private:
-  uint64_t fields_ = 0;             // a bit each, by its index
-  std::array<size_t, 64> offsets_;  // where it was last, if its bit is set
-  int highest_ = 0;                 // number
+  static std::vector<Numbers> of_all(const google::protobuf::FileDescriptor& file) {
+    std::vector<Numbers> all(static_cast<size_t>(file.message_type_count()));
+    for (size_t i = 0; i < all.size(); ++i) {
+      const Descriptor& type = *file.message_type(static_cast<int>(i));
+      for (int f = 0; f < type.field_count(); ++f) {
+        const auto number = static_cast<size_t>(type.field(f)->number());
+        all[i].fields_.resize(std::max(all[i].fields_.size(), number + 1));
+        all[i].fields_[number] = type.field(f);
+      }
+    }
+    return all;
+  }
+
+  std::vector<const FieldDescriptor*> fields_;
 };
 
-class Walk {
- public:
-  Walk(std::string_view bytes, Visitor* visitor) : bytes_(bytes), visitor_(visitor) {}
-
-  // Reads the fields of a message up to the end.
-  bool fields(const Descriptor& type, size_t end, int depth) {
-    Seen seen;
-    while (at_ < end) {
-      Piece piece;
-      piece.offset = at_;
-      piece.depth = depth;
-      const std::optional<uint64_t> tag = varint(piece, end, "a tag");
-      if (!tag.has_value()) {
-        return false;
-      }
-      if (!field(piece, static_cast<uint32_t>(*tag), &type, &seen, end)) {
-        return false;
-      }
+bool walk_level(Reader* reader, Level* level, Visitor* visitor) {
+  for (Piece piece; reader->next(level, &piece);) {
+    visitor->begin(piece);
+    if (!piece.is_container()) {
+      continue;
     }
-    return true;
-  }
-
-  std::optional<Problem> problem() const { return problem_; }
-
- private:
-  bool fail(const Piece& piece, size_t offset, const std::string& reason) {
-    problem_ = Problem{offset, piece.offset, at_, piece.depth, reason};
-    return false;
-  }
-
-  static std::string name_of(const Piece& piece) { return "field " + std::to_string(piece.number); }
-
-  static std::string described(const Piece& piece, std::string_view what) {
-    return std::string(what) + (what.back() == ' ' ? name_of(piece) : "");
-  }
-
-  // What ends there.
-  std::string ender(size_t end) const {
-    return end == bytes_.size() ? "the input ends" : "the message around it ends";
-  }
-
-  // What it is, is followed by the field's name if it ends in a blank.
-  std::optional<uint64_t> varint(const Piece& piece, size_t end, std::string_view what) {
-    const size_t begin = at_;
-    uint64_t value = 0;
-    for (size_t i = 0; i < kLongestVarint; ++i) {
-      if (at_ == end) {
-        fail(piece, begin, ender(end) + " within " + described(piece, what));
-        return std::nullopt;
-      }
-      const auto byte = static_cast<unsigned char>(bytes_[at_++]);
-      value |= static_cast<uint64_t>(byte & 0x7fU) << (7 * i);
-      if (byte < 0x80) {
-        return value;
-      }
-    }
-    fail(piece, begin, described(piece, what) + " has more than 10 bytes");
-    return std::nullopt;
-  }
-
-  // The rest of a field, behind its tag. In a group, whose fields nobody knows, type and seen are
-  // null.
-  bool field(Piece piece, uint32_t tag, const Descriptor* type, Seen* seen, size_t end) {
-    const auto number = static_cast<uint32_t>(WireFormatLite::GetTagFieldNumber(tag));
-    const auto wire_type = WireFormatLite::GetTagWireType(tag);
-    piece.number = number;
-    piece.field = type == nullptr ? nullptr : type->FindFieldByNumber(static_cast<int>(number));
-    if (tag == 0) {
-      return fail(piece, piece.offset, "a tag of 0 is no field");
-    }
-    if (piece.field != nullptr) {
-      // Repeated numbers are taken packed too.
-      const bool is_packed =
-          piece.field->is_packable() && wire_type == WireFormatLite::WIRETYPE_LENGTH_DELIMITED;
-      piece.is_known = is_packed || wire_type == wire_type_of(*piece.field);
-      if (piece.is_known) {
-        seen->add(&piece);
-      }
-      if (is_packed) {
-        return packed(piece, end);
-      }
-    }
-    switch (wire_type) {
-      case WireFormatLite::WIRETYPE_VARINT:
-        return number_at(piece, end, "the number of ");
-      case WireFormatLite::WIRETYPE_FIXED64:
-        return fixed(piece, Piece::kFixed64, 8, end);
-      case WireFormatLite::WIRETYPE_FIXED32:
-        return fixed(piece, Piece::kFixed32, 4, end);
-      case WireFormatLite::WIRETYPE_LENGTH_DELIMITED:
-        if (piece.is_known && piece.field != nullptr && piece.field->message_type() != nullptr) {
-          return message(piece, end);
-        }
-        return text(piece, end);
-      case WireFormatLite::WIRETYPE_START_GROUP:
-        return group(piece, end);
-      case WireFormatLite::WIRETYPE_END_GROUP:
-        return fail(piece, piece.offset,
-                    "the end of a group, " + name_of(piece) + ", that did not begin");
-      default:
-        return fail(piece, piece.offset,
-                    name_of(piece) + " has the wire type " + std::to_string(wire_type) +
-                        ", which there is not");
-    }
-  }
-
-  static WireFormatLite::WireType wire_type_of(const FieldDescriptor& field) {
-    return WireFormatLite::WireTypeForFieldType(
-        static_cast<WireFormatLite::FieldType>(field.type()));
-  }
-
-  bool number_at(Piece piece, size_t end, const char* what) {
-    piece.kind = Piece::kVarint;
-    piece.value_offset = at_;
-    const std::optional<uint64_t> value = varint(piece, end, what);
-    if (!value.has_value()) {
+    Level content(piece, *level);
+    if (!walk_level(reader, &content, visitor)) {
       return false;
     }
-    piece.value = *value;
-    piece.end = at_;
-    visitor_->begin(piece);
-    return true;
+    reader->close(&piece);
+    visitor->end(piece);
   }
-
-  bool fixed(Piece piece, Piece::Kind kind, size_t size, size_t end) {
-    piece.kind = kind;
-    piece.value_offset = at_;
-    if (end - at_ < size) {
-      at_ = end;
-      return fail(piece, piece.value_offset,
-                  ender(end) + " within the number of " + name_of(piece));
-    }
-    for (size_t i = 0; i < size; ++i) {
-      piece.value |= static_cast<uint64_t>(static_cast<unsigned char>(bytes_[at_ + i])) << (8 * i);
-    }
-    at_ += size;
-    piece.end = at_;
-    visitor_->begin(piece);
-    return true;
-  }
-
-  bool text(Piece piece, size_t end) {
-    piece.kind = Piece::kBytes;
-    const std::optional<uint64_t> length = varint(piece, end, "the length of ");
-    if (!length.has_value()) {
-      return false;
-    }
-    const auto size = static_cast<uint32_t>(*length);
-    piece.value_offset = at_;
-    if (size > end - at_) {
-      return fail(piece, at_,
-                  ender(end) + " within " + name_of(piece) + ": its length is " +
-                      counted(size, "byte") + ", of which " + std::to_string(end - at_) +
-                      (end - at_ == 1 ? " is there" : " are there"));
-    }
-    piece.bytes = bytes_.substr(at_, size);
-    at_ += size;
-    piece.end = at_;
-    visitor_->begin(piece);
-    return true;
-  }
-
-  // The length of what contains others, and the end that results, which is never behind the end of
-  // what it lies in.
-  std::optional<size_t> content(Piece* piece, size_t end) {
-    const std::optional<uint64_t> length = varint(*piece, end, "the length of ");
-    if (!length.has_value()) {
-      return std::nullopt;
-    }
-    piece->length = static_cast<uint32_t>(*length);
-    piece->value_offset = at_;
-    piece->end = at_ + std::min<size_t>(end - at_, piece->length);
-    return piece->end;
-  }
-
-  bool is_too_deep(const Piece& piece) {
-    return piece.depth >= kDeepest &&
-           !fail(piece, piece.offset,
-                 "more than " + std::to_string(kDeepest) + " levels of nesting");
-  }
-
-  bool message(Piece piece, size_t end) {
-    piece.kind = Piece::kMessage;
-    const std::optional<size_t> own_end = content(&piece, end);
-    if (!own_end.has_value() || is_too_deep(piece)) {
-      return false;
-    }
-    visitor_->begin(piece);
-    if (!fields(*piece.field->message_type(), *own_end, piece.depth + 1)) {
-      return false;
-    }
-    visitor_->end(piece);
-    return true;
-  }
-
-  bool packed(Piece piece, size_t end) {
-    piece.kind = Piece::kPacked;
-    const std::optional<size_t> own_end = content(&piece, end);
-    if (!own_end.has_value()) {
-      return false;
-    }
-    visitor_->begin(piece);
-    while (at_ < *own_end) {
-      Piece element;
-      element.depth = piece.depth + 1;
-      element.number = piece.number;
-      element.field = piece.field;
-      element.is_known = true;
-      element.offset = at_;
-      if (!number_at(element, *own_end, "a number of ")) {
-        return false;
-      }
-    }
-    visitor_->end(piece);
-    return true;
-  }
-
-  // Nothing in the schema is one: nobody knows its fields.
-  bool group(Piece piece, size_t end) {
-    piece.kind = Piece::kGroup;
-    piece.value_offset = at_;
-    if (is_too_deep(piece)) {
-      return false;
-    }
-    visitor_->begin(piece);
-    while (at_ < end) {
-      Piece inner;
-      inner.offset = at_;
-      inner.depth = piece.depth + 1;
-      const std::optional<uint64_t> tag = varint(inner, end, "a tag");
-      if (!tag.has_value()) {
-        return false;
-      }
-      const auto number = static_cast<uint32_t>(*tag);
-      if (WireFormatLite::GetTagWireType(number) != WireFormatLite::WIRETYPE_END_GROUP) {
-        if (!field(inner, number, nullptr, nullptr, end)) {
-          return false;
-        }
-      } else if (static_cast<uint32_t>(WireFormatLite::GetTagFieldNumber(number)) == piece.number) {
-        piece.end_tag = inner.offset;
-        piece.end = at_;
-        visitor_->end(piece);
-        return true;
-      } else {
-        return fail(inner, inner.offset, "the group of " + name_of(piece) + " ends as another one");
-      }
-    }
-    const std::string reason = ender(end) + " within the group of " + name_of(piece);
-    piece.offset = at_;  // what it contains was read
-    return fail(piece, at_, reason);
-  }
-
-  std::string_view bytes_;
-  Visitor* visitor_;
-  size_t at_ = 0;
-  std::optional<Problem> problem_;
-};
+  return !reader->problem().has_value();
+}
 
 }  // namespace
+
+bool Piece::is_no_member() const {
+  return is_known && kind == kVarint && field->type() == FieldDescriptor::TYPE_ENUM &&
+         field->enum_type()->FindValueByNumber(low_32_bits()) == nullptr;
+}
 
 bool Piece::is_doubtful() const {
   if (!is_known || (kind != kVarint && kind != kBytes)) {
@@ -307,7 +87,7 @@ bool Piece::is_doubtful() const {
     case FieldDescriptor::TYPE_STRING:
       return !is_utf8(bytes);
     case FieldDescriptor::TYPE_ENUM:
-      return field->enum_type()->FindValueByNumber(low_32_bits()) == nullptr;
+      return static_cast<int64_t>(value) != low_32_bits() || is_no_member();
     case FieldDescriptor::TYPE_INT32:
       return static_cast<int64_t>(value) != low_32_bits();
     case FieldDescriptor::TYPE_BOOL:
@@ -317,13 +97,258 @@ bool Piece::is_doubtful() const {
   }
 }
 
+bool Piece::is_odd() const {
+  return oddities != 0 || earlier.has_value() || is_late || kind == kPacked || number == 0 ||
+         is_short();
+}
+
+Level::Level(const Descriptor* type, size_t end, int depth)
+    : type_(type), end_(end), depth_(depth) {}
+
+Level::Level(const Piece& container, const Level& around)
+    : type_(container.kind == Piece::kMessage ? container.field->message_type() : nullptr),
+      end_(container.kind == Piece::kGroup ? around.end_ : container.end),
+      depth_(around.depth_ + 1),
+      kind_(container.kind),
+      number_(container.number),
+      field_(container.field),
+      group_(around.group_) {
+  if (kind_ == Piece::kGroup && !group_.has_value()) {
+    group_ = container.offset;
+  }
+}
+
+void Level::note(Piece* piece) {
+  // No message of the schema has more fields than there are bits.
+  const auto index = static_cast<size_t>(piece->field->index());
+  const uint64_t bit = uint64_t{1} << index;
+  if ((seen_ & bit) != 0 && !piece->field->is_repeated()) {
+    piece->earlier = offsets_[index];
+  }
+  piece->is_late = piece->field->number() < highest_;
+  seen_ |= bit;
+  offsets_[index] = static_cast<uint32_t>(piece->offset);
+  highest_ = std::max(highest_, piece->field->number());
+}
+
+bool Reader::fail(const Level& level, const Piece& piece, size_t offset,
+                  const std::string& reason) {
+  problem_ =
+      Problem{offset, piece.offset, at_, piece.depth, reason, level.group_.value_or(piece.offset)};
+  return false;
+}
+
+// What ends there.
+std::string Reader::ender(size_t end) const {
+  return end == bytes_.size() ? "the input ends" : "the message around it ends";
+}
+
+// Kept bits are those that the runtime keeps.
+std::optional<Reader::Varint> Reader::varint(const Level& level, const Piece& piece,
+                                             const char* what, int kept_bits) {
+  const size_t begin = at_;
+  uint64_t value = 0;
+  for (size_t i = 0; i < kLongestVarint; ++i) {
+    if (at_ == level.end_) {
+      fail(level, piece, begin, ender(level.end_) + " within " + described(piece, what));
+      return std::nullopt;
+    }
+    const auto byte = static_cast<unsigned char>(bytes_[at_++]);
+    value |= static_cast<uint64_t>(byte & 0x7fU) << (7 * i);
+    if (byte < 0x80) {
+      const bool is_long = byte == 0 && i > 0;
+      const bool is_cut = (i + 1 == kLongestVarint && byte > 1) ||
+                          (kept_bits < 64 && value >> static_cast<unsigned>(kept_bits) != 0);
+      return Varint{value, (is_long ? unsigned{Piece::kLongTag} : 0U) |
+                               (is_cut ? unsigned{Piece::kCutTag} : 0U)};
+    }
+  }
+  fail(level, piece, begin, described(piece, what) + " has more than 10 bytes");
+  return std::nullopt;
+}
+
+bool Reader::next(Level* level, Piece* piece) {
+  if (at_ == level->end_ && level->kind_ != Piece::kGroup) {
+    return false;
+  }
+  *piece = Piece();
+  piece->offset = last_ = at_;
+  piece->depth = level->depth_;
+  if (level->kind_ == Piece::kPacked) {
+    piece->number = level->number_;
+    piece->field = level->field_;
+    piece->is_known = true;
+    return number(*level, "a number of ", piece);
+  }
+  if (at_ == level->end_) {
+    piece->depth = level->depth_ - 1;
+    return fail(*level, *piece, at_,
+                ender(at_) + " within the group of field " + std::to_string(level->number_));
+  }
+  const std::optional<Varint> tag = varint(*level, *piece, "a tag", 32);
+  if (!tag.has_value()) {
+    return false;
+  }
+  piece->oddities = tag->oddities;
+  return field(level, tag->value, piece);
+}
+
+// The rest of a field, behind its tag.
+bool Reader::field(Level* level, uint64_t tag, Piece* piece) {
+  const auto kept_tag = static_cast<uint32_t>(tag);
+  const auto wire_type = WireFormatLite::GetTagWireType(kept_tag);
+  piece->number = static_cast<uint32_t>(WireFormatLite::GetTagFieldNumber(kept_tag));
+  if (kept_tag == 0) {
+    return fail(*level, *piece, piece->offset, "a tag of 0 is no field");
+  }
+  piece->field = level->type_ == nullptr ? nullptr : Numbers::find(*level->type_, piece->number);
+  if (piece->field != nullptr) {
+    // Repeated numbers are taken packed too.
+    const bool is_packed =
+        piece->field->is_packable() && wire_type == WireFormatLite::WIRETYPE_LENGTH_DELIMITED;
+    piece->is_known = is_packed || wire_type == wire_type_of(*piece->field);
+    if (piece->is_known) {
+      level->note(piece);
+    }
+  }
+  switch (wire_type) {
+    case WireFormatLite::WIRETYPE_VARINT:
+      return number(*level, "the number of ", piece);
+    case WireFormatLite::WIRETYPE_FIXED64:
+      return fixed(*level, Piece::kFixed64, 8, piece);
+    case WireFormatLite::WIRETYPE_FIXED32:
+      return fixed(*level, Piece::kFixed32, 4, piece);
+    case WireFormatLite::WIRETYPE_LENGTH_DELIMITED:
+      return length_delimited(*level, piece);
+    case WireFormatLite::WIRETYPE_START_GROUP:
+      return group(*level, piece);
+    case WireFormatLite::WIRETYPE_END_GROUP:
+      return end_of_group(*level, *piece);
+    default:
+      return fail(*level, *piece, piece->offset,
+                  name_of(*piece) + " has the wire type " + std::to_string(wire_type) +
+                      ", which there is not");
+  }
+}
+
+bool Reader::number(const Level& level, const char* what, Piece* piece) {
+  piece->kind = Piece::kVarint;
+  piece->value_offset = at_;
+  const std::optional<Varint> value = varint(level, *piece, what, 64);
+  if (!value.has_value()) {
+    return false;
+  }
+  piece->oddities |= value->oddities << 4U;  // from a tag's bits to a number's
+  piece->value = value->value;
+  piece->end = at_;
+  return true;
+}
+
+bool Reader::fixed(const Level& level, Piece::Kind kind, size_t size, Piece* piece) {
+  piece->kind = kind;
+  piece->value_offset = at_;
+  if (level.end_ - at_ < size) {
+    at_ = level.end_;
+    return fail(level, *piece, piece->value_offset,
+                ender(level.end_) + " within the number of " + name_of(*piece));
+  }
+  for (size_t i = 0; i < size; ++i) {
+    piece->value |= static_cast<uint64_t>(static_cast<unsigned char>(bytes_[at_ + i])) << (8 * i);
+  }
+  at_ += size;
+  piece->end = at_;
+  return true;
+}
+
+bool Reader::length_delimited(const Level& level, Piece* piece) {
+  const std::optional<Varint> length = varint(level, *piece, "the length of ", 32);
+  if (!length.has_value()) {
+    return false;
+  }
+  piece->oddities |= length->oddities << 2U;  // from a tag's bits to a length's
+  piece->length = static_cast<uint32_t>(length->value);
+  piece->value_offset = at_;
+  const size_t left = level.end_ - at_;
+  if (piece->is_known && wire_type_of(*piece->field) != WireFormatLite::WIRETYPE_LENGTH_DELIMITED) {
+    piece->kind = Piece::kPacked;
+  } else if (piece->is_known && piece->field->message_type() != nullptr) {
+    piece->kind = Piece::kMessage;
+    if (piece->depth >= kDeepest) {
+      return fail(level, *piece, piece->offset,
+                  "more than " + std::to_string(kDeepest) + " levels of nesting");
+    }
+  } else {
+    piece->kind = Piece::kBytes;
+    if (piece->length > left) {
+      return fail(level, *piece, at_,
+                  ender(level.end_) + " within " + name_of(*piece) + ": its length is " +
+                      counted(piece->length, "byte") + ", of which " + std::to_string(left) +
+                      (left == 1 ? " is there" : " are there"));
+    }
+    piece->bytes = bytes_.substr(at_, piece->length);
+    at_ += piece->length;
+    piece->end = at_;
+    return true;
+  }
+  // What contains others never reaches behind the end of what it lies in.
+  piece->end = at_ + std::min<size_t>(left, piece->length);
+  return true;
+}
+
+// Nothing in the schema is one: nobody knows its fields.
+bool Reader::group(const Level& level, Piece* piece) {
+  piece->kind = Piece::kGroup;
+  piece->value_offset = at_;
+  return piece->depth < kDeepest ||
+         fail(level, *piece, piece->offset,
+              "more than " + std::to_string(kDeepest) + " levels of nesting");
+}
+
+// False in any case: the level is over, or broken.
+bool Reader::end_of_group(const Level& level, const Piece& piece) {
+  if (level.kind_ != Piece::kGroup) {
+    return fail(level, piece, piece.offset,
+                "the end of a group, " + name_of(piece) + ", that did not begin");
+  }
+  return level.number_ == piece.number
+             ? false
+             : fail(level, piece, piece.offset,
+                    "the group of field " + std::to_string(level.number_) + " ends as another one");
+}
+
+void Reader::skip(Piece* piece, const Level& around) {
+  if (piece->kind != Piece::kGroup || piece->end != 0) {
+    at_ = piece->end;
+    return;
+  }
+  Level content(*piece, around);
+  for (Piece inner; next(&content, &inner);) {
+    skip(&inner, content);
+  }
+  close(piece);
+}
+
+void Reader::close(Piece* group) const {
+  if (group->kind == Piece::kGroup) {
+    group->end_tag = last_;
+    group->end = at_;
+  }
+}
+
 std::optional<Problem> walk(std::string_view bytes, const Descriptor& type, Visitor* visitor) {
   if (bytes.size() > kMostBytes) {
-    return Problem{kMostBytes, kMostBytes, kMostBytes, 0, "more than 64 MiB, which no call takes"};
+    return Problem{kMostBytes, kMostBytes, kMostBytes, 0, "more than 64 MiB, which no call takes",
+                   0};
   }
-  Walk walk(bytes, visitor);
-  walk.fields(type, bytes.size(), 0);
-  return walk.problem();
+  Reader reader(bytes);
+  Level level(&type, bytes.size(), 0);
+  walk_level(&reader, &level, visitor);
+  return reader.problem();
+}
+
+std::optional<Problem> problem_of(std::string_view bytes, const Descriptor& type) {
+  Visitor nobody;
+  return walk(bytes, type, &nobody);
 }
 
 }  // namespace qel_wire

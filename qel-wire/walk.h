@@ -6,6 +6,7 @@
 
 #include <google/protobuf/descriptor.h>
 
+#include <array>
 #include <cstddef>
 #include <cstdint>
 #include <optional>
@@ -28,11 +29,23 @@ struct Piece {
   // Whether the wire type is the field's. Where it is not, or there is no such field, the runtime
   // keeps the piece as an unknown field.
   bool is_known = false;
+  // Whether a known field with a higher number came before it, which no encoder writes.
+  bool is_late = false;
   // Of a known field that is not repeated and was there before: the offset where. The runtime keeps
   // the later value; embedded messages are merged.
   std::optional<size_t> earlier;
-  // Whether a known field with a higher number came before it, which no encoder writes.
-  bool is_late = false;
+
+  // How the tag, the length and the number are written, where no encoder writes them so: with more
+  // bytes than they need, or with bits that the runtime drops.
+  enum Oddity : unsigned {
+    kLongTag = 1,
+    kCutTag = 2,
+    kLongLength = 4,
+    kCutLength = 8,
+    kLongNumber = 16,
+    kCutNumber = 32
+  };
+  unsigned oddities = 0;
 
   // Tag and length, then the value. The elements of a packed field have no tag.
   size_t offset = 0;
@@ -42,6 +55,7 @@ struct Piece {
 
   uint64_t value = 0;      // of a number, as it stands on the wire
   std::string_view bytes;  // the value of kBytes
+  bool is_hidden = false;  // whether that is not the value, but says that it is not shown
   // The length that kMessage and kPacked give themselves. Where it reaches behind the end of what
   // they lie in, the runtime takes what is there.
   uint32_t length = 0;
@@ -57,6 +71,10 @@ struct Piece {
   // Whether a known number or text is none that its field has: more than 32 bits, outside its
   // enumeration, neither 0 nor 1, no UTF-8.
   bool is_doubtful() const;
+  // Whether it is a number outside its enumeration, which the runtime keeps as an unknown field.
+  bool is_no_member() const;
+  // Whether no encoder of this protocol writes it so, there, or at all.
+  bool is_odd() const;
 };
 
 // Where and why reading ended.
@@ -67,6 +85,72 @@ struct Problem {
   size_t end = 0;
   int depth = 0;
   std::string reason;
+  size_t readable = 0;  // so many bytes from the first on are read whole if nothing follows them
+};
+
+// The fields of one message, of a group or of a packed list, as far as they were read.
+class Level {
+ public:
+  // Without a type, nobody knows the fields.
+  Level(const google::protobuf::Descriptor* type, size_t end, int depth);
+  // What the container has in it, which was read last.
+  Level(const Piece& container, const Level& around);
+
+ private:
+  friend class Reader;
+
+  void note(Piece* piece);
+
+  const google::protobuf::Descriptor* type_ = nullptr;  // of a message
+  size_t end_ = 0;
+  int depth_ = 0;
+  // Of what the fields lie in.
+  Piece::Kind kind_ = Piece::kMessage;
+  uint32_t number_ = 0;                                       // of a group
+  const google::protobuf::FieldDescriptor* field_ = nullptr;  // of a packed list
+  std::optional<size_t> group_;  // where the outermost group around the fields begins
+  // The known fields that were read.
+  uint64_t seen_ = 0;                 // a bit each, by its index
+  std::array<uint32_t, 64> offsets_;  // where it was last, if its bit is set
+  int highest_ = 0;                   // number
+};
+
+class Reader {
+ public:
+  explicit Reader(std::string_view bytes, size_t at = 0) : bytes_(bytes), at_(at) {}
+
+  // Reads the next field of the level; of a container what comes before its content, which is read
+  // as a level of its own, or skipped, before the next call. False at the level's end, and where
+  // the bytes are broken.
+  bool next(Level* level, Piece* piece);
+  // Goes to the end of the piece that was read last.
+  void skip(Piece* piece, const Level& around);
+  // To be called behind the last field of a group, whose end is known only then.
+  void close(Piece* group) const;
+
+  const std::optional<Problem>& problem() const { return problem_; }
+
+ private:
+  struct Varint {
+    uint64_t value;
+    unsigned oddities;  // the bits of Piece's for a tag
+  };
+
+  bool fail(const Level& level, const Piece& piece, size_t offset, const std::string& reason);
+  std::string ender(size_t end) const;
+  std::optional<Varint> varint(const Level& level, const Piece& piece, const char* what,
+                               int kept_bits);
+  bool field(Level* level, uint64_t tag, Piece* piece);
+  bool number(const Level& level, const char* what, Piece* piece);
+  bool fixed(const Level& level, Piece::Kind kind, size_t size, Piece* piece);
+  bool length_delimited(const Level& level, Piece* piece);
+  bool group(const Level& level, Piece* piece);
+  bool end_of_group(const Level& level, const Piece& piece);
+
+  std::string_view bytes_;
+  size_t at_;
+  size_t last_ = 0;  // where the last field begins, or the end of a group
+  std::optional<Problem> problem_;
 };
 
 class Visitor {
@@ -82,6 +166,9 @@ class Visitor {
 // read whole.
 std::optional<Problem> walk(std::string_view bytes, const google::protobuf::Descriptor& type,
                             Visitor* visitor);
+
+// The same without a visitor.
+std::optional<Problem> problem_of(std::string_view bytes, const google::protobuf::Descriptor& type);
 
 }  // namespace qel_wire
 

@@ -4,7 +4,8 @@
 load build
 
 setup_file() {
-  printf '%s 1.0-1\n' nlohmann-json3-dev libnettle8:amd64 doxygen-awesome-css >"$BATS_FILE_TMPDIR/tools.txt"
+  printf '%s 1.0-1\n' nlohmann-json3-dev libnettle8:amd64 libcli11-dev \
+    libpcap0.8:amd64 libutf8proc2:amd64 doxygen-awesome-css >"$BATS_FILE_TMPDIR/tools.txt"
   echo archive >"$BATS_FILE_TMPDIR/qel-message-protosvc_1.2.3.orig.tar.gz"
   echo '/*! jQuery v3.6.0 */' >"$BATS_FILE_TMPDIR/jquery.js"
   "$SOURCE/packaging/documents.py" 1.2.3 1795300000 "$BATS_FILE_TMPDIR" "$BATS_FILE_TMPDIR/jquery.js"

@@ -32,7 +32,7 @@ make_root() {
   mkdir -p "$root/var/lib/dpkg/info" "$root/var/lib/dpkg/updates"
   printf '%s\n' "$native" armhf armel >"$root/var/lib/dpkg/arch"
   local name architecture
-  for name in libc6 libgcc-s1 libstdc++6 libnettle8; do
+  for name in libc6 libgcc-s1 libstdc++6 libnettle8 libpcap0.8 libutf8proc2; do
     for architecture in $(printf '%s\n' "$native" "$ARCHITECTURE" | sort -u); do
       dpkg-query -W -f="Package: $name\nArchitecture: $architecture\nMulti-Arch: same\nMaintainer: nobody
 Status: install ok installed\nVersion: \${Version}\nDescription: \${binary:Summary}\n\n" "$name"

@@ -2,15 +2,15 @@
 # The Debian packages that the commands of ./dev need. Needs tools/step.sh.
 
 build_packages=(g++ make cmake ninja-build libgtest-dev protobuf-compiler abigail-tools bats
-  nettle-dev nlohmann-json3-dev python3-protobuf python3-yaml
+  libcli11-dev libpcap0.8-dev libutf8proc-dev nettle-dev nlohmann-json3-dev jq tshark zsh fish
+  python3-protobuf python3-yaml
   python3-jsonschema python3-kconfiglib bsdutils pkgconf fakeroot valgrind)
 arm_packages=(g++-arm-linux-gnueabihf g++-arm-linux-gnueabi qemu-user googletest python3)
 lint_packages=(clang-format clang-tidy shellcheck)
 coverage_packages=(gcovr python3)
 bench_packages=(libbenchmark-dev python3 gnuplot-nox libprotobuf-dev libprotobuf-c-dev
   protobuf-c-compiler nanopb libnanopb-dev libjemalloc2)
-docs_packages=(doxygen doxygen-awesome-css graphviz plantuml fonts-dejavu-core
-  help2man python3)
+docs_packages=(doxygen doxygen-awesome-css graphviz plantuml fonts-dejavu-core python3)
 fuzz_packages=(clang libclang-rt-dev)
 
 as_root() {

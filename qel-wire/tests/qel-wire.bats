@@ -8,7 +8,7 @@ setup() {
   unset NO_COLOR
   PATH=$BUILT:$PATH
   tests=$SOURCE/qel-wire/tests
-  page=$SOURCE/qel-wire/README.md
+  page=$SOURCE/docs/qel-wire.md
   cd "$BATS_TEST_TMPDIR" || exit
 }
 
@@ -16,7 +16,7 @@ setup() {
 # exit status. Empty lines do not matter.
 repeat() {
   local line status
-  grep '^[#$] ' | while IFS= read -r line; do
+  grep -E '^(###|[$]) ' | while IFS= read -r line; do
     printf '%s\n' "$line"
     [[ $line == '$ '* ]] || continue
     status=0
@@ -28,24 +28,48 @@ repeat() {
 # agree_on CHECK: qel-wire and the reference encoder.
 agree_on() {
   [ -z "$SANITIZERS" ] || skip 'the fuzz target has the same messages as seeds'
-  /usr/bin/python3 "$tests/reference.py" "$1" "$SOURCE"
+  /usr/bin/python3 "$tests/reference.py" "$1" "$SOURCE" "$CONTRACT" 2>errors || { cat errors && false; }
+}
+
+# frame NAME HEX: the message in a frame of the example, as hex.
+frame() { printf '%02x%s%08x%s' ${#1} "$(printf %s "$1" | od -An -v -tx1 | tr -d ' \n')" $((${#2} / 2)) "$2"; }
+
+# capture FILE: makes a capture of packets of lines with a direction, the name of a message and its
+# text form, a second for each.
+capture() {
+  local second=0 way name text
+  while read -r way name text; do
+    printf '2026-11-23T10:00:%02dZ %s ' $((second++)) "$way"
+    echo "$(frame "$name" "$(qel-wire encode "$name" --hex <<<"$text")")"
+  done >"$1.txt"
+  TZ=UTC text2pcap -q -r '^(?<time>\S+) (?<dir>[<>]) (?<data>[0-9a-f]+)$' -t ISO \
+    -4 10.0.0.2,10.0.0.1 -T 9000,40000 "$1.txt" "$1"
 }
 
 # holds SESSIONS: repeated, they are the same. Of what differs, the session's title is shown.
-holds() { [ -s "$1" ] && diff -u -F '^# ' <(grep . "$1") <(repeat <"$1"); }
+holds() { [ -s "$1" ] && diff -u -F '^### ' <(grep -E '^(###|[$]) ' -A 9999 "$1" | grep .) <(repeat <"$1"); }
 
 @test "it prints what its sessions show" { holds "$tests/sessions.txt"; }
 
 @test "it hides what its sessions hide" { holds "$tests/access_token.txt"; }
 
 @test "its page shows what happens" {
+  capture chat.pcap <<'end'
+> ChatRequest requestId: 7 chatroomId: 42 chatMessageParams { msgId: 1 chatMsg: "hi" }
+> CurrentTimeRequest requestId: 8
+< ChatReply requestId: 7 chatroomId: 42 result { code: 0 }
+> ReadMessageRequest requestId: 9 chatroomId: 42
+< ClientEcho requestId: 700001
+> ClientEchoReply requestId: 700001
+< CurrentTimeReply requestId: 8 result { code: 0 } currentTimeMillis: 1795430406000
+end
   awk '/^```/ { on = $0 == "```console"; next } on' "$page" >page.txt
   holds page.txt
 }
 
 @test "its page has every option" {
-  diff <(qel-wire --help | grep -oE -- '--[a-z0-9-]+' | grep -Evx -- '--(help|version)' | sort -u) \
-    <(grep -oE -- '`--[a-z0-9-]+' "$page" | tr -d '`' | sort -u)
+  diff <(qel-wire man | grep -oE -- '^\.B [\]-[\]-[a-z0-9]+([\]-[a-z0-9]+)*' | sed 's/^.B //; s/[\]//g' | sort -u) \
+    <(grep -oE -- '`(qel-wire )?--[a-z0-9-]+' "$page" | grep -oE -- '--.*' | grep -vx -- --help | cat - <(echo --version) | sort -u)
 }
 
 @test "the command of the repository's README works" {
@@ -65,6 +89,22 @@ holds() { [ -s "$1" ] && diff -u -F '^# ' <(grep . "$1") <(repeat <"$1"); }
 
 @test "the bytes of each message are the reference encoder's" {
   agree_on bytes
+}
+
+@test "each message with unknown fields comes back from its text form" {
+  agree_on back
+}
+
+@test "conditions choose the messages that jq chooses" {
+  agree_on where
+}
+
+@test "differences are those that jq sees" {
+  agree_on diff
+}
+
+@test "it takes little memory" {
+  agree_on memory
 }
 
 @test "each message is guessed, alone or with those that look alike" {
@@ -89,48 +129,69 @@ holds() { [ -s "$1" ] && diff -u -F '^# ' <(grep . "$1") <(repeat <"$1"); }
 @test "without memory it says so" {
   [ -z "$SANITIZERS" ] || skip 'sanitizers take more memory than there is'
   head -c 60000000 /dev/zero >zeros
-  ulimit -v 100000
+  ulimit -v 60000
   run -3 qel-wire decode ClientEcho zeros
   [ "$output" = 'qel-wire: there is not enough memory' ]
+}
+
+@test "many messages in one file give what as many calls give, in every framing" {
+  agree_on frames
 }
 
 # completed WORD...: what the last word may become. Bash makes "=" a word of its own.
 completed() {
   (
     # shellcheck source=/dev/null
-    source "$SOURCE/qel-wire/completion.bash"
+    source "$BUILT/completion.bash"
     COMP_WORDS=(qel-wire "$@") COMP_CWORD=$#
     _qel_wire
     echo "${COMPREPLY[@]}"
   )
 }
 
-@test "completion knows commands" {
-  [ "$(completed d)" = decode ]
+@test "Bash completes commands" {
+  [ "$(completed d)" = 'decode diff' ]
 }
 
-@test "completion knows messages where a command takes them" {
+@test "Bash completes messages where a command takes them" {
   [ "$(completed explain --all ChatR)" = 'ChatRequest ChatReply' ]
   [ "$(completed guess ChatR)" = '' ]
 }
 
-@test "completion knows enumerations for schema alone" {
+@test "Bash completes enumerations for schema alone" {
   [ "$(completed schema MsgT)" = MsgType ]
   [ "$(completed decode MsgT)" = '' ]
 }
 
-@test "completion goes on behind values" {
+@test "Bash goes on behind values" {
   [ "$(completed --color = never exp)" = explain ]
   [ "$(completed explain --hex = 0807 ChatR)" = 'ChatRequest ChatReply' ]
 }
 
-@test "completion knows the values of --color alone" {
+@test "Bash completes values" {
   [ "$(completed --color =)" = 'always never auto' ]
-  [ "$(completed --color = a)" = 'always auto' ]
-  [ "$(completed --hex = a)" = '' ]
+  [ "$(completed decode --frames = u3)" = 'u32 u32le' ]
+  [ "$(completed decode --hex = a)" = '' ]
 }
 
-@test "completion knows every option" {
-  diff <(completed -- | tr ' ' '\n') \
-    <(qel-wire --help | grep -oE '^  --[a-z0-9-]+(, --version)?(=WHEN)?' | sed 's/^ *//; s/=WHEN/=/; s/, /\n/')
+@test "Bash completes every option of a command" {
+  diff <(completed encode -- | tr ' ' '\n' | sed 's/=//' | sort -u) \
+    <({ qel-wire encode --help && qel-wire --help; } | grep -oE -- '^ +(-h,)?--[a-z0-9-]+' | grep -oE -- '--.*' | sort -u)
+}
+
+@test "fish completes commands, messages, options and values" {
+  for line in 'expl explain' 'explain ChatRep ChatReply' 'decode --part --partial' 'decode --frames=u32l --frames=u32le'; do
+    fish -c "source '$BUILT/completion.fish'; complete -C 'qel-wire ${line% *}'" | cut -f1 >completed.txt
+    grep -Fx -- "${line##* }" completed.txt
+  done
+}
+
+@test "zsh takes its completion" {
+  zsh -n "$BUILT/completion.zsh"
+}
+
+@test "man shows its page without a complaint" {
+  MANROFFSEQ='' man -l --warnings -E UTF-8 <(qel-wire man) >page.txt 2>errors
+  diff /dev/null errors
+  grep 'qel-wire .* Shows and makes' page.txt
 }

@@ -1,10 +1,14 @@
-"""reference.py CHECK SOURCE: every message of the schema, with all its fields, by qel-wire and by the
-reference encoder, Debian's python3-protobuf. Prints the messages on which they disagree."""
+"""reference.py CHECK SOURCE [CONTRACT.json]: qel-wire and other programs agree: on every message of the
+schema, with all its fields, Debian's python3-protobuf; on conditions and differences jq, by the JSON
+form. And qel-wire agrees with itself on many messages in one file. Prints on what they disagree."""
 
 import json
 import pathlib
+import random
+import re
 import subprocess
 import sys
+import tempfile
 
 from google.protobuf import json_format, text_format
 
@@ -12,15 +16,29 @@ check, source = sys.argv[1], pathlib.Path(sys.argv[2])
 sys.path.insert(0, str(source / "tests" / "support"))
 import schema  # pylint: disable=wrong-import-position
 
+# Unknown fields of every kind, a number outside its enumeration where there is one, a group.
+UNKNOWN = bytes.fromhex("10ff01 c33e0801c43e 7d01020304 8101 0102030405060708 c20603616263")
+
+
+def run(*command, data=b"", status=0):
+    done = subprocess.run(command, input=data, check=False, stdout=subprocess.PIPE)
+    if done.returncode != status:
+        raise SystemExit(f"{command}: status {done.returncode}")
+    return done.stdout
+
 
 def qel_wire(*arguments, data=b""):
-    return subprocess.run(["qel-wire", *arguments], input=data, check=True, stdout=subprocess.PIPE).stdout
+    return run("qel-wire", *arguments, data=data)
 
 
 def wire_types(message):
     """What tells messages apart that have all their fields."""
     return {field.number: field.type in (field.TYPE_STRING, field.TYPE_BYTES, field.TYPE_MESSAGE)
             for field in message.fields}
+
+
+def is_record(message):
+    return any(field.message_type == message for other in types for field in other.fields)
 
 
 def agrees(message):
@@ -32,15 +50,161 @@ def agrees(message):
         printed = qel_wire("decode", "--show-token", "--json", name, data=data)
         return json.loads(printed) == json.loads(json_format.MessageToJson(message))
     if check == "bytes":
-        return qel_wire("encode", name, data=text) == data
-    ranks = [line.split() for line in qel_wire("guess", "--all", data=data).decode().splitlines()]
-    first = {other for rank, other, *_ in ranks if rank == "1"}
+        as_json = json_format.MessageToJson(message).encode()
+        return qel_wire("encode", name, data=text) == data == qel_wire("encode", name, data=as_json)
+    if check == "back":
+        read = type(message).FromString(data + UNKNOWN)
+        text = qel_wire("decode", "--show-token", name, data=data + UNKNOWN)
+        return qel_wire("encode", name, data=text) == read.SerializeToString()
+    lines = [line.split("doubtful ")[1].split("broken ")[-1].strip().split(", ")
+             for line in qel_wire("guess", "--all", data=data).decode().splitlines()]
+    first = next(names for names in lines if is_record(message.DESCRIPTOR) in map(is_record, map(type_of, names)))
     alike = {other.name for other in types if wire_types(other) == wire_types(message.DESCRIPTOR)}
-    return name in first <= alike and len(ranks) == len(types)
+    return name in first and set(first) <= alike and sum(map(len, lines)) == len(types)
+
+
+def type_of(name):
+    return next(each for each in types if each.name == name)
+
+
+# ---- Questions, also to jq
+
+EACH = "| if type == \"array\" then .[] else . end | select(. != null)"
+LEAVES = """[paths(type != "array" and (type != "object" or length == 0)) as $path |
+  [($path | map(if type == "number" then "[\\(.)]" else ".\\(.)" end) | add | ltrimstr(".")),
+   (getpath($path) | tostring)]]"""
+
+
+def jq_path(path):
+    return " | ".join(f".{name} {EACH}" for name in path.split("."))
+
+
+def leaves(value, path=""):
+    """The path and the value of each field of a message's JSON form."""
+    if isinstance(value, (dict, list)):
+        for key, part in value.items() if isinstance(value, dict) else ((None, part) for part in value):
+            yield from leaves(part, path if key is None else f"{path}.{key}" if path else key)
+    else:
+        yield path, value
+
+
+def captures():
+    """The bytes of the contract's cases, for each message that has several."""
+    with open(sys.argv[3], encoding="utf-8") as file:
+        contract = json.load(file)
+    found = {}
+    for case in contract["cases"]:
+        messages_of_it = [step["encode"] for step in case["does"] if "encode" in step] + [case.get("received", {})]
+        # Bytes that are broken have no text form.
+        data = messages_of_it[0].get("bytes", "") if "text" in messages_of_it[0] else ""
+        if data and len(data) < 2000 and case["call"] in contract["messages"]:
+            found.setdefault(contract["messages"][case["call"]], []).append(bytes.fromhex(data))
+    return {name: data for name, data in found.items() if len(data) > 3}
+
+
+def quoted(value):
+    return value if isinstance(value, str) else json.dumps(value)
+
+
+def is_number(value):
+    return not isinstance(value, bool) and (isinstance(value, int) or re.fullmatch(r"-?[0-9]+", value))
+
+
+def where_agrees(chance, name, data):
+    """A random condition on the messages, by qel-wire and by jq."""
+    framed = b"".join(len(each).to_bytes(4, "big") + each for each in data)
+    forms = [json.loads(line) for line in run("jq", "-c", ".", data=qel_wire(
+        "decode", name, "--show-token", "--json", "--frames=u32", data=framed)).splitlines()]
+    path, value = chance.choice([leaf for form in forms for leaf in leaves(form)])
+    values = [each for form in forms for at, each in leaves(form) if at == path]
+    # jq has no whole numbers beyond 53 bits.
+    is_small = all(is_number(each) and abs(int(each)) < 2**53 for each in values)
+    sign = chance.choice(["", "!", "=", "!="] + ["<", "<=", ">", ">="] * is_small)
+    condition = "!" + path if sign == "!" else path + sign + (quoted(value) if sign else "")
+    wanted = json.dumps(value)
+    number = "tonumber" if sign in ("<", "<=", ">", ">=") else "."
+    test = {"": f"any({jq_path(path)}; true)", "!": f"any({jq_path(path)}; true) | not"}.get(
+        sign, f"any({jq_path(path)}; {number} {'==' if sign == '=' else sign} ({wanted} | {number}))")
+    ours = qel_wire("decode", name, "--show-token", "--json", "--frames=u32", f"--where={condition}", data=framed)
+    theirs = run("jq", "-c", f"select({test})", data="\n".join(map(json.dumps, forms)).encode())
+    return [json.loads(line) for line in run("jq", "-c", ".", data=ours).splitlines()] == \
+        [json.loads(line) for line in theirs.splitlines()] or condition
+
+
+def diff_agrees(chance, name, data):
+    """The places at which two random messages differ, by qel-wire and by jq."""
+    pair = [chance.choice(data), chance.choice(data)]
+    forms = [qel_wire("decode", name, "--show-token", "--json", data=each) for each in pair]
+    first, second = ({path: value for path, value in json.loads(run("jq", "-c", LEAVES, data=form))} for form in forms)
+    different = {path for path in {**first, **second} if first.get(path) != second.get(path)}
+    with tempfile.TemporaryDirectory() as folder:
+        files = [pathlib.Path(folder, side) for side in "ab"]
+        for file, each in zip(files, pair):
+            file.write_bytes(each)
+        printed = run("qel-wire", "diff", "--show-token", f"--message={name}", *map(str, files), status=int(bool(different))).decode()
+    # Unknown fields have no place in JSON.
+    ours = {line[2:].split(": ")[0] for line in printed.splitlines()}
+    return {path for path in ours if not re.search(r"(^|\.)[0-9]", path)} == different or f"{name} {pair}"
+
+
+def question(kind):
+    chance = random.Random(20261123)
+    found = sorted(captures().items())
+    for _ in range(100):
+        yield kind(chance, *chance.choice(found))
+
+
+# ---- Many messages
+
+def varint(number):
+    return bytes([number]) if number < 128 else bytes([number & 127 | 128]) + varint(number >> 7)
+
+
+FRAMES = {
+    "varint": lambda name, data: varint(len(data)),
+    "u16": lambda name, data: len(data).to_bytes(2, "big"),
+    "u16le": lambda name, data: len(data).to_bytes(2, "little"),
+    "u32": lambda name, data: len(data).to_bytes(4, "big"),
+    "u32le": lambda name, data: len(data).to_bytes(4, "little"),
+    "grpc": lambda name, data: b"\0" + len(data).to_bytes(4, "big"),
+    "example": lambda name, data: bytes([len(name)]) + name.encode() + len(data).to_bytes(4, "big"),
+}
+
+
+def disagreements_on_frames():
+    found = sorted(captures().items())
+    alone = {name: b"".join(qel_wire("decode", name, data=each) for each in data) for name, data in found}
+    for kind, head in FRAMES.items():
+        for name, data in found:
+            framed = b"".join(head(name, each) + each for each in data)
+            printed = qel_wire("decode", name, f"--frames={kind}", data=framed).splitlines(keepends=True)
+            if b"".join(line for line in printed if not line.startswith(b"# message ")) != alone[name]:
+                yield f"{kind} {name}"
+
+
+# ---- Memory
+
+def takes_little(arguments, limit):
+    """The most memory that the program has at once, besides what it takes for nothing, in times of the input."""
+    size = 24 << 20
+    def most(data):
+        probe = ("import resource, subprocess, sys; subprocess.run(sys.argv[1:], stdin=sys.stdin, check=True, "
+                 "stdout=subprocess.DEVNULL); print(resource.getrusage(resource.RUSAGE_CHILDREN).ru_maxrss)")
+        return 1024 * int(run(sys.executable, "-c", probe, "qel-wire", *arguments, data=data))
+    return all((most(each * (size // len(each))) - most(b"")) / size < limit or str(each)
+               for each in (b"\x08\x07", b"\x6a\x02\x08\x01", b"\x60\x07\x58\x07"))
 
 
 messages = schema.messages(source / "proto-lib")
 types = [message.DESCRIPTOR for message in messages]
-different = [message.DESCRIPTOR.name for message in messages if not agrees(schema.fill(message))]
-print(*different)
-sys.exit(not types or different != [])
+if check in ("where", "diff"):
+    different = [answer for answer in question(where_agrees if check == "where" else diff_agrees) if answer is not True]
+elif check == "frames":
+    different = list(disagreements_on_frames())
+elif check == "memory":
+    different = [form for form, limit in (("text", 3), ("json", 15))
+                 if not takes_little(["decode", "ChatReply"] + ["--json"] * (form == "json"), limit)]
+else:
+    different = [message.DESCRIPTOR.name for message in messages if not agrees(schema.fill(message))]
+print(*different, sep="\n")
+sys.exit(different != [])

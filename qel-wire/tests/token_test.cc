@@ -15,8 +15,10 @@
 
 #include "decode.h"
 #include "explain.h"
-#include "forms.h"
+#include "misread.h"
 #include "msgspec_frontend.pb.h"
+#include "notation.h"
+#include "query.h"
 #include "schema.h"
 
 namespace {
@@ -158,7 +160,8 @@ Capture some_capture(const std::string& token, Random* random) {
 
 // ---- What an output tells
 
-// Octal escapes are the bytes that they stand for, others the character behind the backslash.
+// Octal and hex escapes are the bytes that they stand for, others the character behind the
+// backslash.
 std::string unescaped(const std::string& text) {
   std::string result;
   for (size_t i = 0; i < text.size(); ++i) {
@@ -166,6 +169,9 @@ std::string unescaped(const std::string& text) {
       result += text[i];
     } else if (text.find_first_not_of("01234567", i + 1) > i + 3) {
       result += static_cast<char>(std::stoi(text.substr(i + 1, 3), nullptr, 8));
+      i += 3;
+    } else if (text[i + 1] == 'x') {
+      result += static_cast<char>(std::stoi(text.substr(i + 2, 2), nullptr, 16));
       i += 3;
     } else {
       result += text[++i];
@@ -191,10 +197,23 @@ void add_row(const std::string& line, std::string* bytes) {
 
 // What a line of any output has as its value: behind '=' or ':', or alone.
 std::string value_of(const std::string& line) {
-  const size_t mark = line.find("= ") != std::string::npos ? line.find("= ") : line.find(": ");
+  constexpr char kJson[] = "\"value\":";
+  const size_t mark = line.find(kJson) != std::string::npos  ? line.find(kJson) + sizeof kJson - 2
+                      : line.find("= ") != std::string::npos ? line.find("= ")
+                                                             : line.find(": ");
   const size_t begin = line.find_first_not_of(" \"", mark == std::string::npos ? 0 : mark + 1);
-  return begin == std::string::npos ? ""
-                                    : line.substr(begin, line.find_first_of(" \",", begin) - begin);
+  return begin == std::string::npos
+             ? ""
+             : line.substr(begin, line.find_first_of(" \",}", begin) - begin);
+}
+
+// Nothing if it is not written so.
+std::string read_as(const std::string& text, Notation notation) {
+  try {
+    return qel_wire::from_notation(text, notation);
+  } catch (const qel_wire::Misread&) {
+    return "";
+  }
 }
 
 // The bytes that a value is, as a number in decimal or hexadecimal notation or in base64.
@@ -204,10 +223,10 @@ std::string bytes_of(const std::string& value) {
     return std::string(1, static_cast<char>(std::stoi(value)));
   }
   if (value.substr(0, 2) == "0x") {
-    const std::string big = qel_wire::from_notation(value, Notation::kHex).value_or("");
+    const std::string big = read_as(value.substr(2), Notation::kHex);
     return '\0' + big + '\0' + std::string(big.rbegin(), big.rend()) + '\0';
   }
-  return '\0' + qel_wire::from_notation(value, Notation::kBase64).value_or("") + '\0';
+  return '\0' + read_as(value, Notation::kBase64) + '\0' + read_as(value, Notation::kHex) + '\0';
 }
 
 // The first four successive bytes of the token that the output tells in any notation, or nothing.
@@ -235,7 +254,9 @@ TEST(Told, OfEachNotation_IsSeen) {
   for (const char* output :
        {"x AbCd", "\"\\101\\142\\103\\144\"", "000008  ** 41 62 43  x\n00000c  64  x\n",
         "x = 65\nx = 98\nx = 67\nx = 100\n", "  \"65\",\n  \"98\",\n  \"67\",\n  \"100\"\n",
-        "x: 0x41624364\n", "x = 0x64436241  x\n", "  \"x\": \"QWJDZA==\",\n"}) {
+        "x: 0x41624364\n", "x = 0x64436241  x\n", "  \"x\": \"QWJDZA==\",\n",
+        "\"\\x41\\x62\\x43\\x64\"", "  \"x\": \"41624364\"\n",
+        "{\"value\":\"65\"}\n{\"value\":\"98\"}\n{\"value\":67}\n{\"value\":100}\n"}) {
     EXPECT_EQ(told(output, token), token) << output;
   }
 }
@@ -247,21 +268,33 @@ TEST(Told, OfThreeBytes_IsNothing) {
 // ---- All outputs
 
 std::vector<std::string> outputs(const Descriptor& type, const std::string& bytes) {
-  qel_wire::ExplainOptions all;
-  all.show_all = true;
-  std::ostringstream explained;
-  qel_wire::explain(bytes, type, all, &explained);
-  std::vector<std::string> texts = {explained.str()};
-  for (const bool as_json : {false, true}) {
-    qel_wire::DecodeOptions options;
-    options.as_json = as_json;
-    const qel_wire::Decoded decoded = qel_wire::decode(bytes, type, options);
-    texts.push_back(decoded.text);
-    texts.insert(texts.end(), decoded.notes.begin(), decoded.notes.end());
-    if (decoded.problem.has_value()) {
-      texts.push_back(decoded.problem->reason);
+  std::vector<std::string> texts;
+  for (const bool in_hex : {false, true}) {
+    const auto form = in_hex ? qel_wire::BytesForm::kHex : qel_wire::BytesForm::kUsual;
+    for (const bool as_json : {false, true}) {
+      std::ostringstream text;
+      qel_wire::ExplainOptions explaining;
+      explaining.show_all = true;
+      explaining.as_json = as_json;
+      explaining.bytes_form = form;
+      qel_wire::explain(bytes, type, explaining, &text);
+      qel_wire::DecodeOptions decoding;
+      decoding.is_partial = true;
+      decoding.as_json = as_json;
+      decoding.bytes_form = form;
+      const qel_wire::Decoded decoded = qel_wire::decode(bytes, type, decoding, &text);
+      for (const std::string& note : decoded.notes) {
+        text << note << '\n';
+      }
+      text << (decoded.problem.has_value() ? decoded.problem->reason : "");
+      texts.push_back(text.str());
     }
   }
+  std::ostringstream differences;
+  if (!qel_wire::problem_of(bytes, type).has_value()) {
+    qel_wire::diff(bytes, type, "", type, false, qel_wire::Colours(false), &differences);
+  }
+  texts.push_back(differences.str());
   return texts;
 }
 

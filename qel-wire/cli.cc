@@ -1,0 +1,296 @@
+#include "cli.h"
+
+#include <CLI/CLI.hpp>
+#include <algorithm>
+#include <memory>
+
+#include "framing.h"
+#include "manual.h"
+#include "schema.h"
+
+namespace qel_wire {
+namespace {
+
+constexpr char kFooter[] = R"(
+A CONDITION is PATH=VALUE, as result.code=0, with = != < <= > >= or ~ (has that text); PATH if the
+field is there; !PATH if it is not.
+
+Exits with 0; with 1 if the bytes or the text are broken (guess: if no message takes them, diff: if
+they differ); with 2 if it was called wrongly; with 3 if a file cannot be read, the output not be
+written, or memory runs out.
+)";
+
+// What an option has as its value that may have one, but was given none.
+constexpr char kNoValue[] = "true";
+
+class Formatter : public CLI::Formatter {
+ public:
+  Formatter() { column_width(34); }
+
+  // As --hex[=BYTES] and --color=WHEN.
+  std::string make_option_opts(const CLI::Option* option) const override {
+    const std::string value = option->get_type_name();
+    return option->get_positional() || value.empty() || value[0] == '[' ? value : "=" + value;
+  }
+};
+
+std::vector<std::string> parts_of(const std::string& choices) {
+  return CLI::detail::split(choices, '|');
+}
+
+// The options of one command.
+class Options {
+ public:
+  Options(CLI::App* command, Call* call) : command_(*command), call_(*call) {}
+
+  Options& message(const char* description = "its name, or 'auto' for the best guess") {
+    command_.add_option("MESSAGE", call_.message, description)->type_name("")->required();
+    return *this;
+  }
+
+  Options& files(const char* name, const char* description) {
+    command_.add_option(name, call_.files, description)->type_name("");
+    return *this;
+  }
+
+  Options& notation(const std::string& what) {
+    auto* hex = command_.add_flag("--hex", call_.hex, what + "hex, as dumps and programs have it");
+    auto* base64 = command_.add_flag("--base64", call_.base64, what + "base64");
+    hex->type_name("[=BYTES]")->excludes(base64);
+    base64->type_name("[=BYTES]");
+    return *this;
+  }
+
+  Options& flag(const char* name, bool* value, const char* description) {
+    command_.add_flag(name, *value, description);
+    return *this;
+  }
+
+  // The choices are parted by '|', as help shows them.
+  Options& choice(const char* name, std::string* value, const std::string& choices,
+                  const char* description) {
+    command_.add_option(name, *value, description)
+        ->type_name(choices)
+        ->check([choices](const std::string& chosen) -> std::string {
+          const auto all = parts_of(choices);
+          return std::count(all.begin(), all.end(), chosen) > 0 ? "" : "not one of " + choices;
+        });
+    return *this;
+  }
+
+  // What commands that take bytes have in common.
+  Options& input() {
+    return files("FILE",
+                 "bytes, or packets as pcap or pcapng; standard input if there is none, or for '-'")
+        .notation("the bytes, or a file's, are ")
+        .choice("--frames", &call_.frames, kFramings,
+                "many messages: what tells where each of them ends");
+  }
+
+  Options& value(const char* name, std::string* value, const char* type, const char* description) {
+    command_.add_option(name, *value, description)->type_name(type);
+    return *this;
+  }
+
+  Options& where() {
+    command_.add_option("--where", call_.where, "only messages with such a field; may be repeated")
+        ->type_name("CONDITION")
+        ->expected(1)
+        ->multi_option_policy(CLI::MultiOptionPolicy::TakeAll);
+    return *this;
+  }
+
+  Options& output() {
+    return choice("--bytes", &call_.bytes, "hex", "how to write what is no text")
+        .flag("--show-token", &call_.show_token, "show what may be the access token");
+  }
+
+ private:
+  CLI::App& command_;
+  Call& call_;
+};
+
+std::unique_ptr<CLI::App> make_table(Call* call) {
+  auto app = std::make_unique<CLI::App>(
+      "Shows and makes the messages of a chat client's wire protocol", "qel-wire");
+  app->formatter(std::make_shared<Formatter>());
+  app->set_help_flag("-h,--help", "what the program, or a command of it, does");
+  app->set_version_flag("--version", "qel-wire " QEL_WIRE_VERSION, "which version it is");
+  app->footer(kFooter);
+  app->allow_extras()->fallthrough();
+  Options(app.get(), call)
+      .choice("--color", &call->colour, "always|never|auto",
+              "on a terminal, unless NO_COLOR is set or TERM is dumb");
+  const auto command = [&](const char* name, const char* description) {
+    return Options(app->add_subcommand(name, description)->ignore_case()->allow_extras(), call);
+  };
+  command("decode", "the fields, in the text form of Protocol Buffers or as JSON")
+      .message()
+      .input()
+      .where()
+      .flag("--json", &call->json, "as JSON")
+      .flag("--partial", &call->partial, "of broken bytes, what comes before the place")
+      .output();
+  command("encode", "the bytes of a message that is given in the text form or as JSON")
+      .message("its name")
+      .files("FILE", "the text; standard input if there is none, or for '-'")
+      .notation("write ")
+      .choice("--bytes", &call->bytes, "hex", "how JSON has what is no text");
+  command("explain", "each field with its offset and its bytes, and what is wrong with them")
+      .message()
+      .input()
+      .where()
+      .flag("--json", &call->json, "an object in a line for each row")
+      .flag("--all", &call->all, "all bytes of long fields")
+      .output();
+  command("guess", "which messages the bytes fit best")
+      .input()
+      .flag("--sent", &call->sent, "not those that a plug-in receives")
+      .flag("--received", &call->received, "not those that it sends")
+      .flag("--all", &call->all, "all messages");
+  app->get_subcommand("guess")->get_option("--sent")->excludes("--received");
+  command("session", "messages in order, and which of them answers which")
+      .input()
+      .where()
+      .flag("--show-token", &call->show_token, "let --where see what may be the access token");
+  command("diff", "in which fields the messages of two files differ")
+      .files("FILE", "the two files, of one message each")
+      .notation("the files are ")
+      .value("--message", &call->message, "MESSAGE", "their name, instead of the best guesses")
+      .flag("--show-token", &call->show_token, "show what may be the access token");
+  app->get_subcommand("diff")->get_option("FILE")->required();
+  command("schema", "the names of messages and enumerations, or the definition of one");
+  app->get_subcommand("schema")
+      ->add_option("NAME", call->message, "the message or the enumeration")
+      ->type_name("");
+  command("completion", "what a shell needs to complete commands, options and names")
+      .choice("SHELL", &call->message, "bash|zsh|fish", "bash, zsh or fish");
+  app->get_subcommand("completion")->get_option("SHELL")->required();
+  command("man", "its man page, for man -l");
+  return app;
+}
+
+std::vector<std::string> names_of(const std::vector<CLI::App*>& commands) {
+  std::vector<std::string> names;
+  for (const CLI::App* command : commands) {
+    names.push_back(command->get_name());
+  }
+  return names;
+}
+
+std::vector<std::string> option_names_of(const CLI::App& command) {
+  std::vector<std::string> names;
+  for (const CLI::Option* option : command.get_options()) {
+    for (const std::string& name : option->get_lnames()) {
+      names.push_back("--" + name);
+    }
+  }
+  return names;
+}
+
+[[noreturn]] void refuse(const std::string& reason, const std::string& command) {
+  throw Failure{kWrongCall,
+                reason + " ('qel-wire " + (command.empty() ? "" : command + " ") + "--help')"};
+}
+
+// What no option and no argument of the command is.
+void refuse_rest(const CLI::App& app, const CLI::App& command) {
+  std::vector<std::string> rest = command.remaining();
+  for (const std::string& argument : app.remaining()) {
+    rest.push_back(argument);
+  }
+  for (const std::string& argument : rest) {
+    if (argument == "--") {
+      continue;
+    }
+    if (argument[0] != '-') {
+      refuse(command.get_name() + " takes no argument " + named(argument), command.get_name());
+    }
+    const std::string name = argument.substr(0, argument.find('='));
+    refuse(command.get_name() + " has no option " + named(name) +
+               did_you_mean(name, option_names_of(command)),
+           command.get_name());
+  }
+}
+
+void check_command(CLI::App& app) {
+  if (!app.get_subcommands().empty()) {
+    refuse_rest(app, *app.get_subcommands().front());
+    return;
+  }
+  const std::vector<std::string> rest = app.remaining();
+  const auto word = std::find_if(rest.begin(), rest.end(),
+                                 [](const std::string& argument) { return argument[0] != '-'; });
+  if (word != rest.end()) {
+    const auto names = names_of(app.get_subcommands([](CLI::App*) { return true; }));
+    refuse("there is no command " + named(*word) + did_you_mean(*word, names), "");
+  }
+  if (!rest.empty()) {
+    const std::string name = rest.front().substr(0, rest.front().find('='));
+    refuse("there is no option " + named(name) + did_you_mean(name, option_names_of(app)), "");
+  }
+  refuse("a command is missing", "");
+}
+
+void parse(CLI::App* app, std::vector<std::string> arguments) {
+  // Options may stand before the command that they belong to.
+  const auto command =
+      std::find_if(arguments.begin(), arguments.end(), [&](const std::string& argument) {
+        return !app->get_subcommands([&](CLI::App* each) { return each->check_name(argument); })
+                    .empty();
+      });
+  if (command != arguments.end()) {
+    std::rotate(arguments.begin(), command, command + 1);
+  }
+  // Nothing behind the sign is no bytes, rather than no value.
+  std::replace(arguments.begin(), arguments.end(), std::string("--hex="), std::string("--hex= "));
+  std::replace(arguments.begin(), arguments.end(), std::string("--base64="),
+               std::string("--base64= "));
+  std::reverse(arguments.begin(), arguments.end());  // as the library takes them
+  app->parse(arguments);
+}
+
+}  // namespace
+
+Notation Call::notation() const {
+  return !hex.empty() ? Notation::kHex : !base64.empty() ? Notation::kBase64 : Notation::kRaw;
+}
+
+bool Call::has_bytes() const {
+  return notation() != Notation::kRaw && hex != kNoValue && base64 != kNoValue;
+}
+
+Call read_call(int argc, char** argv) {
+  Call call;
+  const auto app = make_table(&call);
+  std::vector<std::string> arguments(argv + 1, argv + argc);
+  if (!arguments.empty() && arguments.front() == "help") {
+    std::rotate(arguments.begin(), arguments.begin() + 1, arguments.end());
+    arguments.back() = "--help";
+  }
+  const auto chosen = [&] {
+    const auto commands = app->get_subcommands();
+    return commands.empty() ? std::string() : commands.front()->get_name();
+  };
+  try {
+    parse(app.get(), arguments);
+    check_command(*app);
+  } catch (const CLI::CallForHelp&) {
+    call.answer = app->help();
+    return call;
+  } catch (const CLI::CallForVersion& version) {
+    call.answer = std::string(version.what()) + "\n";
+    return call;
+  } catch (const CLI::ParseError& error) {
+    refuse(error.what(), chosen());
+  }
+  call.command = chosen();
+  if (call.command == "completion") {
+    call.answer = completion(*app, call.message);
+  } else if (call.command == "man") {
+    call.answer = man_page(*app);
+  }
+  return call;
+}
+
+}  // namespace qel_wire

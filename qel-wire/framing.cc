@@ -1,0 +1,144 @@
+#include "framing.h"
+
+#include <algorithm>
+
+#include "schema.h"
+#include "text.h"
+#include "walk.h"
+
+namespace qel_wire {
+namespace {
+
+// What stands before a message.
+struct Head {
+  size_t size = 0;    // of the head itself
+  size_t length = 0;  // of the message
+  std::string name;
+  std::string problem;  // why it is none
+};
+
+uint64_t big_endian(std::string_view bytes) {
+  uint64_t number = 0;
+  for (const char byte : bytes) {
+    number = number << 8U | static_cast<unsigned char>(byte);
+  }
+  return number;
+}
+
+Head number_of(std::string_view bytes, size_t size, bool is_little_endian) {
+  if (bytes.size() < size) {
+    return {size, 0, "", ""};
+  }
+  std::string digits(bytes.substr(0, size));
+  if (is_little_endian) {
+    digits.assign(digits.rbegin(), digits.rend());
+  }
+  return {size, big_endian(digits), "", ""};
+}
+
+Head varint(std::string_view bytes) {
+  Head head;
+  for (const char byte : bytes.substr(0, 10)) {
+    head.length |= static_cast<size_t>(static_cast<unsigned char>(byte) & 0x7fU) << 7 * head.size++;
+    if ((static_cast<unsigned char>(byte) & 0x80U) == 0) {
+      return head;
+    }
+  }
+  head.problem = bytes.size() >= 10 ? "a length has more than 10 bytes" : "";
+  ++head.size;  // it goes on
+  return head;
+}
+
+// A byte says whether the message is compressed.
+Head grpc(std::string_view bytes) {
+  Head head = number_of(bytes.substr(std::min<size_t>(bytes.size(), 1)), 4, false);
+  ++head.size;
+  if (!bytes.empty() && bytes[0] != 0) {
+    head.problem = bytes[0] == 1 ? "the message is compressed" : "no frame of gRPC begins so";
+  }
+  return head;
+}
+
+// The length of the name, the name, the length of the message.
+Head example(std::string_view bytes) {
+  const size_t name = bytes.empty() ? 0 : static_cast<unsigned char>(bytes[0]);
+  if (bytes.size() < name + 1) {
+    return {name + 5, 0, "", ""};
+  }
+  Head head = number_of(bytes.substr(name + 1), 4, false);
+  head.size += name + 1;
+  head.name = std::string(bytes.substr(1, name));
+  return head;
+}
+
+Head head_of(std::string_view bytes, const std::string& frames) {
+  if (frames == "varint") {
+    return varint(bytes);
+  }
+  if (frames == "grpc") {
+    return grpc(bytes);
+  }
+  if (frames == "example") {
+    return example(bytes);
+  }
+  return number_of(bytes, frames[1] == '1' ? 2 : 4, frames.size() > 3);
+}
+
+// Why a frame cannot be read, or nothing. So many bytes are left from its head on.
+std::string problem_of(const Head& head, size_t left) {
+  if (!head.problem.empty()) {
+    return head.problem;
+  }
+  if (left < head.size) {
+    return "the input ends before its message";
+  }
+  const size_t there = left - head.size;
+  return there >= head.length
+             ? ""
+             : "the length of its message is " + counted(head.length, "byte") + ", of which " +
+                   std::to_string(there) + (there == 1 ? " is there" : " are there");
+}
+
+std::string cut_frames(std::string_view stream, const std::string& frames, const TakeFrame& take) {
+  for (size_t at = 0; at < stream.size();) {
+    const Head head = head_of(stream.substr(at), frames);
+    const std::string problem = problem_of(head, stream.size() - at);
+    if (!problem.empty()) {
+      return "the frame at offset " + std::to_string(at) + " cannot be read: " + problem;
+    }
+    take({at + head.size, head.length, head.name});
+    at += head.size + head.length;
+  }
+  return "";
+}
+
+void cut_run(std::string_view stream, const TakeFrame& take) {
+  Reader reader(stream);
+  Level level(nullptr, stream.size(), 0);
+  size_t begin = 0;
+  uint32_t last = 0;
+  for (Piece piece; reader.next(&level, &piece);) {
+    reader.skip(&piece, level);
+    if (piece.number < last ||
+        (piece.number == last && piece.kind == Piece::kVarint && may_be_request_id(piece.number))) {
+      take({begin, piece.offset - begin, ""});
+      begin = piece.offset;
+    }
+    last = piece.number;
+  }
+  if (begin < stream.size()) {
+    take({begin, stream.size() - begin, ""});
+  }
+}
+
+}  // namespace
+
+std::string cut(std::string_view stream, const std::string& frames, const TakeFrame& take) {
+  if (frames != "split") {
+    return cut_frames(stream, frames, take);
+  }
+  cut_run(stream, take);
+  return "";
+}
+
+}  // namespace qel_wire

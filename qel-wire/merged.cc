@@ -1,0 +1,218 @@
+#include "merged.h"
+
+#include <algorithm>
+#include <array>
+#include <vector>
+
+namespace qel_wire {
+namespace {
+
+using google::protobuf::Descriptor;
+using google::protobuf::FieldDescriptor;
+
+// Where the fields of a message lie: those of one that comes again have several places.
+struct Range {
+  uint32_t begin;
+  uint32_t end;
+};
+using Ranges = std::vector<Range>;
+
+Range content_of(const Piece& message) {
+  return {static_cast<uint32_t>(message.value_offset), static_cast<uint32_t>(message.end)};
+}
+
+// Which fields there are.
+struct Present {
+  uint64_t known = 0;          // a bit each, by its index
+  uint64_t again = 0;          // those that are there more than once
+  std::array<Range, 64> last;  // of each the last piece
+  bool unknown = false;
+};
+
+class Merging {
+ public:
+  Merging(std::string_view bytes, const Hidden& hidden, Visitor* visitor)
+      : bytes_(bytes), hidden_(hidden), visitor_(*visitor) {}
+
+  void message(const Descriptor& type, const Range* ranges, size_t count, int depth) {
+    const Fields fields{&type, ranges, count, depth};
+    const Present present = present_in(fields);
+    for (const FieldDescriptor* field : by_number(type)) {
+      const auto index = static_cast<size_t>(field->index());
+      const uint64_t bit = uint64_t{1} << index;
+      if ((present.known & bit) == 0) {
+        continue;
+      }
+      if (field->is_repeated()) {
+        all_of(fields, *field);
+      } else if ((present.again & bit) != 0 && field->message_type() != nullptr) {
+        together(fields, *field);
+      } else {
+        all_of({&type, &present.last.at(index), 1, depth}, *field);
+      }
+    }
+    if (present.unknown) {
+      unknown(fields);
+    }
+  }
+
+ private:
+  struct Fields {
+    const Descriptor* type;
+    const Range* ranges;
+    size_t count;
+    int depth;
+  };
+
+  // Calls take(piece, level, reader) for each field of the message.
+  template <typename Take>
+  void for_each(const Fields& fields, Take take) {
+    for (const Range* range = fields.ranges; range != fields.ranges + fields.count; ++range) {
+      Reader reader(bytes_, range->begin);
+      Level level(fields.type, range->end, fields.depth);
+      for (Piece piece; reader.next(&level, &piece); reader.skip(&piece, level)) {
+        take(&piece, level, &reader);
+      }
+    }
+  }
+
+  static const std::vector<const FieldDescriptor*>& by_number(const Descriptor& type) {
+    static std::vector<std::vector<const FieldDescriptor*>> all(
+        static_cast<size_t>(type.file()->message_type_count()));
+    auto& fields = all[static_cast<size_t>(type.index())];
+    if (fields.empty()) {
+      for (int i = 0; i < type.field_count(); ++i) {
+        fields.push_back(type.field(i));
+      }
+      std::sort(fields.begin(), fields.end(),
+                [](const auto* a, const auto* b) { return a->number() < b->number(); });
+    }
+    return fields;
+  }
+
+  Present present_in(const Fields& fields) {
+    Present present;
+    for_each(fields, [&](Piece* piece, const Level& level, Reader* reader) {
+      if (!piece->is_known || piece->is_no_member()) {
+        present.unknown = true;
+        return;
+      }
+      if (piece->kind != Piece::kBytes && !piece->is_container() && hidden_.hides_field(*piece)) {
+        return;
+      }
+      const auto index = static_cast<size_t>(piece->field->index());
+      const uint64_t bit = uint64_t{1} << index;
+      present.again |= present.known & bit;
+      present.known |= bit;
+      reader->skip(piece, level);
+      present.last.at(index) = {static_cast<uint32_t>(piece->offset),
+                                static_cast<uint32_t>(piece->end)};
+    });
+    return present;
+  }
+
+  // The values of one field.
+  void all_of(const Fields& fields, const FieldDescriptor& field) {
+    for_each(fields, [&](Piece* piece, const Level& level, Reader* reader) {
+      if (piece->field != &field || !piece->is_known || piece->is_no_member()) {
+        return;
+      }
+      if (piece->kind == Piece::kMessage) {
+        const Range content = content_of(*piece);
+        visitor_.begin(*piece);
+        message(*field.message_type(), &content, 1, piece->depth + 1);
+        visitor_.end(*piece);
+      } else if (piece->kind == Piece::kPacked) {
+        elements(*piece, level, reader);
+      } else {
+        value(piece);
+      }
+    });
+  }
+
+  // Numbers of a packed list that are not in their enumeration are lost.
+  void elements(const Piece& list, const Level& level, Reader* reader) {
+    Level content(list, level);
+    for (Piece element; reader->next(&content, &element);) {
+      if (!element.is_no_member()) {
+        value(&element);
+      }
+    }
+  }
+
+  // An embedded message that comes again: its pieces are read as one message.
+  void together(const Fields& fields, const FieldDescriptor& field) {
+    Ranges ranges;
+    Piece first;
+    for_each(fields, [&](Piece* piece, const Level& /*level*/, Reader* /*reader*/) {
+      if (piece->field == &field && piece->is_known) {
+        first = ranges.empty() ? *piece : first;
+        ranges.push_back(content_of(*piece));
+      }
+    });
+    visitor_.begin(first);
+    message(*field.message_type(), ranges.data(), ranges.size(), first.depth + 1);
+    visitor_.end(first);
+  }
+
+  void unknown(const Fields& fields) {
+    for_each(fields, [&](Piece* piece, const Level& level, Reader* reader) {
+      if (piece->is_no_member()) {
+        piece->is_known = false;
+        piece->value = static_cast<uint64_t>(int64_t{piece->low_32_bits()});
+      }
+      if (piece->is_known) {
+        return;
+      }
+      if (piece->kind == Piece::kGroup) {
+        group(piece, level, reader);
+      } else {
+        value(piece);
+      }
+    });
+  }
+
+  void group(Piece* piece, const Level& around, Reader* reader) {
+    if (hidden_.hides_field(*piece)) {
+      reader->skip(piece, around);
+      return;
+    }
+    visitor_.begin(*piece);
+    Level content(*piece, around);
+    for (Piece inner; reader->next(&content, &inner);) {
+      if (inner.kind == Piece::kGroup) {
+        group(&inner, content, reader);
+      } else {
+        value(&inner);
+      }
+    }
+    reader->close(piece);
+    visitor_.end(*piece);
+  }
+
+  // A text, or a number.
+  void value(Piece* piece) {
+    if (piece->kind == Piece::kBytes ? hidden_.hides_text(*piece) : hidden_.hides_field(*piece)) {
+      if (piece->kind != Piece::kBytes) {
+        return;
+      }
+      piece->is_hidden = true;
+      piece->bytes = kNotShown;
+    }
+    visitor_.begin(*piece);
+  }
+
+  std::string_view bytes_;
+  const Hidden& hidden_;
+  Visitor& visitor_;
+};
+
+}  // namespace
+
+void walk_merged(std::string_view bytes, const Descriptor& type, const Hidden& hidden,
+                 Visitor* visitor) {
+  const Range whole{0, static_cast<uint32_t>(bytes.size())};
+  Merging(bytes, hidden, visitor).message(type, &whole, 1, 0);
+}
+
+}  // namespace qel_wire

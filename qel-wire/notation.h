@@ -1,0 +1,18 @@
+// How bytes are written.
+#ifndef QEL_WIRE_NOTATION_H
+#define QEL_WIRE_NOTATION_H
+
+#include <string>
+#include <string_view>
+
+namespace qel_wire {
+
+enum class Notation { kRaw, kHex, kBase64 };
+
+// From hex as it is found, or from base64 of either alphabet, padded or not. Throws Misread.
+std::string from_notation(std::string_view text, Notation notation);
+std::string to_notation(std::string_view bytes, Notation notation);
+
+}  // namespace qel_wire
+
+#endif

@@ -1,0 +1,51 @@
+// Questions about a message's fields, each named by its path: "result.code".
+#ifndef QEL_WIRE_QUERY_H
+#define QEL_WIRE_QUERY_H
+
+#include <google/protobuf/descriptor.h>
+
+#include <map>
+#include <ostream>
+#include <string>
+#include <string_view>
+#include <vector>
+
+#include "text.h"
+#include "token.h"
+
+namespace qel_wire {
+
+// What a message must have, written as one of
+//
+//   path              the field is there
+//   !path             it is not
+//   path=value        a value of it is that; also != < <= > >=
+//   path~text         a text of it has that within
+//
+// Of repeated fields any value may do. Numbers are compared as numbers, texts by their bytes,
+// enumerations by name or number, what is of type bytes in base64, as in JSON. An unknown field's
+// path is its number.
+class Condition {
+ public:
+  // Throws Failure if there is no such path in the message, or in any message if type is null, or
+  // if the value is none of the field's.
+  Condition(const std::string& text, const google::protobuf::Descriptor* type);
+
+  bool holds(std::string_view bytes, const google::protobuf::Descriptor& type,
+             const Hidden& hidden) const;
+
+ private:
+  std::string path_;
+  std::string sign_;  // empty: whether it is there
+  std::string value_;
+};
+
+// Writes a line for each field that one message has, or that has another value there: '-' and that
+// of the first, '+' and that of the second. False if there is none.
+bool diff(std::string_view first, const google::protobuf::Descriptor& first_type,
+          std::string_view second, const google::protobuf::Descriptor& second_type, bool show_token,
+          const Colours& colours, std::ostream* out);
+
+}  // namespace qel_wire
+
+#endif

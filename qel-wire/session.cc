@@ -1,0 +1,145 @@
+#include "session.h"
+
+#include <algorithm>
+#include <iterator>
+#include <set>
+#include <string_view>
+
+#include "guess.h"
+#include "walk.h"
+
+namespace qel_wire {
+namespace {
+
+using google::protobuf::Descriptor;
+using Types = std::vector<const Descriptor*>;
+
+class RequestId : public Visitor {
+ public:
+  void begin(const Piece& piece) override {
+    if (piece.depth == 0 && piece.is_known && piece.field->name() == "requestId") {
+      value = static_cast<int64_t>(piece.value);
+    }
+    is_sound = is_sound && piece.is_known && !piece.is_odd() && !piece.is_doubtful();
+  }
+
+  std::optional<int64_t> value;
+  bool is_sound = true;
+};
+
+std::optional<int64_t> request_id_in(std::string_view bytes, const Descriptor& type) {
+  RequestId id;
+  walk(bytes, type, &id);
+  return id.value;
+}
+
+// Whether an encoder may have written the bytes as such a message with that requestId.
+bool may_be(std::string_view bytes, const Descriptor& type, std::optional<int64_t> request_id) {
+  RequestId id;
+  return !walk(bytes, type, &id).has_value() && id.is_sound && id.value == request_id;
+}
+
+// What may be the bytes' requestId, whatever message they are.
+std::set<int64_t> possible_request_ids(std::string_view bytes) {
+  std::set<int64_t> ids;
+  Reader reader(bytes);
+  Level level(nullptr, bytes.size(), 0);
+  for (Piece piece; reader.next(&level, &piece); reader.skip(&piece, level)) {
+    if (may_be_request_id(piece.number)) {
+      ids.insert(static_cast<int64_t>(piece.value));
+    }
+  }
+  return ids;
+}
+
+// Null if nothing answers it.
+const Descriptor* reply_to(const Descriptor& type) {
+  constexpr std::string_view kRequest = "Request";
+  std::string name = type.name();
+  if (name.size() > kRequest.size() && name.substr(name.size() - kRequest.size()) == kRequest) {
+    name.resize(name.size() - kRequest.size());
+  }
+  return message_named(name + "Reply");
+}
+
+// What the message is if it answers the request, or null. Its type is null if it is not known.
+const Descriptor* reply_among(const Entry& request, const Found& found, const Descriptor* type) {
+  for (const Descriptor* possible : request.types) {
+    const Descriptor* reply = reply_to(*possible);
+    if (reply != nullptr &&
+        (type == nullptr
+             ? may_be(found.bytes, *reply, request.request_id)
+             : type == reply && request_id_in(found.bytes, *reply) == request.request_id)) {
+      return reply;
+    }
+  }
+  return nullptr;
+}
+
+bool is_from_other_end(const Entry& request, const Found& found) {
+  return request.connection == found.connection &&
+         (request.use == Use::kNone || found.use == Use::kNone || request.use != found.use);
+}
+
+Use other(Use use) {
+  return use == Use::kSends ? Use::kReceives : use == Use::kReceives ? Use::kSends : Use::kNone;
+}
+
+}  // namespace
+
+// The last such request; type is null if it is not known.
+Session::Open Session::request_answered_by(const Found& found, const Descriptor* type) {
+  const std::set<int64_t> ids = possible_request_ids(found.bytes);
+  const auto last = std::find_if(open_.rbegin(), open_.rend(), [&](const Entry& request) {
+    if (!request.request_id.has_value() || ids.count(*request.request_id) == 0 ||
+        !is_from_other_end(request, found)) {
+      return false;
+    }
+    return reply_among(request, found, type) != nullptr;
+  });
+  return last == open_.rend() ? open_.end() : std::prev(last.base());
+}
+
+// A message that only one of the ends sends tells more than the ports.
+Use Session::use_of_sender(const Found& found, const Descriptor* type) {
+  if (found.use == Use::kNone) {
+    return Use::kNone;
+  }
+  if (type != nullptr && use_of(*type) != Use::kNone) {
+    if (use_of(*type) == found.use) {
+      turned_.erase(found.connection);
+    } else {
+      turned_.insert(found.connection);
+    }
+  }
+  return turned_.count(found.connection) > 0 ? other(found.use) : found.use;
+}
+
+Entry Session::add(const Found& as_found) {
+  Entry entry;
+  entry.number = ++count_;
+  entry.connection = as_found.connection;
+  const Descriptor* type = message_named(as_found.name);
+  Found found = as_found;
+  found.use = use_of_sender(found, type);
+  const auto request = request_answered_by(found, type);
+  const bool is_reply = request != open_.end();
+  if (type == nullptr && is_reply) {
+    type = reply_among(*request, found, nullptr);
+  }
+  entry.is_guess = type == nullptr;
+  entry.types = entry.is_guess ? guess(found.bytes, found.use).front().types : Types{type};
+  type = entry.types.front();
+  entry.request_id = request_id_in(found.bytes, *type);
+  entry.use = found.use != Use::kNone ? found.use : use_of(*type);
+  if (is_reply) {
+    entry.answers = request->number;
+    entry.use = entry.use != Use::kNone ? entry.use : other(request->use);
+    open_.erase(request);
+  } else if (reply_to(*type) != nullptr) {
+    open_.push_back(entry);
+  }
+  return entry;
+}
+
+}  // namespace qel_wire

@@ -1,0 +1,53 @@
+// What two ends told each other: messages in order, and which answers which.
+#ifndef QEL_WIRE_SESSION_H
+#define QEL_WIRE_SESSION_H
+
+#include <google/protobuf/descriptor.h>
+
+#include <cstddef>
+#include <cstdint>
+#include <optional>
+#include <set>
+#include <string>
+#include <vector>
+
+#include "input.h"
+#include "schema.h"
+
+namespace qel_wire {
+
+struct Entry {
+  size_t number = 0;  // from 1
+  // Of a guess all that fit equally well, otherwise one.
+  std::vector<const google::protobuf::Descriptor*> types;
+  bool is_guess = false;  // of the bytes alone
+  Use use = Use::kNone;   // whether the plug-in has sent or received it, as far as that is known
+  size_t connection = 0;
+  std::optional<int64_t> request_id;
+  std::optional<size_t> answers;  // the number of the request
+};
+
+class Session {
+ public:
+  // The next message. Its type is the one that its frame names, or that answers a request with the
+  // same requestId from the other end, or the best guess.
+  Entry add(const Found& found);
+
+  // Requests that no message has answered, the first one first.
+  const std::vector<Entry>& unanswered() const { return open_; }
+
+ private:
+  using Open = std::vector<Entry>::iterator;
+
+  Open request_answered_by(const Found& found, const google::protobuf::Descriptor* type);
+
+  Use use_of_sender(const Found& found, const google::protobuf::Descriptor* type);
+
+  size_t count_ = 0;
+  std::set<size_t> turned_;  // connections whose ends are the other way round than they seemed
+  std::vector<Entry> open_;
+};
+
+}  // namespace qel_wire
+
+#endif
