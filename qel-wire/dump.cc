@@ -14,15 +14,15 @@ namespace qel_wire {
 namespace {
 
 // A line: "0000000 0708", "00000000: 0807", "0x0000:  0807", "0x4010 <name+8>: 0x08".
-struct Row {
+struct DumpRow {
   std::string_view offset;  // its digits, or nothing if none begins the line
   bool has_colon = false;   // behind the offset
   size_t gap = 0;           // the blanks behind it
   std::string_view groups;  // and what is behind them
 };
 
-Row row_of(std::string_view line) {
-  Row row;
+DumpRow row_of(std::string_view line) {
+  DumpRow row;
   take_prefix("0x", &line);
   const std::string_view offset = take_while(is_digit, &line);
   if (take_prefix(" <", &line)) {
@@ -128,7 +128,7 @@ class Dump {
   }
 
   void read_row(std::string_view line) {
-    const Row row = row_of(line);
+    const DumpRow row = row_of(line);
     if (row.offset.empty() || row.has_colon != first_.has_colon) {
       throw Stop{line.data(), "no offset before the bytes, as in the lines above"};
     }
@@ -141,13 +141,13 @@ class Dump {
   }
 
   // How many bytes are above, by the offset.
-  std::optional<uint64_t> above(const Row& row, int base) const {
+  std::optional<uint64_t> above(const DumpRow& row, int base) const {
     const std::optional<uint64_t> from = number(first_.offset, base);
     const std::optional<uint64_t> to = number(row.offset, base);
     return from.has_value() && to >= from ? std::optional(*to - *from) : std::nullopt;
   }
 
-  bool fits(const Row& row, int base) const {
+  bool fits(const DumpRow& row, int base) const {
     const uint64_t count = above(row, base).value_or(kMostBytes + 1);
     const bool is_last = row.groups.empty();
     if (is_repeated_) {
@@ -158,7 +158,7 @@ class Dump {
     return count <= bytes_.size() && bytes_.size() - count < (is_last && base_ != 0 ? size_ : 1);
   }
 
-  void take_offset(const Row& row) {
+  void take_offset(const DumpRow& row) {
     const auto end =
         std::remove_if(bases_.begin(), bases_.end(), [&](int base) { return !fits(row, base); });
     const std::optional<uint64_t> count = above(row, bases_.front());
@@ -249,7 +249,7 @@ class Dump {
   }
 
   std::string_view rest_;
-  Row first_;
+  DumpRow first_;
   size_t digits_ = 0;                  // of the first group
   size_t size_ = 0;                    // its bytes
   int base_ = 0;                       // of groups that are numbers; 0: bytes in their order

@@ -19,9 +19,9 @@ using Doubts = std::vector<std::string>;
 constexpr size_t kBytesInRow = 8;
 constexpr size_t kMostShown = 4 * kBytesInRow;  // of a field's bytes, and of a text's
 
-std::string in_hex(const char* format, size_t number) {
+std::string offset_of(size_t number) {
   char text[24];
-  std::snprintf(text, sizeof text, format, number);
+  std::snprintf(text, sizeof text, "%06zx", number);
   return text;
 }
 
@@ -162,16 +162,20 @@ class Table : public Rows {
     size_t at = 0;
     do {
       const size_t in_row = std::min(shown - at, kBytesInRow);
-      out_ << colours_.quiet << in_hex("%06zx", row.offset + at) << colours_.end << ' ';
+      std::string line;
       for (size_t byte = row.offset + at; byte < row.offset + at + in_row; ++byte) {
-        out_ << (hidden_.at(byte) ? " **"
-                                  : in_hex(" %02zx", static_cast<unsigned char>(bytes_[byte])));
+        line += ' ';
+        if (hidden_.at(byte)) {
+          line += "**";
+        } else {
+          append_hex(bytes_[byte], &line);
+        }
       }
       if (at == 0) {
         const size_t indent = 2 * static_cast<size_t>(row.depth);
-        out_ << std::string(3 * (kBytesInRow - in_row) + 2 + indent, ' ') << meaning_of(row);
+        line += std::string(3 * (kBytesInRow - in_row) + 2 + indent, ' ') + meaning_of(row);
       }
-      out_ << '\n';
+      out_ << colours_.quiet << offset_of(row.offset + at) << colours_.end << ' ' << line << '\n';
       at += in_row;
     } while (at < shown);
     if (shown < size) {

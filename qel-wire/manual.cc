@@ -70,13 +70,12 @@ std::string options_in_roff(const CLI::App& command) {
     if (option == command.get_help_ptr() && command.get_parent() != nullptr) {
       continue;  // which all commands have
     }
-    const std::string value = option->get_type_name();
-    const std::string name =
-        option->get_positional() ? option->get_name() : option->get_name(false, true);
-    const bool is_argument = option->get_positional();
-    text += ".TP\n.B " +
-            in_roff(is_argument ? name : name + (has_value(*option) ? "=" : "") + value) + "\n" +
-            in_roff(option->get_description()) + "\n";
+    std::string name = option->get_name(false, !option->get_positional());
+    if (!option->get_positional()) {
+      name += (has_value(*option) ? "=" : "") + option->get_type_name();
+    }
+    text += ".TP\n.B ";
+    text += in_roff(name) + "\n" + in_roff(option->get_description()) + "\n";
   }
   return text;
 }

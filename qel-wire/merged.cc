@@ -2,6 +2,8 @@
 
 #include <algorithm>
 #include <array>
+#include <functional>
+#include <optional>
 #include <vector>
 
 namespace qel_wire {
@@ -10,12 +12,20 @@ namespace {
 using google::protobuf::Descriptor;
 using google::protobuf::FieldDescriptor;
 
-// Where the fields of a message lie: those of one that comes again have several places.
 struct Range {
   uint32_t begin;
   uint32_t end;
 };
-using Ranges = std::vector<Range>;
+
+// Where the fields of a message lie: in one place, or, of one that comes again, in each piece of
+// the message around it that is of that field.
+struct Fields {
+  const Descriptor* type;
+  int depth;
+  Range range;
+  const Fields* around;
+  const FieldDescriptor* field;
+};
 
 Range content_of(const Piece& message) {
   return {static_cast<uint32_t>(message.value_offset), static_cast<uint32_t>(message.end)};
@@ -34,10 +44,9 @@ class Merging {
   Merging(std::string_view bytes, const Hidden& hidden, Visitor* visitor)
       : bytes_(bytes), hidden_(hidden), visitor_(*visitor) {}
 
-  void message(const Descriptor& type, const Range* ranges, size_t count, int depth) {
-    const Fields fields{&type, ranges, count, depth};
+  void message(const Fields& fields) {
     const Present present = present_in(fields);
-    for (const FieldDescriptor* field : by_number(type)) {
+    for (const FieldDescriptor* field : by_number(*fields.type)) {
       const auto index = static_cast<size_t>(field->index());
       const uint64_t bit = uint64_t{1} << index;
       if ((present.known & bit) == 0) {
@@ -48,7 +57,7 @@ class Merging {
       } else if ((present.again & bit) != 0 && field->message_type() != nullptr) {
         together(fields, *field);
       } else {
-        all_of({&type, &present.last.at(index), 1, depth}, *field);
+        all_of({fields.type, fields.depth, present.last.at(index), nullptr, nullptr}, *field);
       }
     }
     if (present.unknown) {
@@ -57,22 +66,26 @@ class Merging {
   }
 
  private:
-  struct Fields {
-    const Descriptor* type;
-    const Range* ranges;
-    size_t count;
-    int depth;
-  };
+  using Take = std::function<void(Piece* piece, const Level& level, Reader* reader)>;
 
-  // Calls take(piece, level, reader) for each field of the message.
-  template <typename Take>
-  void for_each(const Fields& fields, Take take) {
-    for (const Range* range = fields.ranges; range != fields.ranges + fields.count; ++range) {
-      Reader reader(bytes_, range->begin);
-      Level level(fields.type, range->end, fields.depth);
-      for (Piece piece; reader.next(&level, &piece); reader.skip(&piece, level)) {
-        take(&piece, level, &reader);
-      }
+  // For each field of the message.
+  void for_each(const Fields& fields, const Take& take) {
+    if (fields.around != nullptr) {
+      for_each(*fields.around, [&](Piece* piece, const Level& /*level*/, Reader* /*reader*/) {
+        if (piece->field == fields.field && piece->is_known) {
+          for_each_in(content_of(*piece), fields, take);
+        }
+      });
+    } else {
+      for_each_in(fields.range, fields, take);
+    }
+  }
+
+  void for_each_in(const Range& range, const Fields& fields, const Take& take) {
+    Reader reader(bytes_, range.begin);
+    Level level(fields.type, range.end, fields.depth);
+    for (Piece piece; reader.next(&level, &piece); reader.skip(&piece, level)) {
+      take(&piece, level, &reader);
     }
   }
 
@@ -118,9 +131,8 @@ class Merging {
         return;
       }
       if (piece->kind == Piece::kMessage) {
-        const Range content = content_of(*piece);
         visitor_.begin(*piece);
-        message(*field.message_type(), &content, 1, piece->depth + 1);
+        message({field.message_type(), piece->depth + 1, content_of(*piece), nullptr, nullptr});
         visitor_.end(*piece);
       } else if (piece->kind == Piece::kPacked) {
         elements(*piece, level, reader);
@@ -142,17 +154,15 @@ class Merging {
 
   // An embedded message that comes again: its pieces are read as one message.
   void together(const Fields& fields, const FieldDescriptor& field) {
-    Ranges ranges;
-    Piece first;
+    std::optional<Piece> first;
     for_each(fields, [&](Piece* piece, const Level& /*level*/, Reader* /*reader*/) {
-      if (piece->field == &field && piece->is_known) {
-        first = ranges.empty() ? *piece : first;
-        ranges.push_back(content_of(*piece));
+      if (piece->field == &field && piece->is_known && !first.has_value()) {
+        first = *piece;
       }
     });
-    visitor_.begin(first);
-    message(*field.message_type(), ranges.data(), ranges.size(), first.depth + 1);
-    visitor_.end(first);
+    visitor_.begin(*first);
+    message({field.message_type(), fields.depth + 1, {}, &fields, &field});
+    visitor_.end(*first);
   }
 
   void unknown(const Fields& fields) {
@@ -212,7 +222,7 @@ class Merging {
 void walk_merged(std::string_view bytes, const Descriptor& type, const Hidden& hidden,
                  Visitor* visitor) {
   const Range whole{0, static_cast<uint32_t>(bytes.size())};
-  Merging(bytes, hidden, visitor).message(type, &whole, 1, 0);
+  Merging(bytes, hidden, visitor).message({&type, 0, whole, nullptr, nullptr});
 }
 
 }  // namespace qel_wire

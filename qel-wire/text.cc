@@ -101,12 +101,17 @@ std::string in_quotes(std::string_view text) {
   return result + '"';
 }
 
-std::string in_hex_escapes(std::string_view bytes) {
+void append_hex(char byte, std::string* to) {
   constexpr char kDigits[] = "0123456789abcdef";
+  *to += kDigits[static_cast<unsigned char>(byte) >> 4U];
+  *to += kDigits[static_cast<unsigned char>(byte) & 15U];
+}
+
+std::string in_hex_escapes(std::string_view bytes) {
   std::string result = "\"";
-  for (const char c : bytes) {
-    const auto byte = static_cast<unsigned char>(c);
-    result += {'\\', 'x', kDigits[byte >> 4U], kDigits[byte & 15U]};
+  for (const char byte : bytes) {
+    result += "\\x";
+    append_hex(byte, &result);
   }
   return result + '"';
 }

@@ -18,6 +18,9 @@ std::string in_quotes(std::string_view text);
 // In quotes too, with every byte as \x and two digits.
 std::string in_hex_escapes(std::string_view bytes);
 
+// Two digits.
+void append_hex(char byte, std::string* to);
+
 // The bytes of the text's first character, or 0 if that is none or one that a terminal would obey.
 size_t size_of_character(std::string_view text);
 

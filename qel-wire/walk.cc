@@ -143,9 +143,9 @@ std::string Reader::ender(size_t end) const {
   return end == bytes_.size() ? "the input ends" : "the message around it ends";
 }
 
-// Kept bits are those that the runtime keeps.
+// The runtime keeps the bits that the largest number has.
 std::optional<Reader::Varint> Reader::varint(const Level& level, const Piece& piece,
-                                             const char* what, int kept_bits) {
+                                             const char* what, uint64_t most) {
   const size_t begin = at_;
   uint64_t value = 0;
   for (size_t i = 0; i < kLongestVarint; ++i) {
@@ -157,8 +157,7 @@ std::optional<Reader::Varint> Reader::varint(const Level& level, const Piece& pi
     value |= static_cast<uint64_t>(byte & 0x7fU) << (7 * i);
     if (byte < 0x80) {
       const bool is_long = byte == 0 && i > 0;
-      const bool is_cut = (i + 1 == kLongestVarint && byte > 1) ||
-                          (kept_bits < 64 && value >> static_cast<unsigned>(kept_bits) != 0);
+      const bool is_cut = (i + 1 == kLongestVarint && byte > 1) || value > most;
       return Varint{value, (is_long ? unsigned{Piece::kLongTag} : 0U) |
                                (is_cut ? unsigned{Piece::kCutTag} : 0U)};
     }
@@ -185,7 +184,7 @@ bool Reader::next(Level* level, Piece* piece) {
     return fail(*level, *piece, at_,
                 ender(at_) + " within the group of field " + std::to_string(level->number_));
   }
-  const std::optional<Varint> tag = varint(*level, *piece, "a tag", 32);
+  const std::optional<Varint> tag = varint(*level, *piece, "a tag", UINT32_MAX);
   if (!tag.has_value()) {
     return false;
   }
@@ -234,7 +233,7 @@ bool Reader::field(Level* level, uint64_t tag, Piece* piece) {
 bool Reader::number(const Level& level, const char* what, Piece* piece) {
   piece->kind = Piece::kVarint;
   piece->value_offset = at_;
-  const std::optional<Varint> value = varint(level, *piece, what, 64);
+  const std::optional<Varint> value = varint(level, *piece, what, UINT64_MAX);
   if (!value.has_value()) {
     return false;
   }
@@ -261,7 +260,7 @@ bool Reader::fixed(const Level& level, Piece::Kind kind, size_t size, Piece* pie
 }
 
 bool Reader::length_delimited(const Level& level, Piece* piece) {
-  const std::optional<Varint> length = varint(level, *piece, "the length of ", 32);
+  const std::optional<Varint> length = varint(level, *piece, "the length of ", UINT32_MAX);
   if (!length.has_value()) {
     return false;
   }
@@ -269,9 +268,10 @@ bool Reader::length_delimited(const Level& level, Piece* piece) {
   piece->length = static_cast<uint32_t>(length->value);
   piece->value_offset = at_;
   const size_t left = level.end_ - at_;
-  if (piece->is_known && wire_type_of(*piece->field) != WireFormatLite::WIRETYPE_LENGTH_DELIMITED) {
+  const FieldDescriptor* field = piece->is_known ? piece->field : nullptr;
+  if (field != nullptr && wire_type_of(*field) != WireFormatLite::WIRETYPE_LENGTH_DELIMITED) {
     piece->kind = Piece::kPacked;
-  } else if (piece->is_known && piece->field->message_type() != nullptr) {
+  } else if (field != nullptr && field->message_type() != nullptr) {
     piece->kind = Piece::kMessage;
     if (piece->depth >= kDeepest) {
       return fail(level, *piece, piece->offset,

@@ -139,7 +139,7 @@ class Reader {
   bool fail(const Level& level, const Piece& piece, size_t offset, const std::string& reason);
   std::string ender(size_t end) const;
   std::optional<Varint> varint(const Level& level, const Piece& piece, const char* what,
-                               int kept_bits);
+                               uint64_t most);
   bool field(Level* level, uint64_t tag, Piece* piece);
   bool number(const Level& level, const char* what, Piece* piece);
   bool fixed(const Level& level, Piece::Kind kind, size_t size, Piece* piece);

@@ -40,7 +40,8 @@ capture() {
   local second=0 way name text
   while read -r way name text; do
     printf '2026-11-23T10:00:%02dZ %s ' $((second++)) "$way"
-    echo "$(frame "$name" "$(qel-wire encode "$name" --hex <<<"$text")")"
+    frame "$name" "$(qel-wire encode "$name" --hex <<<"$text")"
+    echo
   done >"$1.txt"
   TZ=UTC text2pcap -q -r '^(?<time>\S+) (?<dir>[<>]) (?<data>[0-9a-f]+)$' -t ISO \
     -4 10.0.0.2,10.0.0.1 -T 9000,40000 "$1.txt" "$1"
