@@ -108,8 +108,9 @@ int for_each_known(const Call& call, Take take) {
     if (!is_guessing && type != named) {
       return kDone;
     }
-    std::string name = type != nullptr ? type->name() : "";
-    if (type == nullptr) {
+    const bool is_guess = type == nullptr;
+    std::string name = is_guess ? "" : type->name();
+    if (is_guess) {
       const qel_wire::Fit fit = qel_wire::guess(found.bytes, found.use).front();
       type = fit.types.front();
       name = guessed(fit);
@@ -117,13 +118,14 @@ int for_each_known(const Call& call, Take take) {
     if (!conditions.hold(found.bytes, *type)) {
       return kDone;
     }
+    if (!found.place.empty()) {
+      name = qel_wire::readable(found.place) + ", " + name;
+    }
     if (call.json) {
-      if (is_guessing) {
-        qel_wire::complain((found.place.empty() ? "" : found.place + ", ") + name);
+      if (is_guess) {
+        qel_wire::complain(name);
       }
-    } else if (!found.place.empty()) {
-      std::cout << "# " << qel_wire::readable(found.place) << ", " << name << '\n';
-    } else if (is_guessing) {
+    } else if (is_guess || !found.place.empty()) {
       std::cout << "# " << name << '\n';
     }
     return take(found, *type);
