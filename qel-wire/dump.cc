@@ -55,9 +55,11 @@ class Dump {
     if (!first_.has_colon && digits_ != 2) {
       base_ = digits_ % 3 == 0 ? 8 : 16;
     }
-    size_ = digits_ / (base_ == 8 ? 3 : 2);
+    size_ = std::max<size_t>(digits_ / (base_ == 8 ? 3 : 2), 1);
     if (has_seven_digits()) {
       bases_ = {16, 8, 10};
+    } else if (first_.has_colon) {
+      bases_ = {16, 10};
     }
   }
 
@@ -93,13 +95,17 @@ class Dump {
 
   bool is_zero() const { return first_.offset.find_first_not_of('0') == std::string_view::npos; }
 
-  // Such offsets are of od or hexdump; only od's may be octal.
+  // Such offsets are of od or hexdump; only od's may be octal or decimal.
   bool has_seven_digits() const { return !first_.has_colon && first_.offset.size() == 7; }
+
+  // Whether hexdump prints no such groups.
+  bool is_of_od() const {
+    return has_seven_digits() && first_.gap == 1 && digits_ != 3 && digits_ != 4;
+  }
 
   bool is_continued() {
     try {
       read_line();
-      take_while(is_space, &rest_);
       read_line();
     } catch (const Stop&) {
       return false;
@@ -107,10 +113,11 @@ class Dump {
     return is_repeated_ || is_over_ || row_ > 0;
   }
 
-  // What od and hexdump print are numbers of 1, 2, 4 or 8 bytes.
+  // What od and hexdump print are numbers of 1, 2, 4 or 8 bytes. Decimal ones stand further apart.
   void check_numbers() const {
-    const bool is_whole = digits_ % (base_ == 8 ? 3 : 2) == 0 && size_ > 0 && size_ <= kLargest;
-    if (base_ != 0 && (!is_whole || (size_ & (size_ - 1)) != 0)) {
+    const bool is_whole = digits_ % (base_ == 8 ? 3 : 2) == 0 && digits_ > 0 && size_ <= kLargest;
+    const bool is_decimal = has_seven_digits() && first_.gap > 1 && size_ == 1;
+    if (is_decimal || (base_ != 0 && (!is_whole || (size_ & (size_ - 1)) != 0))) {
       throw Stop{first_.groups.data(), "no bytes in hex or octal: use od -tx1 or hexdump -C"};
     }
     if (base_ != 0 && size_ > 1 && !has_seven_digits() && first_.offset.size() != 6) {
@@ -129,7 +136,7 @@ class Dump {
 
   void read_row(std::string_view line) {
     const DumpRow row = row_of(line);
-    if (row.offset.empty() || row.has_colon != first_.has_colon) {
+    if (row.offset.empty()) {
       throw Stop{line.data(), "no offset before the bytes, as in the lines above"};
     }
     take_offset(row);
@@ -148,29 +155,36 @@ class Dump {
   }
 
   bool fits(const DumpRow& row, int base) const {
-    const uint64_t count = above(row, base).value_or(kMostBytes + 1);
+    const std::optional<uint64_t> count = above(row, base);
     const bool is_last = row.groups.empty();
     if (is_repeated_) {
-      return count <= kMostBytes && count >= bytes_.size() &&
-             (is_last || (count - bytes_.size()) % (bytes_.size() - row_) == 0);
+      return count >= bytes_.size() &&
+             ((is_last && base == 16) || (*count - bytes_.size()) % (bytes_.size() - row_) == 0);
     }
     // The last one tells how much of the last number are bytes.
-    return count <= bytes_.size() && bytes_.size() - count < (is_last && base_ != 0 ? size_ : 1);
+    return count.has_value() && *count <= bytes_.size() &&
+           bytes_.size() - *count < (is_last && base_ != 0 ? size_ : 1);
   }
 
   void take_offset(const DumpRow& row) {
     const auto end =
         std::remove_if(bases_.begin(), bases_.end(), [&](int base) { return !fits(row, base); });
-    const std::optional<uint64_t> count = above(row, bases_.front());
     if (end == bases_.begin()) {
-      throw Stop{row.offset.data(), count == 0 ? "another dump begins: only one is read"
-                                               : "an offset that does not follow from the " +
-                                                     counted(bytes_.size(), "byte") + " above"};
+      throw Stop{row.offset.data(), above(row, bases_.front()) == 0
+                                        ? "another dump begins: only one is read"
+                                        : "an offset that does not follow from the " +
+                                              counted(bytes_.size(), "byte") + " above"};
     }
     bases_.erase(end, bases_.end());
+    if (is_repeated_ && is_of_od() && bases_.size() > 1 && bases_.front() == 16) {
+      bases_.erase(bases_.begin());
+    }
+    const std::optional<uint64_t> count = above(row, bases_.front());
     if (is_repeated_ && has_seven_digits() && count != above(row, bases_.back())) {
-      throw Stop{row.offset.data(),
-                 "it is not clear whether offsets are hex, octal or decimal: use od -v"};
+      throw Stop{row.offset.data(), "offsets that may be hex, octal or decimal: use the option -v"};
+    }
+    if (count > kMostBytes) {
+      throw Stop{row.offset.data(), "an offset beyond 64 MiB, which no call takes"};
     }
     for (const size_t repeated = bytes_.size() - row_; bytes_.size() < count;) {
       bytes_ += bytes_[bytes_.size() - repeated];
@@ -250,13 +264,13 @@ class Dump {
 
   std::string_view rest_;
   DumpRow first_;
-  size_t digits_ = 0;                  // of the first group
-  size_t size_ = 0;                    // its bytes
-  int base_ = 0;                       // of groups that are numbers; 0: bytes in their order
-  std::vector<int> bases_ = {16, 10};  // which the offsets may have
-  size_t row_ = 0;                     // the last row's first byte
-  bool is_repeated_ = false;           // the last row, by a line "*"
-  bool is_over_ = false;               // by an offset alone
+  size_t digits_ = 0;              // of the first group
+  size_t size_ = 1;                // its bytes
+  int base_ = 0;                   // of groups that are numbers; 0: bytes in their order
+  std::vector<int> bases_ = {16};  // which the offsets may have
+  size_t row_ = 0;                 // the last row's first byte
+  bool is_repeated_ = false;       // the last row, by a line "*"
+  bool is_over_ = false;           // by an offset alone
   std::string bytes_;
 };
 

@@ -29,7 +29,7 @@ class List {
     if (is_bracketed_ && !is_hex_ && plain_ != nullptr) {
       throw Stop{plain_, kDecimal};
     }
-    if (has_commas_ && numbers_ > 0 && plain_ != nullptr) {
+    if (plain_ != nullptr && numbers_ > (has_commas_ ? 0 : 1)) {
       throw Stop{plain_, "no 0x before this number, as before others"};
     }
     if (numbers_ > 1 && wide_ != nullptr) {
@@ -39,6 +39,8 @@ class List {
   }
 
  private:
+  static constexpr char kRepeated[] =
+      "without offsets, it is not clear how much * stands for: use od -v";
   static constexpr char kDecimal[] = "a list of decimal numbers: write them in hex, with 0x";
 
   // And comments.
@@ -73,9 +75,11 @@ class List {
 
   // Up to one of the ends, unless another of the stops or bytes come first.
   void skip_words(std::string_view stops, std::string_view ends) {
-    const size_t stop = rest_.find_first_of(stops);
-    const std::string_view words = rest_.substr(0, stop);
-    const char end = char_at(rest_, stop);
+    constexpr size_t kMost = 1000;
+    const std::string_view head = rest_.substr(0, kMost);
+    const size_t stop = head.find_first_of(stops);
+    const std::string_view words = head.substr(0, stop);
+    const char end = char_at(head, stop);
     if (is_in(ends, end) && !begins_with_pairs(words) && (end == '=' || !is_of_hex(words))) {
       take(stop, &rest_);
     }
@@ -94,23 +98,32 @@ class List {
     take(1, &string);
     const bool is_even = take_while(is_digit, &string).size() % 2 == 0;
     return quote > 0 && is_in("bB", rest_[quote - 1]) && !string.empty() &&
-           !(is_even && is_in(kQuotes, string[0]));
+           !(is_even && string[0] == rest_[quote]);
   }
 
   void read_item() {
     const char c = rest_[0];
     const char next = char_at(rest_, 1);
+    if ((is_digit(c) && !is_in(kQuotes, next)) || !read_other(c, next)) {
+      read_number();
+    }
+  }
+
+  // What is no number, if that comes next.
+  bool read_other(char c, char next) {
     if (has_strings_ && is_in(kQuotes, c)) {
       read_string();
     } else if (is_between(c, next)) {
       take(1, &rest_);
     } else if (c == '\\' && (next != 'x' || count_while(is_digit, rest_.substr(2)) <= 2)) {
       read_escape();
+      ++numbers_;
     } else if (take_prefix("unsigned int ", &rest_)) {
       read_length();
     } else {
-      read_number();
+      return false;
     }
+    return true;
   }
 
   // Brackets and the like, a prefix of a string, a backslash that ends a line.
@@ -187,15 +200,10 @@ class List {
     const bool has_0x =
         take_prefix("0x", &rest_) || take_prefix("0X", &rest_) || take_prefix("\\x", &rest_);
     std::string_view digits = take_while(is_digit, &rest_);
-    const bool has_h =
-        !has_0x && !digits.empty() && (take_prefix("h", &rest_) || take_prefix("H", &rest_));
-    if (digits.empty()) {
-      throw Stop{begin, *begin == '*'
-                            ? "without offsets, it is not clear how much * stands for: use od -v"
-                            : kStray};
-    }
-    if (digits.size() % 2 != 0 && !has_h && std::isalnum(char_at(rest_, 0)) != 0) {
-      throw Stop{rest_.data(), kStray};
+    const bool has_h = !has_0x && is_in("hH", char_at(rest_, 0));
+    take(has_h ? 1 : 0, &rest_);
+    if (digits.empty() || std::isalnum(static_cast<unsigned char>(char_at(rest_, 0))) != 0) {
+      throw Stop{digits.empty() ? begin : rest_.data(), *begin == '*' ? kRepeated : kStray};
     }
     digits.remove_prefix(has_h && digits.size() == 3 && digits[0] == '0' ? 1 : 0);
     if (has_0x || has_h) {
@@ -205,12 +213,13 @@ class List {
     } else if (!has_quotes_) {
       check_plain(digits);
     }
-    if ((has_0x || has_h) && digits.size() == 1) {
+    if (digits.size() == 1 && (has_0x || has_h)) {
       bytes_ += static_cast<char>(*number(digits, 16));
     } else {
       append_pairs(digits, &bytes_);
     }
-    take(is_in(":-", char_at(rest_, 0)) ? 1 : 0, &rest_);
+    const char next = char_at(rest_, 1);
+    take(is_in(":-", char_at(rest_, 0)) && (is_digit(next) || is_in("\r\n", next)) ? 1 : 0, &rest_);
   }
 
   // Digits may be meant as decimal in a list, as long as none shows that it is hex.

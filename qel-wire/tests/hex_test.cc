@@ -37,6 +37,10 @@ struct Form {
   std::string bytes;
 };
 
+std::string name_of(const testing::TestParamInfo<Form>& form) {
+  return form.param.name;
+}
+
 void PrintTo(const Form& form, std::ostream* stream) {
   *stream << form.name;
 }
@@ -337,6 +341,7 @@ const std::vector<Form> kForms = {
     {"digits", "0807602A6a0708E90712026f6b", kMessage},
     {"digits_in_groups", "08 0760 2a6a07\t08\r\n\r\ne9 0712026f6b\n", kMessage},
     {"digits_behind_0x", "0x0807602a6a0708e90712026f6b", kMessage},
+    {"digits_behind_0x_in_lines", "0x0807602a6a07\n08e90712026f6b", kMessage},
     {"digits_behind_x", "\\x0807602a6a0708e90712026f6b", kMessage},
     {"colons", "08:07:60:2a:6a:07:\n08:e9:07:12:02:6f:6b", kMessage},
     {"dashes", "08-07-60-2a-6a-07-08-e9-07-12-02-6f-6b", kMessage},
@@ -352,8 +357,10 @@ const std::vector<Form> kForms = {
     {"python_bytes", "b'\\x08\\x07`*j\\x07\\x08\\xe9\\x07\\x12\\x02ok'", kMessage},
     {"python_bytearray", "bytearray(b\"\\x08\\x07'\")", "080727"},
     {"python_bytes_of_characters", "b'Hi'", "4869"},
+    {"python_bytes_with_a_quote", "b\"'\"", "27"},
     {"python_hexlify", "b'0807602a6a0708e90712026f6b'", kMessage},
     {"json_of_hex", "[\"08\", \"0x07\",\n \"602A\"]", "0807602a"},
+    {"strings_of_hex", "\"0807\" \\\n\"602a\"\n", "0807602a"},
     {"json_string", "\"\\b\\u0007`\\/\\\\\\n\"", "0807602f5c0a"},
     {"c_strings", "const char a[] = \"\\x08\\7`*j\" \"\\007\\b\\xe9\" \\\n \"\\a\\22\\2ok\";",
      kMessage},
@@ -363,6 +370,12 @@ const std::vector<Form> kForms = {
     {"escapes_octal", "\\010\\007\\140\\52", "0807602a"},
     {"brackets_of_a_debugger", "<0807602a 6a07>", "0807602a6a07"},
     {"notes", "58 07  # requestId\n60 2a  // {chatroomId}\n", "5807602a"},
+    {"byte_order_mark",
+     "\xef\xbb\xbf"
+     "0807",
+     "0807"},
+    {"brackets", "{08, 07, 60}", "080760"},
+    {"sql", "x'0807'", "0807"},
     {"nothing", " \n", ""},
 };
 
@@ -372,8 +385,7 @@ TEST_P(HexForm, AsItIsPrinted_IsRead) {
   EXPECT_EQ(outcome(GetParam().text), GetParam().bytes);
 }
 
-INSTANTIATE_TEST_SUITE_P(Hex, HexForm, testing::ValuesIn(kForms),
-                         [](const auto& info) { return std::string(info.param.name); });
+INSTANTIATE_TEST_SUITE_P(Hex, HexForm, testing::ValuesIn(kForms), name_of);
 
 // ---- Offsets
 
@@ -406,12 +418,15 @@ TEST(Hex, DumpOfAPart_IsRead) {
 TEST(Hex, LastOffset_TellsHowMuchIsRepeated) {
   EXPECT_EQ(outcome("00000000  08 07\n*\n00000005\n"), "0807080708");
   EXPECT_EQ(outcome("00000000: 0807\n*\n00000006: 60\n"), "08070807080760");
+  EXPECT_EQ(outcome("0000000 08 07 60 2a\n*\n0000010\n"), "0807602a0807602a");  // octal
+  EXPECT_EQ(outcome("0000000 08\n*\n0000002 07\n*\n0000006 60\n0000007 60\n0000010\n"),
+            "0808070707076060");  // octal, as only the last one tells
+  EXPECT_EQ(outcome("0000000 08 07 60 2a\n*\n0000008\n"), "0807602a0807602a");  // decimal
 }
 
-// 64 MiB and ten bytes.
-TEST(Hex, RepeatedRows_DoNotFillTheMemory) {
-  EXPECT_EQ(outcome("00000000  08\n*\n0400000a\n"),
-            "3:1: an offset that does not follow from the 1 byte above");
+// 64 MiB and one byte.
+TEST(Hex, RowsRepeatedBeyondAllMeasure_AreRefused) {
+  EXPECT_THROW(from_hex("00000000: 08\n*\n04000001:\n"), qel_wire::Misread);
 }
 
 // ---- Characters beside the bytes
@@ -423,6 +438,7 @@ TEST(Hex, CharactersThatLookLikeHex_AreNoBytes) {
            "00000000  61 62 20 63 64 20 31 32                           |ab cd 12|\n00000008\n",
            "0000000 61 62 20 63 64 20 31 32  >ab cd 12<\n0000010\n",
            " 61 62 20 63 64 20 31 32  >ab cd 12<\n",
+           " 61 62 20 63 64 20 31 32  >{\"=07 <\n",
            "0000   61 62 20 63 64 20 31 32                           ab cd 12\n",
        }) {
     EXPECT_EQ(outcome(text), "6162206364203132") << text;
@@ -430,6 +446,7 @@ TEST(Hex, CharactersThatLookLikeHex_AreNoBytes) {
 }
 
 TEST(Hex, CharactersThatHideSome_AreIgnored) {
+  EXPECT_EQ(outcome("0x4010: 0x61 0x62  **\n"), "6162");
   EXPECT_EQ(outcome("00000000: 7365 6372 6574  ******\n"), "736563726574");
 }
 
@@ -463,46 +480,81 @@ constexpr char kMissing[] = "the last line is missing, whose offset tells how ma
 constexpr char kNoBytes[] = "no bytes in hex or octal: use od -tx1 or hexdump -C";
 
 const std::vector<Form> kMistakes = {
-    {"odd_digits", "080", std::string("1:1: ") + kOdd},
-    {"odd_digits_in_a_later_line", "08 07 # a\n60 2", std::string("2:4: ") + kOdd},
-    {"odd_digits_in_a_dump", "00000000: 080\n", std::string("1:11: ") + kOdd},
-    {"letter", "08 zz", std::string("1:4: ") + kStray},
-    {"letter_behind_a_digit", "08 07\n58 0g\n", std::string("2:5: ") + kStray},
-    {"letter_in_a_dump", "00000000: 08 0x\n", std::string("1:16: ") + kStray},
-    {"open_quote", "\"\\x08 ", "1:1: a quote that is not closed in its line"},
-    {"large_octal", "\"\\400\"", "1:2: an escape that is no byte"},
-    {"large_character", "\"\\u1234\"", "1:2: an escape that is no byte"},
-    {"escape_without_digits", "\\x", "1:1: an escape that is no byte"},
-    {"open_comment", "{0x08 /* 7", "1:7: a comment without an end"},
-    {"decimal_list", "[8, 7, 96]", std::string("1:2: ") + kDecimal},
-    {"decimal_array", "unsigned char a[] = {8, 7, 96};", std::string("1:22: ") + kDecimal},
-    {"decimal_pairs", "[96, 42]", std::string("1:2: ") + kDecimal},
-    {"decimal_of_a_debugger", "$1 = {8, 7, 96}", std::string("1:7: ") + kDecimal},
-    {"one_without_0x", "[08, 0x07]", "1:2: no 0x before this number, as before others"},
-    {"wide_numbers", "0x0807 0x602a", std::string("1:1: ") + kOrder},
-    {"wide_numbers_of_a_debugger", "0x5555 <a>: 0x0807 0x602a", std::string("1:15: ") + kOrder},
-    {"wrong_length", "unsigned char a[] = {\n  0x08\n};\nunsigned int a_len = 2;\n",
-     "4:22: not the array's length: it has 1 byte"},
-    {"repeated_rows_without_offsets", "08 07\n*\n",
-     "2:1: without offsets, it is not clear how much * stands for: use od -v"},
-    {"repeated_rows_without_an_end", "00000000  08 07\n*\n", std::string("3:1: ") + kMissing},
-    {"numbers_without_an_end", "0000000 0708 0060\n", std::string("2:1: ") + kMissing},
-    {"gap", "00000000  08 07\n00000003  60\n",
-     "2:1: an offset that does not follow from the 2 bytes above"},
-    {"overlap", "00000000  08 07\n00000001  60\n",
-     "2:1: an offset that does not follow from the 2 bytes above"},
-    {"second_dump", "00000000  08 07\n00000000  60\n",
-     "2:1: another dump begins: only one is read"},
-    {"line_without_an_offset", "00000000: 0807\n60 2a\n",
+    {"digit_too_few", "08 07\n60 2\n", std::string("2:4: ") + kOdd},
+    {"digit_too_few_in_a_long_line", "0807602a6a0\n", std::string("1:1: ") + kOdd},
+    {"digit_too_few_in_quotes", "[\"08\", \"7\"]", std::string("1:9: ") + kOdd},
+    {"digit_too_few_in_a_dump", "00000000: 0807 602a\n00000004: 6a0 \n",
+     std::string("2:11: ") + kOdd},
+    {"letter", "08 07\n 60 g2\n", std::string("2:5: ") + kStray},
+    {"letter_in_a_dump", "0000   08 07\n0002   60 zz\n", std::string("2:11: ") + kStray},
+    {"ellipsis", "08:07:60\xe2\x80\xa6", std::string("1:9: ") + kStray},
+    {"no_offset", "00000000: 0807\nnone: 602a\n",
      "2:1: no offset before the bytes, as in the lines above"},
-    {"number_of_another_size", "0000000 0708 602\n",
-     "1:14: no number of 2 bytes like the first one"},
-    {"offset_or_bytes", "00000010  08 07 60",
+    {"od_c_beside_tx1",
+     "0000000  08  07\n"
+     "         \\b  \\a\n"
+     "0000002\n",
+     "1:10: no bytes in hex or octal: use od -tx1 or hexdump -C"},
+    {"line_lost", "00000000: 0807\n00000004: 602a\n",
+     "2:1: an offset that does not follow from the 2 bytes above"},
+    {"line_twice", "0000   08 07\n0002   60 2a\n0002   60 2a\n",
+     "3:1: an offset that does not follow from the 4 bytes above"},
+    {"end_lost", "00000000  08 07 60 2a  |..`*|\n00000005\n",
+     "2:1: an offset that does not follow from the 4 bytes above"},
+    {"second_packet", "\t0x0000:  0807 602a\n12:00 IP\n\t0x0000:  0807\n",
+     "2:1: no offset before the bytes, as in the lines above"},
+    {"second_dump", "00000000: 0807\n\n00000000: 0807\n",
+     "3:1: another dump begins: only one is read"},
+    {"one_row_of_a_part", "0010   08 07\n",
      "1:1: an offset, or bytes? a colon behind it, or single blanks would tell"},
-    {"other_numbers", "0000000  3.14e0\n", std::string("1:10: ") + kNoBytes},
+    {"repeated_without_end", "00000000  08 07\n*\n", std::string("3:1: ") + kMissing},
+    {"odd_size_without_end", "0000000 0708 0060\n", std::string("2:1: ") + kMissing},
+    {"repeated_without_offsets", " 08 07\n*\n 60\n",
+     "2:1: without offsets, it is not clear how much * stands for: use od -v"},
+    {"first_row_repeated", "0000000 0000 0000\n*\n0000040\n",
+     "3:1: offsets that may be hex, octal or decimal: use the option -v"},
+    {"groups_without_order", "0000 0807 602a\n0004 6a07\n", std::string("1:6: ") + kOrder},
+    {"gdb_words", "0x4010 <a>:\t0x2a600708\n", std::string("1:15: ") + kOrder},
+    {"array_of_words", "{0x0807, 0x602a}", std::string("1:2: ") + kOrder},
+    {"xxd_b", "00000000: 00001000 00000111  ..\n",
+     "1:30: neither bytes nor the characters of those before"},
+    {"od_c", "0000000  \\b  \\a   `   *\n0000004\n", std::string("1:10: ") + kNoBytes},
+    {"od_a", "0000000  bs bel   `   *\n0000004\n", std::string("1:10: ") + kNoBytes},
+    {"od_td1", "0000000    8    7   96   42\n0000004\n", std::string("1:12: ") + kNoBytes},
+    {"hexdump_o_of_a_repeated_row", "0000000  003410  003410\n*\n0000010\n",
+     "3:1: offsets that may be hex, octal or decimal: use the option -v"},
+    {"hex_before_a_dump", "08 07\n00000000: 602a\n", std::string("2:9: ") + kStray},
+    {"od_tu1", "0000000  50  60\n0000002\n", std::string("1:10: ") + kNoBytes},
+    {"hexdump_d", "0000000   01800   10848\n0000004\n", std::string("1:11: ") + kNoBytes},
+    {"octal_beyond_a_byte", "0000000 400 007\n0000002\n",
+     "1:9: no number of 1 byte like the first one"},
+    {"number_of_another_size", "0000000 0708 2a6\n0000004\n",
+     "1:14: no number of 2 bytes like the first one"},
+    {"python_list", "[8, 7, 96, 42]", std::string("1:2: ") + kDecimal},
+    {"java_list", "{10, 107, 7}", std::string("1:6: ") + kDecimal},
+    {"list_without_brackets", "80, 96, 7", std::string("1:9: ") + kDecimal},
+    {"list_that_begins_with_one_digit", "8, 7", std::string("1:1: ") + kDecimal},
+    {"list_of_one", "[8]", std::string("1:2: ") + kDecimal},
+    {"list_of_two_digits_each", "[10, 20, 30]", std::string("1:2: ") + kDecimal},
+    {"decimal_among_hex", "{0x08, 10}", "1:8: no 0x before this number, as before others"},
+    {"offset_before_numbers", "0010 0x08 0x07", "1:1: no 0x before this number, as before others"},
+    {"length_that_is_not_true", "unsigned char a[] = {\n  0x08\n};\nunsigned int a_len = 2;\n",
+     "4:22: not the array's length: it has 1 byte"},
+    {"letters_behind_digits", "08 07\n60 2g\n", std::string("2:5: ") + kStray},
+    {"no_digits_in_a_dump", "00000000: 0x\n*\n00000002\n", std::string("1:13: ") + kStray},
+    {"second_array", "char a[] = {0x08};\nuint8_t b[] = {0x07};", std::string("2:1: ") + kStray},
+    {"comment_without_end", "{0x08, /* 0x07}", "1:8: a comment without an end"},
+    {"quote_without_end", "\"\\x08\n\\x07\"", "1:1: a quote that is not closed in its line"},
+    {"escape_unknown", "\"\\x08\\q\"", "1:6: an escape that is no byte"},
+    {"escape_beyond_a_byte", "\"\\x08\\400\"", "1:6: an escape that is no byte"},
+    {"escape_of_a_character", "\"\\u00e9\"", "1:2: an escape that is no byte"},
+    {"escape_of_a_blank", "\"\\x08\\ 07\"", "1:6: an escape that is no byte"},
+    {"escape_without_digits", "\"\\xg\"", "1:2: an escape that is no byte"},
+    {"hex_without_quotes", "\\x08\\x07ab", std::string("1:5: ") + kOrder},
+    {"characters_without_quotes", "\\x08\\x07`*j", std::string("1:9: ") + kStray},
+    {"quotes_without_escape", "\"Hi\"", std::string("1:2: ") + kStray},
 };
 
-INSTANTIATE_TEST_SUITE_P(Hex, HexMistake, testing::ValuesIn(kMistakes),
-                         [](const auto& info) { return std::string(info.param.name); });
+INSTANTIATE_TEST_SUITE_P(Hex, HexMistake, testing::ValuesIn(kMistakes), name_of);
 
 }  // namespace
