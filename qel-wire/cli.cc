@@ -20,8 +20,8 @@ they differ); with 2 if it was called wrongly; with 3 if a file cannot be read, 
 written, or memory runs out.
 )";
 
-// What an option has as its value that may have one, but was given none.
-constexpr char kNoValue[] = "true";
+// What --hex and --base64 have as their values if they were given none.
+constexpr char kNoValue[] = "-";
 
 class Formatter : public CLI::Formatter {
  public:
@@ -53,16 +53,23 @@ class Options {
     return *this;
   }
 
+  Options& files(const char* name, const char* description, int least, int most) {
+    files(name, description).command_.get_option(name)->expected(least, most);
+    return *this;
+  }
+
   Options& notation(const std::string& what) {
     auto* hex = command_.add_flag("--hex", call_.hex, what + "hex, as dumps and programs have it");
     auto* base64 = command_.add_flag("--base64", call_.base64, what + "base64");
-    hex->type_name("[=BYTES]")->excludes(base64);
-    base64->type_name("[=BYTES]");
+    for (CLI::Option* option : {hex, base64}) {
+      option->type_name("[=BYTES]")->multi_option_policy(CLI::MultiOptionPolicy::Throw);
+    }
+    hex->excludes(base64);
     return *this;
   }
 
   Options& flag(const char* name, bool* value, const char* description) {
-    command_.add_flag(name, *value, description);
+    command_.add_flag(name, *value, description)->disable_flag_override();
     return *this;
   }
 
@@ -95,8 +102,7 @@ class Options {
   Options& where() {
     command_.add_option("--where", call_.where, "only messages with such a field; may be repeated")
         ->type_name("CONDITION")
-        ->expected(1)
-        ->multi_option_policy(CLI::MultiOptionPolicy::TakeAll);
+        ->allow_extra_args(false);
     return *this;
   }
 
@@ -118,6 +124,7 @@ std::unique_ptr<CLI::App> make_table(Call* call) {
   app->set_version_flag("--version", "qel-wire " QEL_WIRE_VERSION, "which version it is");
   app->footer(kFooter);
   app->allow_extras()->fallthrough();
+  app->require_subcommand(0, 1);  // words behind it are files, even if they are called like one
   Options(app.get(), call)
       .choice("--color", &call->colour, "always|never|auto",
               "on a terminal, unless NO_COLOR is set or TERM is dumb");
@@ -133,7 +140,7 @@ std::unique_ptr<CLI::App> make_table(Call* call) {
       .output();
   command("encode", "the bytes of a message that is given in the text form or as JSON")
       .message("its name")
-      .files("FILE", "the text; standard input if there is none, or for '-'")
+      .files("FILE", "the text; standard input if there is none, or for '-'", 0, 1)
       .notation("write ")
       .choice("--bytes", &call->bytes, "hex", "how JSON has what is no text");
   command("explain", "each field with its offset and its bytes, and what is wrong with them")
@@ -154,7 +161,7 @@ std::unique_ptr<CLI::App> make_table(Call* call) {
       .where()
       .flag("--show-token", &call->show_token, "let --where see what may be the access token");
   command("diff", "in which fields the messages of two files differ")
-      .files("FILE", "the two files, of one message each")
+      .files("FILE", "the two files, of one message each", 2, 2)
       .notation("the files are ")
       .value("--message", &call->message, "MESSAGE", "their name, instead of the best guesses")
       .flag("--show-token", &call->show_token, "show what may be the access token");
@@ -232,20 +239,24 @@ void check_command(CLI::App& app) {
   refuse("a command is missing", "");
 }
 
+bool is_command(CLI::App* app, const std::string& word) {
+  return !app->get_subcommands([&](CLI::App* each) { return each->check_name(word); }).empty();
+}
+
 void parse(CLI::App* app, std::vector<std::string> arguments) {
   // Options may stand before the command that they belong to.
-  const auto command =
-      std::find_if(arguments.begin(), arguments.end(), [&](const std::string& argument) {
-        return !app->get_subcommands([&](CLI::App* each) { return each->check_name(argument); })
-                    .empty();
-      });
+  const auto command = std::find_if(arguments.begin(), arguments.end(),
+                                    [&](const auto& word) { return is_command(app, word); });
   if (command != arguments.end()) {
     std::rotate(arguments.begin(), command, command + 1);
   }
-  // Nothing behind the sign is no bytes, rather than no value.
-  std::replace(arguments.begin(), arguments.end(), std::string("--hex="), std::string("--hex= "));
-  std::replace(arguments.begin(), arguments.end(), std::string("--base64="),
-               std::string("--base64= "));
+  for (const std::string name : {"--hex", "--base64", "--where"}) {
+    if (name != "--where") {
+      std::replace(arguments.begin(), arguments.end(), name, name + "=" + kNoValue);
+    }
+    // Nothing behind the sign is an empty value, rather than none.
+    std::replace(arguments.begin(), arguments.end(), name + "=", name + "= ");
+  }
   std::reverse(arguments.begin(), arguments.end());  // as the library takes them
   app->parse(arguments);
 }
@@ -267,6 +278,12 @@ Call read_call(int argc, char** argv) {
   if (!arguments.empty() && arguments.front() == "help") {
     std::rotate(arguments.begin(), arguments.begin() + 1, arguments.end());
     arguments.back() = "--help";
+    if (arguments.size() > 1 && !is_command(app.get(), arguments.front())) {
+      const auto all = app->get_subcommands([](CLI::App*) { return true; });
+      refuse("there is no command " + named(arguments.front()) +
+                 did_you_mean(arguments.front(), names_of(all)),
+             "");
+    }
   }
   const auto chosen = [&] {
     const auto commands = app->get_subcommands();
@@ -281,6 +298,12 @@ Call read_call(int argc, char** argv) {
   } catch (const CLI::CallForVersion& version) {
     call.answer = std::string(version.what()) + "\n";
     return call;
+  } catch (const CLI::ArgumentMismatch& error) {
+    const std::string what = error.what();
+    const bool has_value = what.find("flag override") != std::string::npos;
+    refuse(has_value ? "--" + what.substr(0, what.find(' ')) + " takes no value"
+                     : what.substr(0, what.find(':')) + " is given too often, or not often enough",
+           chosen());
   } catch (const CLI::ParseError& error) {
     refuse(error.what(), chosen());
   }

@@ -199,16 +199,14 @@ class TextParser : private google::protobuf::io::ErrorCollector {
 
   // What opens a message, and then what closes it.
   std::string closing() {
-    if (take("<")) {
-      return ">";
-    }
-    if (!take("{")) {
+    const bool is_angle = take("<");
+    if (!is_angle && !take("{")) {
       fail("'{' is missing");
     }
     if (++depth_ > kDeepest) {
-      fail("too many levels of nesting");
+      fail("more than " + std::to_string(kDeepest) + " levels of nesting");
     }
-    return "}";
+    return is_angle ? ">" : "}";
   }
 
   void known(Message* message) {
@@ -315,6 +313,7 @@ class TextParser : private google::protobuf::io::ErrorCollector {
   // A field by its number: of 4 or 8 bytes if the value is hex of that many digits.
   void unknown(UnknownFieldSet* fields) {
     constexpr uint64_t kMostNumber = (uint64_t{1} << 29U) - 1;
+    const Tokenizer::Token name = token();
     const auto field = static_cast<int>(number(kMostNumber));
     if (!take(":")) {
       const std::string end = closing();
@@ -344,6 +343,8 @@ class TextParser : private google::protobuf::io::ErrorCollector {
       fields->AddFixed32(field, static_cast<uint32_t>(value));
     } else if (is_hex && digits.size() == 18) {
       fields->AddFixed64(field, value);
+    } else if (field == 0) {
+      fail(name, "a varint of the number 0 cannot be read");
     } else {
       fields->AddVarint(field, value);
     }

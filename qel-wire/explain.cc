@@ -226,11 +226,9 @@ class Table : public Rows {
   }
 
   std::string number_of(const Piece& piece) const {
-    if (!piece.is_known) {
-      return std::to_string(static_cast<int64_t>(piece.value));
-    }
     const std::string value = value_in_text(piece, options_.bytes_form);
-    const bool has_name = piece.field->enum_type() != nullptr && !piece.is_no_member();
+    const bool has_name =
+        piece.is_known && piece.field->enum_type() != nullptr && !piece.is_no_member();
     return has_name ? value + " (" + std::to_string(piece.low_32_bits()) + ")" : value;
   }
 

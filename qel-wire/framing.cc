@@ -1,6 +1,7 @@
 #include "framing.h"
 
 #include <algorithm>
+#include <cctype>
 
 #include "schema.h"
 #include "text.h"
@@ -68,6 +69,10 @@ Head example(std::string_view bytes) {
   Head head = number_of(bytes.substr(name + 1), 4, false);
   head.size += name + 1;
   head.name = std::string(bytes.substr(1, name));
+  if (std::any_of(head.name.begin(), head.name.end(),
+                  [](unsigned char c) { return std::isalnum(c) == 0; })) {
+    head.problem = "a name has other characters than letters and digits";
+  }
   return head;
 }
 

@@ -40,6 +40,7 @@ struct Field {
   size_t first = 0;                   // when it was there first
   Fitting fitting;
   std::vector<size_t> counts;  // of all fields, when it was there first
+  bool is_broken = false;      // no message that has it reads on
 
   bool is_like(const FieldDescriptor& other) const {
     return other.number() == descriptor->number() && other.type() == descriptor->type() &&
@@ -122,7 +123,7 @@ class Race {
       return;
     }
     for (const size_t index : by_number_[piece.number]) {
-      if (fields_[index].takes(piece.kind)) {
+      if (!fields_[index].is_broken && fields_[index].takes(piece.kind)) {
         take(piece, index);
       }
     }
@@ -138,13 +139,16 @@ class Race {
     }
     ++field.count;
     field.odd += piece.is_odd() ? 1 : 0;
-    if (piece.kind == Piece::kVarint) {
-      Piece known = piece;
-      known.field = field.descriptor;
-      known.is_known = true;
-      field.fitting.begin(known);
-    } else if (walk(bytes_.substr(piece.offset, piece.end - piece.offset),
-                    *field.descriptor->containing_type(), &field.fitting)) {
+    Piece known = piece;
+    known.field = field.descriptor;
+    known.is_known = true;
+    if (piece.kind == Piece::kBytes &&
+        field.descriptor->cpp_type() != FieldDescriptor::CPPTYPE_STRING) {
+      known.kind = field.descriptor->message_type() != nullptr ? Piece::kMessage : Piece::kPacked;
+    }
+    field.fitting.begin(known);
+    if (known.is_container() && !walk_content(bytes_, known, &field.fitting)) {
+      field.is_broken = true;
       end_all_with(index);
     }
   }

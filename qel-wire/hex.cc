@@ -21,12 +21,15 @@ class List {
   explicit List(std::string_view text) : rest_(text) {}
 
   std::string read() {
+    if (may_be_of_od(rest_)) {
+      throw Stop{rest_.data(), kOrder};
+    }
     skip_introduction();
     has_strings_ = has_strings();
     while (skip_space(), !rest_.empty()) {
       read_item();
     }
-    if (is_bracketed_ && !is_hex_ && plain_ != nullptr) {
+    if ((is_bracketed_ || has_commas_) && !is_hex_ && plain_ != nullptr) {
       throw Stop{plain_, kDecimal};
     }
     if (plain_ != nullptr && numbers_ > (has_commas_ ? 0 : 1)) {
@@ -42,6 +45,19 @@ class List {
   static constexpr char kRepeated[] =
       "without offsets, it is not clear how much * stands for: use od -v";
   static constexpr char kDecimal[] = "a list of decimal numbers: write them in hex, with 0x";
+
+  // Whether od may have printed numbers of several bytes without offsets: with a blank before each.
+  static bool may_be_of_od(std::string_view text) {
+    const bool has_blank = is_blank(char_at(text, 0));
+    std::string_view line = take_line(&text);
+    const size_t size = count_while(is_digit, line);
+    size_t count = 0;
+    for (; count_while(is_digit, line) == size && size >= 4; ++count) {
+      take(size, &line);
+      take_while(is_blank, &line);
+    }
+    return has_blank && count > 1 && line.empty();
+  }
 
   // And comments.
   void skip_space() {

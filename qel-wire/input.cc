@@ -107,6 +107,9 @@ class Messages {
       for (const std::string& note : stream.notes) {
         complain(place + note);
       }
+      if (stream.is_reset) {
+        complain(place + "of a connection that was reset");
+      }
       add(stream, place, &all);
     }
     std::stable_sort(all.begin(), all.end(), [](const Arrived& a, const Arrived& b) {
@@ -116,11 +119,12 @@ class Messages {
       const Stream& stream = *arrived.stream;
       Found found;
       found.use = stream.from_client ? Use::kSends : Use::kReceives;
-      found.connection = stream.connection;
+      found.connection = connections_ + stream.connection;
       found.time =
           std::chrono::duration_cast<std::chrono::milliseconds>(arrived.arrival.time).count();
       take(stream.bytes, arrived.frame, source + stream.from + " -> " + stream.to + ", ", found);
     }
+    connections_ += capture.streams.empty() ? 0 : capture.streams.back().connection;
   }
 
   static Capture read(const std::string& file) {
@@ -152,6 +156,7 @@ class Messages {
   const std::function<int(const Found&)>& take_;
   bool is_many_;
   size_t count_ = 0;
+  size_t connections_ = 0;  // of the captures before
   int status_ = kDone;
 };
 
@@ -185,6 +190,9 @@ std::string read_file(const std::string& name) {
 int for_each_message(const Call& call, const std::function<int(const Found&)>& take) {
   if (call.has_bytes() && !call.files.empty()) {
     throw Failure{kWrongCall, "the bytes are in the call already: it takes no file"};
+  }
+  if (std::count(call.files.begin(), call.files.end(), "-") > 1) {
+    throw Failure{kWrongCall, "standard input can be read once"};
   }
   Messages messages(call, take);
   if (call.files.empty()) {

@@ -10,6 +10,7 @@
 #include <iomanip>
 #include <iostream>
 #include <new>
+#include <optional>
 #include <set>
 #include <string>
 #include <vector>
@@ -64,15 +65,29 @@ class Conditions {
     }
   }
 
-  bool hold(std::string_view bytes, const Descriptor& type) const {
+  // The status if the message meets one of them not, otherwise nothing. Broken messages and what is
+  // hidden meet none, which is said.
+  std::optional<int> refuse(const qel_wire::Found& found, const Descriptor& type) const {
     if (conditions_.empty()) {
-      return true;
+      return std::nullopt;
+    }
+    const std::string where = found.place.empty() ? "" : found.place + ": ";
+    if (qel_wire::problem_of(found.bytes, type).has_value()) {
+      qel_wire::complain(where + "broken, and so left out");
+      return kBroken;
     }
     const qel_wire::Hidden hidden =
-        shows_token_ ? qel_wire::Hidden() : qel_wire::Hidden(bytes, type);
-    return !qel_wire::problem_of(bytes, type).has_value() &&
-           std::all_of(conditions_.begin(), conditions_.end(),
-                       [&](const auto& condition) { return condition.holds(bytes, type, hidden); });
+        shows_token_ ? qel_wire::Hidden() : qel_wire::Hidden(found.bytes, type);
+    if (std::all_of(conditions_.begin(), conditions_.end(), [&](const auto& condition) {
+          return condition.holds(found.bytes, type, hidden);
+        })) {
+      return std::nullopt;
+    }
+    if (hidden.hides_any()) {
+      qel_wire::complain(where +
+                         "left out; some of its fields are hidden: --show-token shows them");
+    }
+    return kDone;
   }
 
  private:
@@ -102,7 +117,8 @@ int for_each_known(const Call& call, Take take) {
   return qel_wire::for_each_message(call, [&](const qel_wire::Found& found) {
     const Descriptor* type = found.name.empty() ? named : qel_wire::message_named(found.name);
     if (!found.name.empty() && type == nullptr) {
-      qel_wire::complain(found.place + ": there is no message " + qel_wire::named(found.name));
+      // The name may be a piece of a token, if the stream is cut.
+      qel_wire::complain(found.place + ": its frame has a name that no message has");
       return kBroken;
     }
     if (!is_guessing && type != named) {
@@ -115,8 +131,8 @@ int for_each_known(const Call& call, Take take) {
       type = fit.types.front();
       name = guessed(fit);
     }
-    if (!conditions.hold(found.bytes, *type)) {
-      return kDone;
+    if (const auto status = conditions.refuse(found, *type)) {
+      return *status;
     }
     if (!found.place.empty()) {
       name = qel_wire::readable(found.place) + ", " + name;
@@ -179,10 +195,10 @@ int encode(const Call& call) {
   if (call.has_bytes()) {
     throw Failure{kWrongCall, "encode takes a text: --hex and --base64 have no bytes there"};
   }
-  if (call.files.size() > 1) {
-    throw Failure{kWrongCall, "encode takes one FILE"};
+  std::string text = qel_wire::read_file(call.files.empty() ? "-" : call.files.front());
+  if (text.compare(0, 3, "\xef\xbb\xbf") == 0) {  // which some editors write
+    text.erase(0, 3);
   }
-  const std::string text = qel_wire::read_file(call.files.empty() ? "-" : call.files.front());
   try {
     const size_t first = text.find_first_not_of(" \t\r\n");
     if (first != std::string::npos && text[first] == '{') {
@@ -267,8 +283,8 @@ int session(const Call& call) {
   std::set<size_t> shown;
   const int status = qel_wire::for_each_message(call, [&](const qel_wire::Found& found) {
     const qel_wire::Entry entry = session.add(found);
-    if (!conditions.hold(found.bytes, *entry.types.front())) {
-      return kDone;
+    if (const auto status = conditions.refuse(found, *entry.types.front())) {
+      return *status;
     }
     shown.insert(entry.number);
     print_entry(entry, found, colours);
@@ -289,8 +305,8 @@ int session(const Call& call) {
 }
 
 int diff(const Call& call) {
-  if (call.files.size() != 2 || call.has_bytes()) {
-    throw Failure{kWrongCall, "diff takes two files"};
+  if (call.has_bytes() || call.files[0] == call.files[1]) {
+    throw Failure{kWrongCall, "diff takes two different files"};
   }
   const std::string message = call.message.empty() ? "auto" : call.message;
   struct Side {
@@ -315,10 +331,6 @@ int diff(const Call& call) {
   }
   if (sides.size() != 2) {
     throw Failure{kWrongCall, "diff takes one message of each file"};
-  }
-  if (!call.show_token && (qel_wire::Hidden(sides[0].bytes, *sides[0].type).hides_any() ||
-                           qel_wire::Hidden(sides[1].bytes, *sides[1].type).hides_any())) {
-    qel_wire::complain("without fields that may be an access token: --show-token compares them");
   }
   if (is_auto(message)) {
     std::cout << "# " << sides[0].type->name() << ", " << sides[1].type->name()

@@ -1,5 +1,7 @@
 #include "query.h"
 
+#include <strings.h>
+
 #include <algorithm>
 #include <charconv>
 #include <optional>
@@ -108,6 +110,17 @@ std::optional<int64_t> number_in(const std::string& text) {
                                                                   : std::nullopt;
 }
 
+// Of an unknown field, as decode writes it.
+std::optional<int64_t> unknown_number_in(const std::string& text) {
+  const bool is_hex = text.compare(0, 2, "0x") == 0;
+  uint64_t number = 0;
+  const char* const end = text.data() + text.size();
+  const auto [stop, error] =
+      std::from_chars(text.data() + (is_hex ? 2 : 0), end, number, is_hex ? 16 : 10);
+  return error == std::errc() && stop == end ? std::optional(static_cast<int64_t>(number))
+                                             : number_in(text);
+}
+
 // As a number that values of the field can be compared with.
 std::optional<int64_t> number_for(const FieldDescriptor& field, const std::string& text) {
   if (field.type() == FieldDescriptor::TYPE_BOOL) {
@@ -116,9 +129,11 @@ std::optional<int64_t> number_for(const FieldDescriptor& field, const std::strin
                              : std::nullopt;
   }
   if (field.enum_type() != nullptr) {
-    const EnumValueDescriptor* member = field.enum_type()->FindValueByName(text);
-    if (member != nullptr) {
-      return member->number();
+    for (int i = 0; i < field.enum_type()->value_count(); ++i) {
+      const EnumValueDescriptor& member = *field.enum_type()->value(i);
+      if (strcasecmp(member.name().c_str(), text.c_str()) == 0) {
+        return member.number();
+      }
     }
   }
   return number_in(text);
@@ -147,49 +162,13 @@ std::optional<int> compare(const Piece& piece, const std::string& text) {
   if (piece.kind == Piece::kBytes) {
     return text_of(piece).compare(text);
   }
-  const auto number = piece.is_known ? number_for(*piece.field, text) : number_in(text);
+  const auto number = piece.is_known ? number_for(*piece.field, text) : unknown_number_in(text);
   if (piece.is_container() || !number.has_value()) {
     return std::nullopt;
   }
   const int64_t value = number_of(piece);
   return value < *number ? -1 : value > *number ? 1 : 0;
 }
-
-class Matching : public Paths {
- public:
-  Matching(const std::string& path, const std::string& sign, const std::string& value)
-      : path_(path), sign_(sign), value_(value) {}
-
-  bool found() const { return found_; }
-
- private:
-  void field(const std::string& path, const std::string& /*place*/, const Piece& piece) override {
-    found_ = found_ || (path == path_ && takes(piece));
-  }
-
-  bool takes(const Piece& piece) const {
-    if (sign_.empty() || sign_ == "!") {
-      return true;
-    }
-    if (sign_ == "~") {
-      return piece.kind == Piece::kBytes && text_of(piece).find(value_) != std::string::npos;
-    }
-    const std::optional<int> order = compare(piece, value_);
-    if (!order.has_value()) {
-      return false;
-    }
-    const char first = sign_[0];
-    const bool takes_equal = first == '=' || (first != '!' && sign_.size() == 2);
-    return *order == 0
-               ? takes_equal
-               : first == '!' || (first == '<' && *order < 0) || (first == '>' && *order > 0);
-  }
-
-  const std::string& path_;
-  const std::string& sign_;
-  const std::string& value_;
-  bool found_ = false;
-};
 
 // ---- Differences
 
@@ -209,78 +188,158 @@ class Values : public Paths {
   std::vector<std::pair<std::string, std::string>>& values_;
 };
 
-// Where two messages have their values, in this order.
-std::vector<std::pair<std::string, std::string>> values_of(std::string_view bytes,
-                                                           const Descriptor& type,
-                                                           bool show_token) {
-  std::vector<std::pair<std::string, std::string>> values{{"message", type.name()}};
+using List = std::vector<std::pair<std::string, std::string>>;
+
+// The places and the values of a message, in their order.
+List values_of(std::string_view bytes, const Descriptor& type, const Hidden& hidden) {
+  List values{{"message", type.name()}};
   Values visitor(&values);
-  walk_merged(bytes, type, show_token ? Hidden() : Hidden(bytes, type), &visitor);
+  walk_merged(bytes, type, hidden, &visitor);
   return values;
 }
 
+// The values of a message, and what is shown of them.
+struct Side {
+  Side(std::string_view bytes, const Descriptor& type, bool show_token)
+      : values(values_of(bytes, type, Hidden())), by_place(values.begin(), values.end()) {
+    const List all = show_token ? values : values_of(bytes, type, Hidden(bytes, type));
+    shown = {all.begin(), all.end()};
+  }
+
+  std::string shown_at(const std::string& place) const {
+    const auto found = shown.find(place);
+    return found != shown.end() ? found->second : kNotShown;
+  }
+
+  List values;
+  std::map<std::string, std::string> by_place;
+  std::map<std::string, std::string> shown;
+};
+
 }  // namespace
 
-Condition::Condition(const std::string& text, const Descriptor* type) {
-  const size_t end = text.find_first_of("=!<>~", 1);
-  if (text[0] == '!') {
-    sign_ = "!";
-    path_ = text.substr(1);
-  } else if (end == std::string::npos) {
-    path_ = text;
-  } else {
-    const size_t size = text[end] != '=' && text[end] != '~' && text[end + 1] == '=' ? 2 : 1;
-    path_ = text.substr(0, end);
-    sign_ = text.substr(end, size);
-    value_ = text.substr(end + size);
+// Whether a field that the message has is the one, with such a value.
+class Condition::Search : public Paths {
+ public:
+  explicit Search(const Condition& condition) : condition_(condition) {}
+
+  bool found() const { return found_; }
+
+ private:
+  void field(const std::string& path, const std::string& /*place*/, const Piece& piece) override {
+    found_ = found_ || (path == condition_.path_ && takes(piece));
   }
-  if (path_.empty() || (path_[path_.rfind('.') + 1] >= '0' && path_[path_.rfind('.') + 1] <= '9')) {
-    return;  // of an unknown field, about which nothing is known
+
+  bool takes(const Piece& piece) const {
+    const Sign sign = condition_.sign_;
+    if (sign == Sign::kIsThere || sign == Sign::kIsAbsent || piece.is_hidden) {
+      return sign == Sign::kIsThere || sign == Sign::kIsAbsent;
+    }
+    if (sign == Sign::kHasWithin) {
+      return piece.kind == Piece::kBytes &&
+             text_of(piece).find(condition_.value_) != std::string::npos;
+    }
+    const std::optional<int> order = compare(piece, condition_.value_);
+    return order.has_value() && fits(sign, *order);
   }
-  const auto fields = fields_of(type, path_);
-  if (sign_.empty() || sign_ == "!") {
-    return;
+
+  static bool fits(Sign sign, int order) {
+    switch (sign) {
+      case Sign::kEqual:
+        return order == 0;
+      case Sign::kDifferent:
+        return order != 0;
+      case Sign::kLess:
+        return order < 0;
+      case Sign::kLessOrEqual:
+        return order <= 0;
+      case Sign::kMore:
+        return order > 0;
+      default:
+        return order >= 0;
+    }
   }
-  const bool is_possible =
-      std::any_of(fields.begin(), fields.end(), [this](const FieldDescriptor* field) {
-        return is_text(*field) || (sign_ != "~" && field->message_type() == nullptr &&
-                                   number_for(*field, value_).has_value());
-      });
-  if (!is_possible) {
-    throw Failure{kWrongCall, "'" + path_ + "' cannot be compared with that"};
+
+  const Condition& condition_;
+  bool found_ = false;
+};
+
+void Condition::parse(const std::string& text) {
+  static constexpr std::pair<const char*, Sign> kSigns[] = {
+      {"==", Sign::kEqual},       {"!=", Sign::kDifferent}, {"<=", Sign::kLessOrEqual},
+      {">=", Sign::kMoreOrEqual}, {"=", Sign::kEqual},      {"<", Sign::kLess},
+      {">", Sign::kMore},         {"~", Sign::kHasWithin}};
+  const bool is_absent = !text.empty() && text[0] == '!';
+  const size_t begin = is_absent ? 1 : 0;
+  const size_t end = std::min(text.find_first_of("=!<>~", begin), text.size());
+  path_ = text.substr(begin, end - begin);
+  sign_ = is_absent ? Sign::kIsAbsent : Sign::kIsThere;
+  const auto* found = std::find_if(std::begin(kSigns), std::end(kSigns), [&](const auto& sign) {
+    return text.compare(end, std::string_view(sign.first).size(), sign.first) == 0;
+  });
+  const bool has_sign = end < text.size();
+  if (path_.empty() || (has_sign && (is_absent || found == std::end(kSigns)))) {
+    throw Failure{kWrongCall, "a condition is PATH, !PATH or PATH=VALUE, not '" + text + "'"};
+  }
+  if (has_sign) {
+    sign_ = found->second;
+    value_ = text.substr(end + std::string_view(found->first).size());
   }
 }
 
+Condition::Condition(const std::string& text, const Descriptor* type) {
+  parse(text);
+  const char last = path_[path_.rfind('.') + 1];
+  if (last >= '0' && last <= '9') {
+    return;  // of an unknown field, about which nothing is known
+  }
+  const auto fields = fields_of(type, path_);
+  if (sign_ == Sign::kIsThere || sign_ == Sign::kIsAbsent) {
+    return;
+  }
+  std::vector<std::string> members;
+  for (const FieldDescriptor* field : fields) {
+    const bool is_number = sign_ != Sign::kHasWithin && field->message_type() == nullptr;
+    if (is_text(*field) || (is_number && number_for(*field, value_).has_value())) {
+      return;
+    }
+    for (int i = 0; field->enum_type() != nullptr && i < field->enum_type()->value_count(); ++i) {
+      members.push_back(field->enum_type()->value(i)->name());
+    }
+  }
+  throw Failure{kWrongCall, "'" + path_ + "' has no value such as '" + value_ + "'" +
+                                did_you_mean(value_, members)};
+}
+
 bool Condition::holds(std::string_view bytes, const Descriptor& type, const Hidden& hidden) const {
-  Matching search(path_, sign_, value_);
+  Search search(*this);
   walk_merged(bytes, type, hidden, &search);
-  return search.found() != (sign_ == "!");
+  return search.found() != (sign_ == Sign::kIsAbsent);
 }
 
 bool diff(std::string_view first, const Descriptor& first_type, std::string_view second,
           const Descriptor& second_type, bool show_token, const Colours& colours,
           std::ostream* out) {
-  const auto before = values_of(first, first_type, show_token);
-  const auto after = values_of(second, second_type, show_token);
-  const std::map<std::string, std::string> old_values(before.begin(), before.end());
-  const std::map<std::string, std::string> new_values(after.begin(), after.end());
+  const Side before(first, first_type, show_token);
+  const Side after(second, second_type, show_token);
   bool is_different = false;
-  const auto write = [&](char sign, const std::string& colour, const auto& value) {
+  const auto write = [&](char sign, const std::string& colour, const std::string& place,
+                         const Side& side) {
     is_different = true;
-    *out << colour << sign << ' ' << value.first << ": " << value.second << colours.end << '\n';
+    *out << colour << sign << ' ' << place << ": " << side.shown_at(place) << colours.end << '\n';
   };
-  for (const auto& value : before) {
-    const auto other = new_values.find(value.first);
-    if (other == new_values.end() || other->second != value.second) {
-      write('-', colours.wrong, value);
-    }
-    if (other != new_values.end() && other->second != value.second) {
-      write('+', colours.value, *other);
+  for (const auto& [place, value] : before.values) {
+    const auto other = after.by_place.find(place);
+    if (other == after.by_place.end()) {
+      write('-', colours.wrong, place, before);
+    } else if (other->second != value) {
+      write('-', colours.wrong, place, before);
+      write('+', colours.value, place, after);
     }
   }
-  for (const auto& value : after) {
-    if (old_values.count(value.first) == 0) {
-      write('+', colours.value, value);
+  for (const auto& [place, value] : after.values) {
+    if (before.by_place.count(place) == 0) {
+      write('+', colours.value, place, after);
     }
   }
   return is_different;

@@ -24,7 +24,7 @@ namespace qel_wire {
 //
 // Of repeated fields any value may do. Numbers are compared as numbers, texts by their bytes,
 // enumerations by name or number, what is of type bytes in base64, as in JSON. An unknown field's
-// path is its number.
+// path is its number. What is hidden is there, and has no value.
 class Condition {
  public:
   // Throws Failure if there is no such path in the message, or in any message if type is null, or
@@ -35,8 +35,23 @@ class Condition {
              const Hidden& hidden) const;
 
  private:
+  enum class Sign {
+    kIsThere,
+    kIsAbsent,
+    kEqual,
+    kDifferent,
+    kLess,
+    kLessOrEqual,
+    kMore,
+    kMoreOrEqual,
+    kHasWithin
+  };
+  class Search;
+
+  void parse(const std::string& text);
+
   std::string path_;
-  std::string sign_;  // empty: whether it is there
+  Sign sign_ = Sign::kIsThere;
   std::string value_;
 };
 

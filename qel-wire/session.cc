@@ -1,7 +1,6 @@
 #include "session.h"
 
 #include <algorithm>
-#include <iterator>
 #include <set>
 #include <string_view>
 
@@ -88,16 +87,18 @@ Use other(Use use) {
 }  // namespace
 
 // The last such request; type is null if it is not known.
-Session::Open Session::request_answered_by(const Found& found, const Descriptor* type) {
-  const std::set<int64_t> ids = possible_request_ids(found.bytes);
-  const auto last = std::find_if(open_.rbegin(), open_.rend(), [&](const Entry& request) {
-    if (!request.request_id.has_value() || ids.count(*request.request_id) == 0 ||
-        !is_from_other_end(request, found)) {
-      return false;
+Session::Open::iterator Session::request_answered_by(const Found& found, const Descriptor* type) {
+  for (const int64_t id : possible_request_ids(found.bytes)) {
+    const auto [first, end] = open_.equal_range(id);
+    for (auto request = end; request != first;) {
+      --request;
+      if (is_from_other_end(request->second, found) &&
+          reply_among(request->second, found, type) != nullptr) {
+        return request;
+      }
     }
-    return reply_among(request, found, type) != nullptr;
-  });
-  return last == open_.rend() ? open_.end() : std::prev(last.base());
+  }
+  return open_.end();
 }
 
 // A message that only one of the ends sends tells more than the ports.
@@ -125,7 +126,7 @@ Entry Session::add(const Found& as_found) {
   const auto request = request_answered_by(found, type);
   const bool is_reply = request != open_.end();
   if (type == nullptr && is_reply) {
-    type = reply_among(*request, found, nullptr);
+    type = reply_among(request->second, found, nullptr);
   }
   entry.is_guess = type == nullptr;
   entry.types = entry.is_guess ? guess(found.bytes, found.use).front().types : Types{type};
@@ -133,13 +134,23 @@ Entry Session::add(const Found& as_found) {
   entry.request_id = request_id_in(found.bytes, *type);
   entry.use = found.use != Use::kNone ? found.use : use_of(*type);
   if (is_reply) {
-    entry.answers = request->number;
-    entry.use = entry.use != Use::kNone ? entry.use : other(request->use);
+    entry.answers = request->second.number;
+    entry.use = entry.use != Use::kNone ? entry.use : other(request->second.use);
     open_.erase(request);
   } else if (reply_to(*type) != nullptr) {
-    open_.push_back(entry);
+    open_.emplace(entry.request_id, entry);
   }
   return entry;
+}
+
+std::vector<Entry> Session::unanswered() const {
+  std::vector<Entry> entries;
+  for (const auto& [ignored, entry] : open_) {
+    entries.push_back(entry);
+  }
+  std::sort(entries.begin(), entries.end(),
+            [](const Entry& a, const Entry& b) { return a.number < b.number; });
+  return entries;
 }
 
 }  // namespace qel_wire

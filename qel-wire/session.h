@@ -6,6 +6,7 @@
 
 #include <cstddef>
 #include <cstdint>
+#include <map>
 #include <optional>
 #include <set>
 #include <string>
@@ -34,18 +35,19 @@ class Session {
   Entry add(const Found& found);
 
   // Requests that no message has answered, the first one first.
-  const std::vector<Entry>& unanswered() const { return open_; }
+  std::vector<Entry> unanswered() const;
 
  private:
-  using Open = std::vector<Entry>::iterator;
+  // By their requestIds; those without one are never answered.
+  using Open = std::multimap<std::optional<int64_t>, Entry>;
 
-  Open request_answered_by(const Found& found, const google::protobuf::Descriptor* type);
+  Open::iterator request_answered_by(const Found& found, const google::protobuf::Descriptor* type);
 
   Use use_of_sender(const Found& found, const google::protobuf::Descriptor* type);
 
   size_t count_ = 0;
   std::set<size_t> turned_;  // connections whose ends are the other way round than they seemed
-  std::vector<Entry> open_;
+  Open open_;
 };
 
 }  // namespace qel_wire

@@ -346,6 +346,12 @@ std::optional<Problem> walk(std::string_view bytes, const Descriptor& type, Visi
   return reader.problem();
 }
 
+bool walk_content(std::string_view bytes, const Piece& container, Visitor* visitor) {
+  Reader reader(bytes, container.value_offset);
+  Level content(container, Level(container.field->containing_type(), bytes.size(), 0));
+  return walk_level(&reader, &content, visitor);
+}
+
 std::optional<Problem> problem_of(std::string_view bytes, const Descriptor& type) {
   Visitor nobody;
   return walk(bytes, type, &nobody);

@@ -167,6 +167,10 @@ class Visitor {
 std::optional<Problem> walk(std::string_view bytes, const google::protobuf::Descriptor& type,
                             Visitor* visitor);
 
+// The same of what an embedded message or a packed list of a message has in it. False if it is
+// broken.
+bool walk_content(std::string_view bytes, const Piece& container, Visitor* visitor);
+
 // The same without a visitor.
 std::optional<Problem> problem_of(std::string_view bytes, const google::protobuf::Descriptor& type);
 

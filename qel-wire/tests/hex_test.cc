@@ -480,6 +480,8 @@ constexpr char kMissing[] = "the last line is missing, whose offset tells how ma
 constexpr char kNoBytes[] = "no bytes in hex or octal: use od -tx1 or hexdump -C";
 
 const std::vector<Form> kMistakes = {
+    {"words_of_od_without_offsets", " 0758 2a60\n", std::string("1:1: ") + kOrder},
+    {"decimal_numbers_without_brackets", "88, 16, 96", std::string("1:1: ") + kDecimal},
     {"digit_too_few", "08 07\n60 2\n", std::string("2:4: ") + kOdd},
     {"digit_too_few_in_a_long_line", "0807602a6a0\n", std::string("1:1: ") + kOdd},
     {"digit_too_few_in_quotes", "[\"08\", \"7\"]", std::string("1:9: ") + kOdd},
