@@ -4,6 +4,7 @@
 #include <google/protobuf/io/tokenizer.h>
 #include <google/protobuf/io/zero_copy_stream_impl_lite.h>
 #include <google/protobuf/unknown_field_set.h>
+#include <strings.h>
 
 #include <charconv>
 #include <limits>
@@ -11,6 +12,7 @@
 #include <optional>
 #include <vector>
 
+#include "failure.h"
 #include "misread.h"
 #include "notation.h"
 #include "token.h"
@@ -31,12 +33,35 @@ constexpr int kDeepest = 100;
 
 using Reason = std::string;
 
+// Of descriptors, the one of that name in any case of letters, or null.
+template <typename Descriptor, typename At>
+const Descriptor* one_named(const std::string& name, int count, At at) {
+  for (int i = 0; i < count; ++i) {
+    if (strcasecmp(at(i)->name().c_str(), name.c_str()) == 0) {
+      return at(i);
+    }
+  }
+  return nullptr;
+}
+
+template <typename At>
+std::vector<std::string> names_of(int count, At at) {
+  std::vector<std::string> names;
+  for (int i = 0; i < count; ++i) {
+    names.push_back(at(i)->name());
+  }
+  return names;
+}
+
 const FieldDescriptor* field_named(const Message& message, const std::string& name) {
-  return message.GetDescriptor()->FindFieldByName(name);
+  const auto& type = *message.GetDescriptor();
+  return one_named<FieldDescriptor>(name, type.field_count(), [&](int i) { return type.field(i); });
 }
 
 std::string no_field(const Message& message, const std::string& name) {
-  return message.GetDescriptor()->name() + " has no field '" + name + "'";
+  const auto& type = *message.GetDescriptor();
+  return type.name() + " has no field '" + name + "'" +
+         did_you_mean(name, names_of(type.field_count(), [&](int i) { return type.field(i); }));
 }
 
 bool is_filled(const Message& message, const FieldDescriptor& field) {
@@ -124,9 +149,12 @@ Reason set_name(Message* message, const FieldDescriptor& field, const std::strin
   if (field.cpp_type() != FieldDescriptor::CPPTYPE_ENUM) {
     return wrong_kind(field);
   }
-  const EnumValueDescriptor* member = field.enum_type()->FindValueByName(name);
+  const auto& type = *field.enum_type();
+  const auto at = [&](int i) { return type.value(i); };
+  const auto* member = one_named<EnumValueDescriptor>(name, type.value_count(), at);
   if (member == nullptr) {
-    return field.enum_type()->name() + " has no '" + name + "'";
+    return type.name() + " has no '" + name + "'" +
+           did_you_mean(name, names_of(type.value_count(), at));
   }
   set_member(message, field, member->number());
   return "";

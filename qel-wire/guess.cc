@@ -69,13 +69,14 @@ struct Candidate {
 // Reads the bytes once, for all messages: there are 81, and captures are large.
 class Race {
  public:
-  explicit Race(std::string_view bytes) : bytes_(bytes) {
+  Race() {
     for (int i = 0; i < schema_file().message_type_count(); ++i) {
       enter(*schema_file().message_type(i));
     }
   }
 
-  std::vector<Candidate> run() && {
+  std::vector<Candidate> run(std::string_view bytes) && {
+    bytes_ = bytes;
     Reader reader(bytes_);
     Level level(nullptr, bytes_.size(), 0);
     size_t end = 0;
@@ -228,7 +229,8 @@ bool is_possible(const Descriptor& type, Use use) {
 
 std::vector<Fit> guess(std::string_view bytes, Use use) {
   std::map<decltype(quality(Fit())), Fit> fits;
-  for (Candidate& candidate : Race(bytes).run()) {
+  static const Race start;  // to which all messages have come
+  for (Candidate& candidate : Race(start).run(bytes)) {
     if (is_possible(*candidate.type, use)) {
       candidate.fit.is_record = is_record(*candidate.type);
       fits.emplace(quality(candidate.fit), candidate.fit)

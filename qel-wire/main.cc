@@ -42,11 +42,16 @@ using qel_wire::kNoAccess;
 using qel_wire::kWrongCall;
 using qel_wire::Notation;
 
+// Which name is not said: it may be a piece of a token, if the stream is cut.
+constexpr char kNoSuchName[] = ": its frame has a name that no message has";
+
 const Descriptor& message_of(const std::string& name) {
   const Descriptor* type = qel_wire::message_named(name);
   if (type == nullptr) {
+    const bool is_file = access(name.c_str(), F_OK) == 0;
     throw Failure{kWrongCall, "there is no message " + qel_wire::named(name) +
                                   qel_wire::did_you_mean(name, qel_wire::message_names()) +
+                                  (is_file ? "; a message's name comes before the file" : "") +
                                   " ('qel-wire schema' lists them)"};
   }
   return *type;
@@ -117,8 +122,7 @@ int for_each_known(const Call& call, Take take) {
   return qel_wire::for_each_message(call, [&](const qel_wire::Found& found) {
     const Descriptor* type = found.name.empty() ? named : qel_wire::message_named(found.name);
     if (!found.name.empty() && type == nullptr) {
-      // The name may be a piece of a token, if the stream is cut.
-      qel_wire::complain(found.place + ": its frame has a name that no message has");
+      qel_wire::complain(found.place + kNoSuchName);
       return kBroken;
     }
     if (!is_guessing && type != named) {
@@ -283,6 +287,10 @@ int session(const Call& call) {
   std::set<size_t> shown;
   const int status = qel_wire::for_each_message(call, [&](const qel_wire::Found& found) {
     const qel_wire::Entry entry = session.add(found);
+    const bool is_named = found.name.empty() || qel_wire::message_named(found.name) != nullptr;
+    if (!is_named) {
+      qel_wire::complain(found.place + kNoSuchName);
+    }
     if (const auto status = conditions.refuse(found, *entry.types.front())) {
       return *status;
     }
@@ -294,7 +302,7 @@ int session(const Call& call) {
                 << problem->reason << colours.end;
     }
     std::cout << '\n';
-    return problem.has_value() ? kBroken : kDone;
+    return problem.has_value() || !is_named ? kBroken : kDone;
   });
   for (const qel_wire::Entry& entry : session.unanswered()) {
     if (shown.count(entry.number) > 0) {

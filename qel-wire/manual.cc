@@ -32,6 +32,9 @@ bool has_value(const CLI::Option& option) {
 // What the value of the option may be, if that is known.
 std::string values_of(const CLI::Option& option) {
   std::string values = option.get_type_name();
+  if (values == "MESSAGE") {
+    return joined(message_names());
+  }
   std::replace(values.begin(), values.end(), '|', ' ');
   return has_value(option) && values != option.get_type_name() ? values : "";
 }
@@ -39,8 +42,10 @@ std::string values_of(const CLI::Option& option) {
 // The words that may be the command's first argument; if there are none, that is a file.
 std::vector<std::string> words_of(const CLI::App& command) {
   std::vector<std::string> words = message_names();
-  if (command.get_option_no_throw("MESSAGE") != nullptr) {
-    words.insert(words.begin(), "auto");
+  if (const CLI::Option* message = command.get_option_no_throw("MESSAGE")) {
+    if (message->get_description().find("'auto'") != std::string::npos) {
+      words.insert(words.begin(), "auto");
+    }
     return words;
   }
   if (command.get_option_no_throw("NAME") != nullptr) {

@@ -63,6 +63,38 @@ std::string with_coloured_names(const std::string& text, const Colours& colours)
   return result;
 }
 
+struct Facts {
+  bool is_record = false;
+  Use use = Use::kNone;
+};
+
+std::vector<Facts> all_facts() {
+  static const std::map<std::string, Use> uses = {
+#include "interface.inc"
+  };
+  std::vector<Facts> facts(static_cast<size_t>(schema_file().message_type_count()));
+  for (const std::string& name : message_names()) {
+    const Descriptor& type = *message_named(name);
+    const auto use = uses.find(name);
+    if (use != uses.end()) {
+      facts[static_cast<size_t>(type.index())].use = use->second;
+    }
+    for (int i = 0; i < type.field_count(); ++i) {
+      const Descriptor* record = type.field(i)->message_type();
+      if (record != nullptr) {
+        facts[static_cast<size_t>(record->index())].is_record = true;
+      }
+    }
+  }
+  return facts;
+}
+
+// They are asked for often.
+const Facts& facts_about(const Descriptor& type) {
+  static const std::vector<Facts> all = all_facts();
+  return all[static_cast<size_t>(type.index())];
+}
+
 }  // namespace
 
 const FileDescriptor& schema_file() {
@@ -123,23 +155,11 @@ bool may_be_request_id(uint32_t number) {
 }
 
 bool is_record(const Descriptor& type) {
-  const FileDescriptor& file = schema_file();
-  for (int i = 0; i < file.message_type_count(); ++i) {
-    for (int f = 0; f < file.message_type(i)->field_count(); ++f) {
-      if (file.message_type(i)->field(f)->message_type() == &type) {
-        return true;
-      }
-    }
-  }
-  return false;
+  return facts_about(type).is_record;
 }
 
 Use use_of(const Descriptor& type) {
-  static const std::map<std::string, Use> uses = {
-#include "interface.inc"
-  };
-  const auto found = uses.find(type.name());
-  return found != uses.end() ? found->second : Use::kNone;
+  return facts_about(type).use;
 }
 
 }  // namespace qel_wire

@@ -137,7 +137,7 @@ Entry Session::add(const Found& as_found) {
     entry.answers = request->second.number;
     entry.use = entry.use != Use::kNone ? entry.use : other(request->second.use);
     open_.erase(request);
-  } else if (reply_to(*type) != nullptr) {
+  } else if (reply_to(*type) != nullptr && !problem_of(found.bytes, *type).has_value()) {
     open_.emplace(entry.request_id, entry);
   }
   return entry;

@@ -102,6 +102,16 @@ def captures():
     return {name: data for name, data in found.items() if len(data) > 3}
 
 
+def documents(text):
+    """The JSON documents that follow each other."""
+    text, decoder, found = text.decode(), json.JSONDecoder(), []
+    while text:
+        document, end = decoder.raw_decode(text)
+        found.append(document)
+        text = text[end:].lstrip()
+    return found
+
+
 def quoted(value):
     return value if isinstance(value, str) else json.dumps(value)
 
@@ -110,25 +120,44 @@ def is_number(value):
     return not isinstance(value, bool) and (isinstance(value, int) or re.fullmatch(r"-?[0-9]+", value))
 
 
-def where_agrees(chance, name, data):
-    """A random condition on the messages, by qel-wire and by jq."""
-    framed = b"".join(len(each).to_bytes(4, "big") + each for each in data)
-    forms = [json.loads(line) for line in run("jq", "-c", ".", data=qel_wire(
-        "decode", name, "--show-token", "--json", "--frames=u32", data=framed)).splitlines()]
-    path, value = chance.choice([leaf for form in forms for leaf in leaves(form)])
+def is_text(name, path):
+    descriptor = type_of(name)
+    for part in path.split("."):
+        field = descriptor.fields_by_name[part]
+        descriptor = field.message_type
+    return field.type in (field.TYPE_STRING, field.TYPE_BYTES)
+
+
+def some_condition(chance, name, forms):
+    """A random condition on the messages, for qel-wire and for jq."""
+    path, value = chance.choice([(path, value) for form in forms for path, value in leaves(form)
+                                 if "\0" not in str(value)])
     values = [each for form in forms for at, each in leaves(form) if at == path]
     # jq has no whole numbers beyond 53 bits.
     is_small = all(is_number(each) and abs(int(each)) < 2**53 for each in values)
-    sign = chance.choice(["", "!", "=", "!="] + ["<", "<=", ">", ">="] * is_small)
-    condition = "!" + path if sign == "!" else path + sign + (quoted(value) if sign else "")
-    wanted = json.dumps(value)
+    sign = chance.choice(["", "!", "=", "!="] + ["<", "<=", ">", ">="] * is_small + ["~"] * is_text(name, path))
+    if sign in ("", "!"):
+        return sign + path, f"any({jq_path(path)}; true)" + " | not" * (sign == "!")
+    if sign == "~":
+        part = value[:chance.randrange(len(value) + 1)]
+        return f"{path}~{part}", f"any({jq_path(path)}; contains({json.dumps(part)}))"
     number = "tonumber" if sign in ("<", "<=", ">", ">=") else "."
-    test = {"": f"any({jq_path(path)}; true)", "!": f"any({jq_path(path)}; true) | not"}.get(
-        sign, f"any({jq_path(path)}; {number} {'==' if sign == '=' else sign} ({wanted} | {number}))")
-    ours = qel_wire("decode", name, "--show-token", "--json", "--frames=u32", f"--where={condition}", data=framed)
-    theirs = run("jq", "-c", f"select({test})", data="\n".join(map(json.dumps, forms)).encode())
-    return [json.loads(line) for line in run("jq", "-c", ".", data=ours).splitlines()] == \
-        [json.loads(line) for line in theirs.splitlines()] or condition
+    compared = f"{number} {'==' if sign == '=' else sign} ({json.dumps(value)} | {number})"
+    return path + sign + quoted(value), f"any({jq_path(path)}; {compared})"
+
+
+def where_agrees(chance, name, data):
+    """One or two conditions."""
+    with tempfile.NamedTemporaryFile() as file:
+        file.write(b"".join(len(each).to_bytes(4, "big") + each for each in data))
+        file.flush()
+        decode = ["decode", name, "--show-token", "--json", "--frames=u32"]
+        forms = documents(qel_wire(*decode, file.name))
+        conditions, tests = zip(*(some_condition(chance, name, forms) for _ in range(chance.randrange(1, 3))))
+        ours = qel_wire(*decode, *(f"--where={condition}" for condition in conditions), file.name)
+    chosen = " and ".join(f"({test})" for test in tests)
+    theirs = run("jq", "-c", f"select({chosen})", data="\n".join(map(json.dumps, forms)).encode())
+    return documents(ours) == documents(theirs) or conditions
 
 
 def diff_agrees(chance, name, data):
@@ -172,14 +201,17 @@ FRAMES = {
 
 
 def disagreements_on_frames():
+    """Ten thousand messages of each kind in one file, and what each of them is alone."""
+    chance = random.Random(20261123)
     found = sorted(captures().items())
-    alone = {name: b"".join(qel_wire("decode", name, data=each) for each in data) for name, data in found}
     for kind, head in FRAMES.items():
-        for name, data in found:
-            framed = b"".join(head(name, each) + each for each in data)
-            printed = qel_wire("decode", name, f"--frames={kind}", data=framed).splitlines(keepends=True)
-            if b"".join(line for line in printed if not line.startswith(b"# message ")) != alone[name]:
-                yield f"{kind} {name}"
+        name, data = chance.choice(found)
+        alone = {each: qel_wire("decode", name, data=each) for each in data}
+        many = chance.choices(data, k=10000)
+        printed = qel_wire("decode", name, f"--frames={kind}", data=b"".join(head(name, each) + each for each in many))
+        messages_alone = re.split(rb"# message [0-9]+: .*\n", printed)
+        if messages_alone != [b""] + [alone[each] for each in many]:
+            yield f"{kind} {name}"
 
 
 # ---- Memory
