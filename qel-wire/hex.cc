@@ -87,6 +87,8 @@ class List {
     take_prefix("=", &rest_);
     skip_space();
     skip_words("{(\"'/#\n", "{(\"'");
+    take_prefix("vec!", &rest_);  // Rust's
+    take_prefix("&", &rest_);
   }
 
   // Up to one of the ends, unless another of the stops or bytes come first.
@@ -120,6 +122,9 @@ class List {
   void read_item() {
     const char c = rest_[0];
     const char next = char_at(rest_, 1);
+    if (take_prefix("byte)", &rest_)) {  // Java's cast, whose first bracket was read before
+      return;
+    }
     if ((is_digit(c) && !is_in(kQuotes, next)) || !read_other(c, next)) {
       read_number();
     }
@@ -218,6 +223,7 @@ class List {
     std::string_view digits = take_while(is_digit, &rest_);
     const bool has_h = !has_0x && is_in("hH", char_at(rest_, 0));
     take(has_h ? 1 : 0, &rest_);
+    take(has_0x && rest_.substr(0, 2) == "u8" ? 2 : 0, &rest_);  // Rust's
     if (digits.empty() || std::isalnum(static_cast<unsigned char>(char_at(rest_, 0))) != 0) {
       throw Stop{digits.empty() ? begin : rest_.data(), *begin == '*' ? kRepeated : kStray};
     }
