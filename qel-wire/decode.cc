@@ -68,10 +68,16 @@ Decoded decode(std::string_view bytes, const google::protobuf::Descriptor& type,
   notes.add_to(&result.notes);
   if (!options.as_json) {
     print_text(bytes, type, hidden, options.bytes_form, options.colours, out);
-  } else if (const size_t unknown =
-                 print_json(bytes, type, hidden, options.bytes_form, options.colours, out)) {
-    result.notes.push_back("without " + counted(unknown, "unknown field") +
+    return result;
+  }
+  const NotInJson lost = print_json(bytes, type, hidden, options.bytes_form, options.colours, out);
+  if (lost.unknown > 0) {
+    result.notes.push_back("without " + counted(lost.unknown, "unknown field") +
                            ", which JSON has no place for");
+  }
+  if (lost.replaced > 0) {
+    result.notes.push_back("with replacements in " + counted(lost.replaced, "text") +
+                           " that JSON cannot have, as it is not UTF-8");
   }
   return result;
 }

@@ -272,8 +272,8 @@ class Table : public Rows {
 // For programs.
 class JsonLines : public Rows {
  public:
-  JsonLines(const ExplainOptions& options, std::ostream* out)
-      : form_(options.bytes_form), message_(options.message), out_(*out) {}
+  JsonLines(const std::string& type, const ExplainOptions& options, std::ostream* out)
+      : type_(type), form_(options.bytes_form), message_(options.message), out_(*out) {}
 
   void begin(const Piece& container) override { path_.push_back(step(container)); }
   void end() override { path_.pop_back(); }
@@ -283,6 +283,7 @@ class JsonLines : public Rows {
     if (message_ > 0) {
       line["message"] = message_;
     }
+    line["of"] = type_;
     line["offset"] = row.offset;
     line["end"] = row.end;
     if (row.piece != nullptr) {
@@ -321,6 +322,7 @@ class JsonLines : public Rows {
     return piece.kind == Piece::kBytes ? std::string(piece.bytes) : value_in_text(piece, form_);
   }
 
+  const std::string& type_;
   BytesForm form_;
   size_t message_;
   std::ostream& out_;
@@ -417,7 +419,7 @@ bool explain(std::string_view bytes, const google::protobuf::Descriptor& type,
              const ExplainOptions& options, std::ostream* out) {
   const Hidden hidden = options.show_token ? Hidden() : Hidden(bytes, type);
   Table table(bytes, hidden, options, out);
-  JsonLines lines(options, out);
+  JsonLines lines(type.name(), options, out);
   Explanation explanation(hidden, options.as_json ? static_cast<Rows*>(&lines) : &table);
   const std::optional<Problem> problem = walk(bytes, type, &explanation);
   explanation.finish(problem, bytes.size());

@@ -80,7 +80,7 @@ class JsonPrinter : public Visitor {
 
   void begin(const Piece& piece) override {
     if (!piece.is_known) {
-      unknown_ += unknown_groups_ == 0 ? 1 : 0;
+      lost_.unknown += unknown_groups_ == 0 ? 1 : 0;
       unknown_groups_ += piece.kind == Piece::kGroup ? 1 : 0;
     } else {
       begin_value(*piece.field);
@@ -88,6 +88,9 @@ class JsonPrinter : public Visitor {
         objects_.emplace_back();
         out_ << '{';
       } else {
+        const bool is_text =
+            piece.kind == Piece::kBytes && piece.field->type() == FieldDescriptor::TYPE_STRING;
+        lost_.replaced += is_text && !is_utf8(piece.bytes) ? 1 : 0;
         out_ << value_in_json(piece, form_);
       }
     }
@@ -101,10 +104,10 @@ class JsonPrinter : public Visitor {
     }
   }
 
-  size_t finish() {
+  NotInJson finish() {
     end_object();
     out_ << '\n';
-    return unknown_;
+    return lost_;
   }
 
  private:
@@ -159,7 +162,7 @@ class JsonPrinter : public Visitor {
   std::ostream& out_;
   std::vector<Object> objects_;  // around the next value
   size_t lists_ = 0;             // the same
-  size_t unknown_ = 0;
+  NotInJson lost_;
   size_t unknown_groups_ = 0;  // around the next value
 };
 
@@ -208,8 +211,9 @@ void print_text(std::string_view bytes, const google::protobuf::Descriptor& type
   walk_merged(bytes, type, hidden, &printer);
 }
 
-size_t print_json(std::string_view bytes, const google::protobuf::Descriptor& type,
-                  const Hidden& hidden, BytesForm form, const Colours& colours, std::ostream* out) {
+NotInJson print_json(std::string_view bytes, const google::protobuf::Descriptor& type,
+                     const Hidden& hidden, BytesForm form, const Colours& colours,
+                     std::ostream* out) {
   JsonPrinter printer(form, colours, out);
   walk_merged(bytes, type, hidden, &printer);
   return printer.finish();

@@ -25,9 +25,14 @@ void print_text(std::string_view bytes, const google::protobuf::Descriptor& type
                 const Hidden& hidden, BytesForm form, const Colours& colours, std::ostream* out);
 
 // The JSON form of Protocol Buffers: names as in the schema, int64 and bytes as strings,
-// enumerations by name. Returns how many unknown fields it leaves out, on all levels.
-size_t print_json(std::string_view bytes, const google::protobuf::Descriptor& type,
-                  const Hidden& hidden, BytesForm form, const Colours& colours, std::ostream* out);
+// enumerations by name.
+struct NotInJson {
+  size_t unknown = 0;   // fields that are left out, on all levels
+  size_t replaced = 0;  // texts that are no UTF-8: what is wrong in them is replaced
+};
+NotInJson print_json(std::string_view bytes, const google::protobuf::Descriptor& type,
+                     const Hidden& hidden, BytesForm form, const Colours& colours,
+                     std::ostream* out);
 
 // A number or a text as the text form has it.
 std::string value_in_text(const Piece& piece, BytesForm form);
