@@ -190,14 +190,21 @@ class TextParser : private google::protobuf::io::ErrorCollector {
     return is_there;
   }
 
-  [[noreturn]] void fail(const std::string& reason) { fail(token(), reason); }
+  // A token has a copy of its text, which may be long.
+  struct Place {
+    int line;
+    int column;
+  };
+  Place place() { return {token().line, token().column}; }
 
-  [[noreturn]] static void fail(const Tokenizer::Token& where, const std::string& reason) {
+  [[noreturn]] void fail(const std::string& reason) { fail(place(), reason); }
+
+  [[noreturn]] static void fail(const Place& where, const std::string& reason) {
     throw Misread{static_cast<size_t>(where.line) + 1, static_cast<size_t>(where.column) + 1,
                   reason};
   }
 
-  static void expect(const Tokenizer::Token& where, const Reason& reason) {
+  static void expect(const Place& where, const Reason& reason) {
     if (!reason.empty()) {
       fail(where, reason);
     }
@@ -279,19 +286,18 @@ class TextParser : private google::protobuf::io::ErrorCollector {
       --depth_;
       return;
     }
-    const Tokenizer::Token where = token();
-    switch (where.type) {
-      case Tokenizer::TYPE_STRING:
-        expect(where, set_text(message, field, text()));
-        return;
-      case Tokenizer::TYPE_IDENTIFIER:
-        advance();
-        expect(where, field.cpp_type() == FieldDescriptor::CPPTYPE_BOOL
-                          ? set_bool(message, field, truth(where))
-                          : set_name(message, field, where.text));
-        return;
-      default:
-        break;
+    const Place where = place();
+    if (is_at(Tokenizer::TYPE_STRING)) {
+      expect(where, set_text(message, field, text()));
+      return;
+    }
+    if (is_at(Tokenizer::TYPE_IDENTIFIER)) {
+      const std::string word = token().text;
+      advance();
+      expect(where, field.cpp_type() == FieldDescriptor::CPPTYPE_BOOL
+                        ? set_bool(message, field, truth(word, where))
+                        : set_name(message, field, word));
+      return;
     }
     const int64_t number = signed_number();
     if (field.cpp_type() != FieldDescriptor::CPPTYPE_BOOL) {
@@ -303,11 +309,11 @@ class TextParser : private google::protobuf::io::ErrorCollector {
     }
   }
 
-  static bool truth(const Tokenizer::Token& word) {
-    if (word.text != "true" && word.text != "false") {
-      fail(word, "'true' or 'false' is missing");
+  static bool truth(const std::string& word, const Place& where) {
+    if (word != "true" && word != "false") {
+      fail(where, "'true' or 'false' is missing");
     }
-    return word.text == "true";
+    return word == "true";
   }
 
   // Texts that follow each other are one.
@@ -341,7 +347,7 @@ class TextParser : private google::protobuf::io::ErrorCollector {
   // A field by its number: of 4 or 8 bytes if the value is hex of that many digits.
   void unknown(UnknownFieldSet* fields) {
     constexpr uint64_t kMostNumber = (uint64_t{1} << 29U) - 1;
-    const Tokenizer::Token name = token();
+    const Place name = place();
     const auto field = static_cast<int>(number(kMostNumber));
     if (!take(":")) {
       const std::string end = closing();
@@ -353,7 +359,7 @@ class TextParser : private google::protobuf::io::ErrorCollector {
       return;
     }
     if (is_at(Tokenizer::TYPE_STRING)) {
-      const Tokenizer::Token where = token();
+      const Place where = place();
       const std::string bytes = text();
       if (bytes == kNotShown) {
         fail(where, "a field has " + std::string(kNotShown) +

@@ -193,12 +193,8 @@ int decode(const Call& call) {
   });
 }
 
-int encode(const Call& call) {
-  const Descriptor& type = message_of(call.message);
-  const auto message = qel_wire::new_message(type);
-  if (call.has_bytes()) {
-    throw Failure{kWrongCall, "encode takes a text: --hex and --base64 have no bytes there"};
-  }
+// From the text form, or from JSON.
+void read_message(const Call& call, google::protobuf::Message* message) {
   std::string text = qel_wire::read_file(call.files.empty() ? "-" : call.files.front());
   if (text.compare(0, 3, "\xef\xbb\xbf") == 0) {  // which some editors write
     text.erase(0, 3);
@@ -206,16 +202,25 @@ int encode(const Call& call) {
   try {
     const size_t first = text.find_first_not_of(" \t\r\n");
     if (first != std::string::npos && text[first] == '{') {
-      qel_wire::parse_json(text, bytes_form_of(call), message.get());
+      qel_wire::parse_json(text, bytes_form_of(call), message);
     } else {
-      qel_wire::parse_text(text, message.get());
+      qel_wire::parse_text(text, message);
     }
   } catch (const qel_wire::Misread& misread) {
-    throw Failure{kBroken, "the text is no " + type.name() + ": " + misread.text()};
+    throw Failure{kBroken, "the text is no " + message->GetTypeName() + ": " + misread.text()};
   }
-  std::cout << qel_wire::to_notation(message->SerializeAsString(), call.notation());
-  if (call.notation() != Notation::kRaw) {
-    std::cout << '\n';
+}
+
+int encode(const Call& call) {
+  const auto message = qel_wire::new_message(message_of(call.message));
+  if (call.has_bytes()) {
+    throw Failure{kWrongCall, "encode takes a text: --hex and --base64 have no bytes there"};
+  }
+  read_message(call, message.get());
+  if (call.notation() == Notation::kRaw) {
+    message->SerializeToOstream(&std::cout);
+  } else {
+    std::cout << qel_wire::to_notation(message->SerializeAsString(), call.notation()) << '\n';
   }
   return kDone;
 }

@@ -232,7 +232,8 @@ std::string fish(const CLI::App& app) {
     const std::vector<std::string> words = words_of(*command);
     if (!words.empty()) {
       lines += "complete -c qel-wire -f -n '__fish_seen_subcommand_from " + name +
-               "; and test (count (commandline -opc)) -eq 2' -a '" + joined(words) + "'\n";
+               "; and not __fish_seen_subcommand_from " + joined(words) + "' -a '" + joined(words) +
+               "'\n";
     }
   }
   return lines;

@@ -77,7 +77,7 @@ const Descriptor* reply_among(const Entry& request, const Found& found, const De
 
 bool is_from_other_end(const Entry& request, const Found& found) {
   return request.connection == found.connection &&
-         (request.use == Use::kNone || found.use == Use::kNone || request.use != found.use);
+         (request.end == Use::kNone || found.use == Use::kNone || request.end != found.use);
 }
 
 Use other(Use use) {
@@ -116,23 +116,23 @@ Use Session::use_of_sender(const Found& found, const Descriptor* type) {
   return turned_.count(found.connection) > 0 ? other(found.use) : found.use;
 }
 
-Entry Session::add(const Found& as_found) {
+Entry Session::add(const Found& found) {
   Entry entry;
   entry.number = ++count_;
-  entry.connection = as_found.connection;
-  const Descriptor* type = message_named(as_found.name);
-  Found found = as_found;
-  found.use = use_of_sender(found, type);
+  entry.connection = found.connection;
+  entry.end = found.use;
+  const Descriptor* type = message_named(found.name);
+  const Use use = use_of_sender(found, type);
   const auto request = request_answered_by(found, type);
   const bool is_reply = request != open_.end();
   if (type == nullptr && is_reply) {
     type = reply_among(request->second, found, nullptr);
   }
   entry.is_guess = type == nullptr;
-  entry.types = entry.is_guess ? guess(found.bytes, found.use).front().types : Types{type};
+  entry.types = entry.is_guess ? guess(found.bytes, use).front().types : Types{type};
   type = entry.types.front();
   entry.request_id = request_id_in(found.bytes, *type);
-  entry.use = found.use != Use::kNone ? found.use : use_of(*type);
+  entry.use = use != Use::kNone ? use : use_of(*type);
   if (is_reply) {
     entry.answers = request->second.number;
     entry.use = entry.use != Use::kNone ? entry.use : other(request->second.use);

@@ -23,6 +23,7 @@ struct Entry {
   std::vector<const google::protobuf::Descriptor*> types;
   bool is_guess = false;  // of the bytes alone
   Use use = Use::kNone;   // whether the plug-in has sent or received it, as far as that is known
+  Use end = Use::kNone;   // the same as the ports have it, which may turn it round
   size_t connection = 0;
   std::optional<int64_t> request_id;
   std::optional<size_t> answers;  // the number of the request

@@ -34,8 +34,8 @@ agree_on() {
 # frame NAME HEX: the message in a frame of the example, as hex.
 frame() { printf '%02x%s%08x%s' ${#1} "$(printf %s "$1" | od -An -v -tx1 | tr -d ' \n')" $((${#2} / 2)) "$2"; }
 
-# capture FILE: makes a capture of packets of lines with a direction, the name of a message and its
-# text form, a second for each.
+# capture FILE [PORTS]: makes a capture of packets of lines with a direction, the name of a message and
+# its text form, a second for each.
 capture() {
   local second=0 way name text
   while read -r way name text; do
@@ -44,7 +44,7 @@ capture() {
     echo
   done >"$1.txt"
   TZ=UTC text2pcap -q -r '^(?<time>\S+) (?<dir>[<>]) (?<data>[0-9a-f]+)$' -t ISO \
-    -4 10.0.0.2,10.0.0.1 -T 9000,40000 "$1.txt" "$1"
+    -4 10.0.0.2,10.0.0.1 -T "${2:-9000,40000}" "$1.txt" "$1"
 }
 
 # holds SESSIONS: repeated, they are the same. Of what differs, the session's title is shown.
@@ -66,6 +66,23 @@ holds() { [ -s "$1" ] && diff -u -F '^### ' <(grep -E '^(###|[$]) ' -A 9999 "$1"
 end
   awk '/^```/ { on = $0 == "```console"; next } on' "$page" >page.txt
   holds page.txt
+}
+
+@test "which end is the plug-in is learnt from the messages, whatever the ports" {
+  capture chat.pcap 45000,40000 <<'end'
+> ChatRequest requestId: 7
+< ChatReply requestId: 7
+end
+  qel-wire session --frames=example chat.pcap 2>/dev/null | cut -c 37-57 >listed
+  diff listed - <<<$'sent      ChatRequest\nreceived  ChatReply, '
+}
+
+@test "a message does not answer one of its own end" {
+  capture chat.pcap <<'end'
+> ChatRequest requestId: 7
+> ChatReply requestId: 7
+end
+  qel-wire session --frames=example chat.pcap 2>/dev/null | grep 'no answer to 1, ChatRequest'
 }
 
 @test "its page has every option" {
@@ -181,7 +198,9 @@ completed() {
 }
 
 @test "fish completes commands, messages, options and values" {
-  for line in 'expl explain' 'explain ChatRep ChatReply' 'decode --part --partial' 'decode --frames=u32l --frames=u32le'; do
+  for line in 'expl explain' 'explain ChatRep ChatReply' 'decode --part --partial' 'decode --frames=u32l --frames=u32le' \
+    'decode --json ChatRep ChatReply' '--color=never decode ChatRep ChatReply' \
+    'diff --message=ChatRep --message=ChatReply'; do
     fish -c "source '$BUILT/completion.fish'; complete -C 'qel-wire ${line% *}'" | cut -f1 >completed.txt
     grep -Fx -- "${line##* }" completed.txt
   done
