@@ -121,6 +121,10 @@ end
   agree_on diff
 }
 
+@test "its page says of each form of hex whether it is read" {
+  agree_on hex
+}
+
 @test "it takes little memory" {
   agree_on memory
 }

@@ -214,6 +214,23 @@ def disagreements_on_frames():
             yield f"{kind} {name}"
 
 
+# ---- The page's table of hex
+
+def wrong_examples():
+    """Examples that are not read, or not refused, as their row says."""
+    page = (source / "docs" / "qel-wire.md").read_text(encoding="utf-8")
+    rows = re.findall(r"^\| (.+?) \| (.+) \| (read|refused)", page, re.M)
+    for form, examples, outcome in rows:
+        for quotes, example in re.findall(r"(`+)(.+?)\1", examples.replace("\\|", "|")):
+            done = subprocess.run(["qel-wire", "guess", "--hex"], input=example.encode(), check=False, stdout=subprocess.PIPE,
+                                  stderr=subprocess.PIPE)
+            is_refused = b"the input is no hex" in done.stderr
+            if is_refused != (outcome == "refused") and "…" not in examples:
+                yield f"{form}: {example}"
+    if len(rows) < 23:
+        yield "the table is not found"
+
+
 # ---- Memory
 
 def takes_little(arguments):
@@ -231,6 +248,8 @@ messages = schema.messages(source / "proto-lib")
 types = [message.DESCRIPTOR for message in messages]
 if check in ("where", "diff"):
     different = [answer for answer in question(where_agrees if check == "where" else diff_agrees) if answer is not True]
+elif check == "hex":
+    different = list(wrong_examples())
 elif check == "frames":
     different = list(disagreements_on_frames())
 elif check == "memory":
