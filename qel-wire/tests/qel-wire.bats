@@ -210,8 +210,21 @@ completed() {
   done
 }
 
-@test "zsh takes its completion" {
-  zsh -n "$BUILT/completion.zsh"
+# A zsh at a terminal is sent words and a tab, until what they become is there.
+@test "zsh completes commands, messages, options and values" {
+  cp "$BUILT/completion.zsh" _qel-wire
+  cat >type.zsh <<'end'
+zmodload zsh/zpty
+zpty shell TERM=xterm zsh -f -i
+zpty -w shell "PS1='> '; fpath=($PWD \$fpath); autoload -Uz compinit; compinit -u -D; bindkey '^I' complete-word"
+for words expected in "$@"; do
+  zpty -w -n shell "qel-wire $words"$'\t'
+  zpty -r shell out "*$expected*"
+  zpty -w -n shell $'\x15' # an empty line again
+done
+end
+  timeout 60 zsh -f type.zsh expl explain 'decode ChatRep' ChatReply 'decode --json ChatRep' ChatReply \
+    'decode --part' --partial 'decode --frames=u32l' u32le 'diff --message=ChatRep' ChatReply
 }
 
 @test "man shows its page without a complaint" {
