@@ -4,7 +4,6 @@
 #include <google/protobuf/io/tokenizer.h>
 #include <google/protobuf/io/zero_copy_stream_impl_lite.h>
 #include <google/protobuf/unknown_field_set.h>
-#include <strings.h>
 
 #include <charconv>
 #include <limits>
@@ -15,6 +14,7 @@
 #include "failure.h"
 #include "misread.h"
 #include "notation.h"
+#include "schema.h"
 #include "token.h"
 
 namespace qel_wire {
@@ -33,35 +33,9 @@ constexpr int kDeepest = 100;
 
 using Reason = std::string;
 
-// Of descriptors, the one of that name in any case of letters, or null.
-template <typename Descriptor, typename At>
-const Descriptor* one_named(const std::string& name, int count, At at) {
-  for (int i = 0; i < count; ++i) {
-    if (strcasecmp(at(i)->name().c_str(), name.c_str()) == 0) {
-      return at(i);
-    }
-  }
-  return nullptr;
-}
-
-template <typename At>
-std::vector<std::string> names_of(int count, At at) {
-  std::vector<std::string> names;
-  for (int i = 0; i < count; ++i) {
-    names.push_back(at(i)->name());
-  }
-  return names;
-}
-
-const FieldDescriptor* field_named(const Message& message, const std::string& name) {
-  const auto& type = *message.GetDescriptor();
-  return one_named<FieldDescriptor>(name, type.field_count(), [&](int i) { return type.field(i); });
-}
-
 std::string no_field(const Message& message, const std::string& name) {
   const auto& type = *message.GetDescriptor();
-  return type.name() + " has no field '" + name + "'" +
-         did_you_mean(name, names_of(type.field_count(), [&](int i) { return type.field(i); }));
+  return type.name() + " has no field '" + name + "'" + did_you_mean(name, field_names(type));
 }
 
 bool is_filled(const Message& message, const FieldDescriptor& field) {
@@ -150,11 +124,9 @@ Reason set_name(Message* message, const FieldDescriptor& field, const std::strin
     return wrong_kind(field);
   }
   const auto& type = *field.enum_type();
-  const auto at = [&](int i) { return type.value(i); };
-  const auto* member = one_named<EnumValueDescriptor>(name, type.value_count(), at);
+  const EnumValueDescriptor* member = member_named(type, name);
   if (member == nullptr) {
-    return type.name() + " has no '" + name + "'" +
-           did_you_mean(name, names_of(type.value_count(), at));
+    return type.name() + " has no '" + name + "'" + did_you_mean(name, member_names(type));
   }
   set_member(message, field, member->number());
   return "";
@@ -249,7 +221,7 @@ class TextParser : private google::protobuf::io::ErrorCollector {
     if (name.type != Tokenizer::TYPE_IDENTIFIER) {
       fail("the name or the number of a field is missing");
     }
-    const FieldDescriptor* field = field_named(*message, name.text);
+    const FieldDescriptor* field = field_named(*message->GetDescriptor(), name.text);
     if (field == nullptr) {
       fail(no_field(*message, name.text));
     }
@@ -456,7 +428,7 @@ class JsonParser : public nlohmann::json_sax<nlohmann::json> {
 
   bool key(std::string& name) override {
     Object& object = objects_.back();
-    object.field = field_named(*object.message, name);
+    object.field = field_named(*object.message->GetDescriptor(), name);
     if (object.field == nullptr) {
       return expect(no_field(*object.message, name));
     }

@@ -1,7 +1,5 @@
 #include "query.h"
 
-#include <strings.h>
-
 #include <algorithm>
 #include <charconv>
 #include <optional>
@@ -129,11 +127,8 @@ std::optional<int64_t> number_for(const FieldDescriptor& field, const std::strin
                              : std::nullopt;
   }
   if (field.enum_type() != nullptr) {
-    for (int i = 0; i < field.enum_type()->value_count(); ++i) {
-      const EnumValueDescriptor& member = *field.enum_type()->value(i);
-      if (strcasecmp(member.name().c_str(), text.c_str()) == 0) {
-        return member.number();
-      }
+    if (const EnumValueDescriptor* member = member_named(*field.enum_type(), text)) {
+      return member->number();
     }
   }
   return number_in(text);

@@ -15,22 +15,35 @@ namespace {
 
 using google::protobuf::Descriptor;
 using google::protobuf::EnumDescriptor;
+using google::protobuf::EnumValueDescriptor;
 using google::protobuf::FieldDescriptor;
 using google::protobuf::FileDescriptor;
 using google::protobuf::Message;
 using google::protobuf::MessageFactory;
 
-bool is_equal(const std::string& a, const std::string& b) {
-  return strcasecmp(a.c_str(), b.c_str()) == 0;
-}
-
-const EnumDescriptor* enumeration_named(const std::string& name) {
-  for (int i = 0; i < schema_file().enum_type_count(); ++i) {
-    if (is_equal(schema_file().enum_type(i)->name(), name)) {
-      return schema_file().enum_type(i);
+// Of so many descriptors the one of that name, in any case of letters, or null.
+template <typename At>
+auto one_named(const std::string& name, int count, At at) -> decltype(at(0)) {
+  for (int i = 0; i < count; ++i) {
+    if (strcasecmp(at(i)->name().c_str(), name.c_str()) == 0) {
+      return at(i);
     }
   }
   return nullptr;
+}
+
+template <typename At>
+std::vector<std::string> names_of(int count, At at) {
+  std::vector<std::string> names;
+  for (int i = 0; i < count; ++i) {
+    names.push_back(at(i)->name());
+  }
+  return names;
+}
+
+const EnumDescriptor* enumeration_named(const std::string& name) {
+  return one_named(name, schema_file().enum_type_count(),
+                   [](int i) { return schema_file().enum_type(i); });
 }
 
 // With all that it contains, but for what was shown before.
@@ -102,12 +115,17 @@ const FileDescriptor& schema_file() {
 }
 
 const Descriptor* message_named(const std::string& name) {
-  for (int i = 0; i < schema_file().message_type_count(); ++i) {
-    if (is_equal(schema_file().message_type(i)->name(), name)) {
-      return schema_file().message_type(i);
-    }
-  }
-  return nullptr;
+  return one_named(name, schema_file().message_type_count(),
+                   [](int i) { return schema_file().message_type(i); });
+}
+
+const FieldDescriptor* field_named(const Descriptor& type, const std::string& name) {
+  return one_named(name, type.field_count(), [&](int i) { return type.field(i); });
+}
+
+const EnumValueDescriptor* member_named(const EnumDescriptor& enumeration,
+                                        const std::string& name) {
+  return one_named(name, enumeration.value_count(), [&](int i) { return enumeration.value(i); });
 }
 
 std::unique_ptr<Message> new_message(const Descriptor& type) {
@@ -115,19 +133,21 @@ std::unique_ptr<Message> new_message(const Descriptor& type) {
 }
 
 std::vector<std::string> message_names() {
-  std::vector<std::string> names;
-  for (int i = 0; i < schema_file().message_type_count(); ++i) {
-    names.push_back(schema_file().message_type(i)->name());
-  }
-  return names;
+  return names_of(schema_file().message_type_count(),
+                  [](int i) { return schema_file().message_type(i); });
 }
 
 std::vector<std::string> enumeration_names() {
-  std::vector<std::string> names;
-  for (int i = 0; i < schema_file().enum_type_count(); ++i) {
-    names.push_back(schema_file().enum_type(i)->name());
-  }
-  return names;
+  return names_of(schema_file().enum_type_count(),
+                  [](int i) { return schema_file().enum_type(i); });
+}
+
+std::vector<std::string> field_names(const Descriptor& type) {
+  return names_of(type.field_count(), [&](int i) { return type.field(i); });
+}
+
+std::vector<std::string> member_names(const EnumDescriptor& enumeration) {
+  return names_of(enumeration.value_count(), [&](int i) { return enumeration.value(i); });
 }
 
 std::string schema_of(const std::string& name, const Colours& colours) {

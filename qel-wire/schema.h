@@ -16,6 +16,10 @@ const google::protobuf::FileDescriptor& schema_file();
 
 // In any case of letters; null if there is none.
 const google::protobuf::Descriptor* message_named(const std::string& name);
+const google::protobuf::FieldDescriptor* field_named(const google::protobuf::Descriptor& type,
+                                                     const std::string& name);
+const google::protobuf::EnumValueDescriptor* member_named(
+    const google::protobuf::EnumDescriptor& enumeration, const std::string& name);
 
 // An empty one.
 std::unique_ptr<google::protobuf::Message> new_message(const google::protobuf::Descriptor& type);
@@ -23,6 +27,8 @@ std::unique_ptr<google::protobuf::Message> new_message(const google::protobuf::D
 // The names of all messages, and then of all enumerations, in the order of the schema.
 std::vector<std::string> message_names();
 std::vector<std::string> enumeration_names();
+std::vector<std::string> field_names(const google::protobuf::Descriptor& type);
+std::vector<std::string> member_names(const google::protobuf::EnumDescriptor& enumeration);
 
 // The definition of the message or the enumeration, and of all that a message contains; empty if
 // there is none of that name, in any case of letters.
