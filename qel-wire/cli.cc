@@ -177,14 +177,6 @@ std::unique_ptr<CLI::App> make_table(Call* call) {
   return app;
 }
 
-std::vector<std::string> names_of(const std::vector<CLI::App*>& commands) {
-  std::vector<std::string> names;
-  for (const CLI::App* command : commands) {
-    names.push_back(command->get_name());
-  }
-  return names;
-}
-
 std::vector<std::string> option_names_of(const CLI::App& command) {
   std::vector<std::string> names;
   for (const CLI::Option* option : command.get_options()) {
@@ -198,6 +190,14 @@ std::vector<std::string> option_names_of(const CLI::App& command) {
 [[noreturn]] void refuse(const std::string& reason, const std::string& command) {
   throw Failure{kWrongCall,
                 reason + " ('qel-wire " + (command.empty() ? "" : command + " ") + "--help')"};
+}
+
+[[noreturn]] void refuse_command(const CLI::App& app, const std::string& word) {
+  std::vector<std::string> names;
+  for (const CLI::App* command : app.get_subcommands(nullptr)) {  // all of them
+    names.push_back(command->get_name());
+  }
+  refuse("there is no command " + named(word) + did_you_mean(word, names), "");
 }
 
 // What no option and no argument of the command is.
@@ -220,7 +220,7 @@ void refuse_rest(const CLI::App& app, const CLI::App& command) {
   }
 }
 
-void check_command(CLI::App& app) {
+void check_command(const CLI::App& app) {
   if (!app.get_subcommands().empty()) {
     refuse_rest(app, *app.get_subcommands().front());
     return;
@@ -229,8 +229,7 @@ void check_command(CLI::App& app) {
   const auto word = std::find_if(rest.begin(), rest.end(),
                                  [](const std::string& argument) { return argument[0] != '-'; });
   if (word != rest.end()) {
-    const auto names = names_of(app.get_subcommands([](CLI::App*) { return true; }));
-    refuse("there is no command " + named(*word) + did_you_mean(*word, names), "");
+    refuse_command(app, *word);
   }
   if (!rest.empty()) {
     const std::string name = rest.front().substr(0, rest.front().find('='));
@@ -279,10 +278,7 @@ Call read_call(int argc, char** argv) {
     std::rotate(arguments.begin(), arguments.begin() + 1, arguments.end());
     arguments.back() = "--help";
     if (arguments.size() > 1 && !is_command(app.get(), arguments.front())) {
-      const auto all = app->get_subcommands([](CLI::App*) { return true; });
-      refuse("there is no command " + named(arguments.front()) +
-                 did_you_mean(arguments.front(), names_of(all)),
-             "");
+      refuse_command(*app, arguments.front());
     }
   }
   const auto chosen = [&] {

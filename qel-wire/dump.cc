@@ -84,6 +84,9 @@ class Dump {
       throw Stop{first_.offset.data(),
                  "an offset, or bytes? a colon behind it, or single blanks would tell"};
     }
+    if (is_order_open_) {
+      throw Stop{first_.groups.data(), kOrder};
+    }
     if (is_repeated_ || (base_ != 0 && size_ > 1 && !is_over_ && bytes_.back() == '\0')) {
       throw Stop{end, "the last line is missing, whose offset tells how many bytes are above"};
     }
@@ -140,6 +143,9 @@ class Dump {
       throw Stop{line.data(), "no offset before the bytes, as in the lines above"};
     }
     take_offset(row);
+    if (base_ == 0 && size_ > 1 && row.has_colon && row.gap > 2) {  // as "xxd -e" has the last one
+      throw Stop{row.groups.data(), kOrder};
+    }
     is_over_ = row.groups.empty();
     if (!is_over_) {
       row_ = bytes_.size();
@@ -243,18 +249,23 @@ class Dump {
 
   // The column beside the bytes may differ from them, if it hides some or is not in ASCII. But it
   // must not look like bytes, nor contradict their order.
-  void check_characters(std::string_view column) const {
+  void check_characters(std::string_view column) {
     const bool is_framed = column.size() > 1 && is_in("|>", column.front());
     const std::string beside = visible(is_framed ? column.substr(1, column.size() - 2) : column);
     const std::string shown = visible(last_row());
-    if (beside == shown) {
-      return;
-    }
     std::string reversed(last_row());
     for (size_t i = 0; i + size_ <= reversed.size(); i += size_) {
       std::reverse(reversed.data() + i, reversed.data() + i + size_);
     }
-    if (beside == visible(reversed)) {
+    const bool may_be_reversed = beside == visible(reversed);
+    if (beside == shown) {
+      // Both "xxd -g4" and "xxd -e" print such groups.
+      const bool may_be_open = base_ == 0 && (size_ == 4 || size_ == 8) && !is_order_shown_;
+      is_order_shown_ = is_order_shown_ || !may_be_reversed;
+      is_order_open_ = may_be_open && may_be_reversed;
+      return;
+    }
+    if (may_be_reversed) {
       throw Stop{column.data(), "characters that show another order of the bytes in a group"};
     }
     if (!is_framed && (begins_with_pairs(column) || 4 * beside.size() <= shown.size())) {
@@ -269,6 +280,8 @@ class Dump {
   int base_ = 0;                   // of groups that are numbers; 0: bytes in their order
   std::vector<int> bases_ = {16};  // which the offsets may have
   size_t row_ = 0;                 // the last row's first byte
+  bool is_order_shown_ = false;    // by the characters beside a row
+  bool is_order_open_ = false;     // they might show another one as well
   bool is_repeated_ = false;       // the last row, by a line "*"
   bool is_over_ = false;           // by an offset alone
   std::string bytes_;

@@ -52,7 +52,7 @@ Reason wrong_kind(const FieldDescriptor& field) {
   const char* what = field.cpp_type() == FieldDescriptor::CPPTYPE_MESSAGE ? "a message"
                      : field.cpp_type() == FieldDescriptor::CPPTYPE_ENUM  ? "an enumeration"
                                                                           : field.cpp_type_name();
-  return field.name() + " is " + what;
+  return std::string("the field is ") + what;
 }
 
 void set_member(Message* message, const FieldDescriptor& field, int number) {
@@ -80,7 +80,7 @@ Reason set_number(Message* message, const FieldDescriptor& field, int64_t number
     case FieldDescriptor::CPPTYPE_INT32:
     case FieldDescriptor::CPPTYPE_ENUM:
       if (narrow != number) {
-        return "the number of " + field.name() + " has more than 32 bits";
+        return "the number has more than 32 bits";
       }
       break;
     default:
@@ -105,18 +105,20 @@ Reason set_bool(Message* message, const FieldDescriptor& field, bool value) {
   return "";
 }
 
+Reason hidden_in(const std::string& text) {
+  return text != kNotShown ? ""
+                           : "the field has " + std::string(kNotShown) +
+                                 " for what was hidden: decode the bytes with --show-token";
+}
+
 Reason set_text(Message* message, const FieldDescriptor& field, const std::string& text) {
   if (field.cpp_type() != FieldDescriptor::CPPTYPE_STRING) {
     return wrong_kind(field);
   }
-  if (text == kNotShown) {
-    return field.name() + " has " + kNotShown +
-           " for what was hidden: decode the bytes with --show-token";
-  }
   const Reflection& fields = *message->GetReflection();
   field.is_repeated() ? fields.AddString(message, &field, text)
                       : fields.SetString(message, &field, text);
-  return "";
+  return hidden_in(text);
 }
 
 Reason set_name(Message* message, const FieldDescriptor& field, const std::string& name) {
@@ -226,7 +228,7 @@ class TextParser : private google::protobuf::io::ErrorCollector {
       fail(no_field(*message, name.text));
     }
     if (is_filled(*message, *field)) {
-      fail(field->name() + " is there twice");
+      fail("the field is there twice");
     }
     advance();
     const bool has_colon = take(":");
@@ -277,7 +279,7 @@ class TextParser : private google::protobuf::io::ErrorCollector {
     } else if (number == 0 || number == 1) {
       expect(where, set_bool(message, field, number == 1));
     } else {
-      fail(where, field.name() + " is true or false");
+      fail(where, "the field takes true or false");
     }
   }
 
@@ -333,10 +335,7 @@ class TextParser : private google::protobuf::io::ErrorCollector {
     if (is_at(Tokenizer::TYPE_STRING)) {
       const Place where = place();
       const std::string bytes = text();
-      if (bytes == kNotShown) {
-        fail(where, "a field has " + std::string(kNotShown) +
-                        " for what was hidden: decode the bytes with --show-token");
-      }
+      expect(where, hidden_in(bytes));
       fields->AddLengthDelimited(field)->assign(bytes);
       return;
     }
@@ -432,14 +431,14 @@ class JsonParser : public nlohmann::json_sax<nlohmann::json> {
     if (object.field == nullptr) {
       return expect(no_field(*object.message, name));
     }
-    return expect(is_filled(*object.message, *object.field) ? name + " is there twice" : "");
+    return expect(is_filled(*object.message, *object.field) ? "the field is there twice" : "");
   }
 
   bool start_array(std::size_t /*size*/) override {
     expect_field();
     Object& object = objects_.back();
     if (!object.field->is_repeated() || object.is_in_list) {
-      return expect(object.field->name() + " is no list here");
+      return expect("the field is no list here");
     }
     object.is_in_list = true;
     return true;
@@ -475,7 +474,7 @@ class JsonParser : public nlohmann::json_sax<nlohmann::json> {
     expect_field();
     const Object& object = objects_.back();
     if (object.field->is_repeated() && !object.is_in_list) {
-      expect(object.field->name() + " is a list");
+      expect("the field is a list");
     }
     return object.message;
   }

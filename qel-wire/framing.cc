@@ -104,8 +104,9 @@ std::string problem_of(const Head& head, size_t left) {
                    std::to_string(there) + (there == 1 ? " is there" : " are there");
 }
 
-std::string cut_frames(std::string_view stream, const std::string& frames, const TakeFrame& take) {
-  for (size_t at = 0; at < stream.size();) {
+std::string cut_frames(std::string_view stream, const std::string& frames, const TakeFrame& take,
+                       size_t begin) {
+  for (size_t at = begin; at < stream.size();) {
     const Head head = head_of(stream.substr(at), frames);
     const std::string problem = problem_of(head, stream.size() - at);
     if (!problem.empty()) {
@@ -138,9 +139,19 @@ void cut_run(std::string_view stream, const TakeFrame& take) {
 
 }  // namespace
 
-std::string cut(std::string_view stream, const std::string& frames, const TakeFrame& take) {
+size_t first_frame(std::string_view stream, const std::string& frames) {
+  size_t at = 0;
+  while (frames == "example" && at < stream.size() &&
+         schema_file().FindMessageTypeByName(example(stream.substr(at)).name) == nullptr) {
+    ++at;
+  }
+  return at;
+}
+
+std::string cut(std::string_view stream, const std::string& frames, const TakeFrame& take,
+                size_t begin) {
   if (frames != "split") {
-    return cut_frames(stream, frames, take);
+    return cut_frames(stream, frames, take, begin);
   }
   cut_run(stream, take);
   return "";

@@ -21,10 +21,16 @@ struct Frame {
 
 using TakeFrame = std::function<void(const Frame& frame)>;
 
-// Lets take have each message. Split takes messages that follow each other with nothing between
-// them, and cuts before a field with a lower number than the one before it, and before a requestId
-// that comes again. Returns why there is no further frame although there are bytes, or nothing.
-std::string cut(std::string_view stream, const std::string& frames, const TakeFrame& take);
+// Where the first frame begins in a stream that may begin within a message, if its framing has the
+// names of messages, by which frames are found; the stream's size if there is none.
+size_t first_frame(std::string_view stream, const std::string& frames);
+
+// Lets take have each message, from the offset on. Split takes messages that follow each other with
+// nothing between them, and cuts before a field with a lower number than the one before it, and
+// before a requestId that comes again. Returns why there is no further frame although there are
+// bytes, or nothing.
+std::string cut(std::string_view stream, const std::string& frames, const TakeFrame& take,
+                size_t begin = 0);
 
 }  // namespace qel_wire
 

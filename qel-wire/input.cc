@@ -141,7 +141,11 @@ class Messages {
       all->push_back({&stream, frame, stream.segment_at(last).arrival});
     };
     if (!call_.frames.empty()) {
-      blame(place, cut(stream.bytes, call_.frames, add_frame));
+      const size_t begin = stream.is_cut ? first_frame(stream.bytes, call_.frames) : 0;
+      if (begin > 0) {
+        complain(place + "without " + counted(begin, "byte") + " before the first frame");
+      }
+      blame(place, cut(stream.bytes, call_.frames, add_frame, begin));
       return;
     }
     for (size_t i = 0; i < stream.segments.size(); ++i) {

@@ -170,12 +170,19 @@ BytesForm bytes_form_of(const Call& call) {
   return call.bytes.empty() ? BytesForm::kUsual : BytesForm::kHex;
 }
 
-int decode(const Call& call) {
-  qel_wire::DecodeOptions options;
+// What decode and explain have in common.
+template <typename Options>
+Options options_of(const Call& call) {
+  Options options;
   options.colours = colours_of(call);
   options.bytes_form = bytes_form_of(call);
   options.as_json = call.json;
   options.show_token = call.show_token;
+  return options;
+}
+
+int decode(const Call& call) {
+  auto options = options_of<qel_wire::DecodeOptions>(call);
   options.is_partial = call.partial;
   return for_each_known(call, [&](const qel_wire::Found& found, const Descriptor& type) {
     const auto decoded = qel_wire::decode(found.bytes, type, options, &std::cout);
@@ -226,11 +233,7 @@ int encode(const Call& call) {
 }
 
 int explain(const Call& call) {
-  qel_wire::ExplainOptions options;
-  options.colours = colours_of(call);
-  options.bytes_form = bytes_form_of(call);
-  options.as_json = call.json;
-  options.show_token = call.show_token;
+  auto options = options_of<qel_wire::ExplainOptions>(call);
   options.show_all = call.all;
   return for_each_known(call, [&](const qel_wire::Found& found, const Descriptor& type) {
     options.message = found.number;

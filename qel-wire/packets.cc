@@ -212,7 +212,6 @@ using Ends = std::pair<std::string, std::string>;  // the lesser first
 
 struct Connection {
   const Ends* ends;
-  bool is_tcp;
   size_t client;  // which of the ends
   bool is_reset = false;
   std::array<Sent, 2> sent = {};  // by which end
@@ -340,7 +339,6 @@ class Connections {
         empty.from = side == 0 ? connection.ends->first : connection.ends->second;
         empty.to = side == 0 ? connection.ends->second : connection.ends->first;
         empty.connection = number;
-        empty.is_tcp = connection.is_tcp;
         empty.from_client = side == connection.client;
         empty.is_reset = connection.is_reset;
         append_streams(empty, &connection.sent.at(side), &streams);
@@ -357,7 +355,7 @@ class Connections {
         latest_.try_emplace({is_tcp, std::minmax(packet.from, packet.to)}, all_.size());
     if (is_new || (is_tcp && opens_another(*packet.tcp, side, all_[place->second]))) {
       place->second = all_.size();
-      all_.push_back({&place->first.second, is_tcp, packet.from_higher ? side : 1 - side});
+      all_.push_back({&place->first.second, packet.from_higher ? side : 1 - side});
     }
     return all_[place->second];
   }

@@ -29,10 +29,9 @@ struct Segment {
 struct Stream {
   std::string from, to;   // 192.0.2.1:9000, [2001:db8::1]:9000
   size_t connection = 0;  // from 1; both directions have the same
-  bool is_tcp = false;
   // Whether the sender opened the connection, or has the higher port if the capture does not tell.
   bool from_client = false;
-  bool is_cut = false;  // whether bytes before it are missing; of TCP it may begin within a message
+  bool is_cut = false;    // whether bytes before it are missing: it may begin within a message
   bool is_reset = false;  // whether one of the ends broke the connection off
   std::string bytes;      // at least one
   std::vector<Segment> segments;

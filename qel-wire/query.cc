@@ -1,5 +1,7 @@
 #include "query.h"
 
+#include <strings.h>
+
 #include <algorithm>
 #include <charconv>
 #include <optional>
@@ -79,12 +81,14 @@ std::vector<const FieldDescriptor*> fields_of(const Descriptor* type, const std:
     fields.clear();
     std::vector<std::string> others;
     for (const Descriptor* each : types) {
-      for (int i = 0; each != nullptr && i < each->field_count(); ++i) {
-        others.push_back(each->field(i)->name());
-        if (each->field(i)->name() == name) {
-          fields.push_back(each->field(i));
-        }
+      if (each == nullptr) {
+        continue;
       }
+      if (const FieldDescriptor* field = field_named(*each, name)) {
+        fields.push_back(field);
+      }
+      const std::vector<std::string> names = field_names(*each);
+      others.insert(others.end(), names.begin(), names.end());
     }
     if (fields.empty()) {
       throw Failure{kWrongCall,
@@ -222,7 +226,7 @@ class Condition::Search : public Paths {
 
  private:
   void field(const std::string& path, const std::string& /*place*/, const Piece& piece) override {
-    found_ = found_ || (path == condition_.path_ && takes(piece));
+    found_ = found_ || (strcasecmp(path.c_str(), condition_.path_.c_str()) == 0 && takes(piece));
   }
 
   bool takes(const Piece& piece) const {

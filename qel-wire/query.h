@@ -22,9 +22,9 @@ namespace qel_wire {
 //   path=value        a value of it is that; also != < <= > >=
 //   path~text         a text of it has that within
 //
-// Of repeated fields any value may do. Numbers are compared as numbers, texts by their bytes,
-// enumerations by name or number, what is of type bytes in base64, as in JSON. An unknown field's
-// path is its number. What is hidden is there, and has no value.
+// Names are in any case of letters. Of repeated fields any value may do. Numbers are compared as
+// numbers, texts by their bytes, enumerations by name or number, what is of type bytes in base64,
+// as in JSON. An unknown field's path is its number. What is hidden is there, and has no value.
 class Condition {
  public:
   // Throws Failure if there is no such path in the message, or in any message if type is null, or

@@ -454,6 +454,12 @@ TEST(Hex, CharactersThatHideSome_AreIgnored) {
   EXPECT_EQ(outcome("00000000: 7365 6372 6574  ******\n"), "736563726574");
 }
 
+TEST(Hex, OrderThatARowShows_HoldsForAll) {
+  EXPECT_EQ(
+      outcome("00000000: 01070807  ....\n00000004: 61070807  a...\n00000008: 01070807  ....\n"),
+      "010708076107080701070807");
+}
+
 TEST(Hex, BytesBehindAWiderGap_AreRefused) {
   EXPECT_EQ(outcome("00000000: 0807  602a\n"),
             "1:17: neither bytes nor the characters of those before");
@@ -485,6 +491,10 @@ constexpr char kNoBytes[] = "no bytes in hex or octal: use od -tx1 or hexdump -C
 
 const std::vector<Form> kMistakes = {
     {"words_of_od_without_offsets", " 0758 2a60\n", std::string("1:1: ") + kOrder},
+    {"groups_of_four_that_no_character_orders", "00000000: 01070807  ....\n",
+     std::string("1:11: ") + kOrder},
+    {"group_to_the_right_as_xxd_e_has_the_last_one", "00000000:     6107  .a\n",
+     std::string("1:15: ") + kOrder},
     {"decimal_numbers_without_brackets", "88, 16, 96", std::string("1:1: ") + kDecimal},
     {"digit_too_few", "08 07\n60 2\n", std::string("2:4: ") + kOdd},
     {"digit_too_few_in_a_long_line", "0807602a6a0\n", std::string("1:1: ") + kOdd},

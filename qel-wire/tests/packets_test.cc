@@ -189,7 +189,6 @@ TEST(Tcp, InOrder_IsAStreamOfEachEnd) {
   EXPECT_EQ(capture.streams[0].to, "192.0.2.2:9000");
   EXPECT_EQ(capture.streams[1].from, "192.0.2.2:9000");
   EXPECT_EQ(capture.streams[1].to, "192.0.2.1:40000");
-  EXPECT_TRUE(capture.streams[0].is_tcp);
   EXPECT_FALSE(capture.streams[0].is_cut);
   EXPECT_FALSE(capture.streams[0].is_reset);
 }
@@ -368,7 +367,6 @@ TEST(Udp, Datagrams_AreASegmentEach) {
       datagram(kClient, kServer, ""), datagram(kClient, kServer, "hello")};
   const qel_wire::Capture capture = read_capture(pcap(packets));
   EXPECT_EQ(listed(capture), "1 > hellohello\n1 < good\n");
-  EXPECT_FALSE(capture.streams[0].is_tcp);
   EXPECT_EQ(capture.streams[0].from, "192.0.2.1:40000");
   EXPECT_EQ(arrivals(packets), "0@1 5@4 0@2 ");
 }

@@ -34,17 +34,19 @@ agree_on() {
 # frame NAME HEX: the message in a frame of the example, as hex.
 frame() { printf '%02x%s%08x%s' ${#1} "$(printf %s "$1" | od -An -v -tx1 | tr -d ' \n')" $((${#2} / 2)) "$2"; }
 
-# capture FILE [PORTS]: makes a capture of packets of lines with a direction, the name of a message and
-# its text form, a second for each.
-capture() {
-  local second=0 way name text
-  while read -r way name text; do
-    printf '2026-11-23T10:00:%02dZ %s ' $((second++)) "$way"
-    frame "$name" "$(qel-wire encode "$name" --hex <<<"$text")"
-    echo
-  done >"$1.txt"
+# packets FILE [PORTS]: makes a capture of lines with a direction and bytes, a second for each.
+packets() {
+  awk '{ printf "2026-11-23T10:00:%02dZ %s\n", NR - 1, $0 }' >"$1.txt"
   TZ=UTC text2pcap -q -r '^(?<time>\S+) (?<dir>[<>]) (?<data>[0-9a-f]+)$' -t ISO \
     -4 10.0.0.2,10.0.0.1 -T "${2:-9000,40000}" "$1.txt" "$1"
+}
+
+# capture FILE [PORTS]: the same of lines with a direction, the name of a message and its text form.
+capture() {
+  local way name text
+  while read -r way name text; do
+    printf '%s %s\n' "$way" "$(frame "$name" "$(qel-wire encode "$name" --hex <<<"$text")")"
+  done | packets "$@"
 }
 
 # holds SESSIONS: repeated, they are the same. Of what differs, the session's title is shown.
@@ -75,6 +77,24 @@ end
 end
   qel-wire session --frames=example chat.pcap 2>/dev/null | cut -c 37-57 >listed
   diff listed - <<<$'sent      ChatRequest\nreceived  ChatReply, '
+}
+
+@test "where a stream may begin within a message, the first frame is looked for" {
+  printf '> %s\n' 0a436c69 "$(frame ClientEcho 0807)" | packets chat.pcap
+  run -0 --separate-stderr qel-wire decode auto --frames=example chat.pcap
+  # shellcheck disable=SC2154
+  [[ $stderr == *', without 4 bytes before the first frame' ]]
+  [ "$output" = "# message 1: 2026-11-23 10:00:01.000 UTC, 10.0.0.1:40000 -> 10.0.0.2:9000, offset 19, 2 bytes, ClientEcho
+requestId: 7" ]
+}
+
+@test "a connection that was reset is noted" {
+  printf '> %s\n' "$(frame ClientEcho 0807)" 00 | packets chat.pcapng
+  editcap -F pcap chat.pcapng chat.pcap
+  # The flags of the last packet, which has 60 bytes: behind 14 of Ethernet, 20 of IP and 13 of TCP.
+  printf '\x04' | dd of=chat.pcap bs=1 conv=notrunc seek=$(($(stat -c %s chat.pcap) - 60 + 47))
+  run -0 --separate-stderr qel-wire decode ClientEcho --frames=example chat.pcap
+  [[ $stderr == *', of a connection that was reset' ]]
 }
 
 @test "a message does not answer one of its own end" {
