@@ -16,8 +16,7 @@ check, source = sys.argv[1], pathlib.Path(sys.argv[2])
 sys.path.insert(0, str(source / "tests" / "support"))
 import schema  # pylint: disable=wrong-import-position
 
-# Unknown fields of every kind, a number outside its enumeration where there is one, a group.
-UNKNOWN = bytes.fromhex("10ff01 c33e0801c43e 7d01020304 8101 0102030405060708 c20603616263")
+CHANCE = random.Random(20261123)
 
 
 def run(*command, data=b"", status=0):
@@ -53,14 +52,48 @@ def agrees(message):
         as_json = json_format.MessageToJson(message).encode()
         return qel_wire("encode", name, data=text) == data == qel_wire("encode", name, data=as_json)
     if check == "back":
-        read = type(message).FromString(data + UNKNOWN)
-        text = qel_wire("decode", "--show-token", name, data=data + UNKNOWN)
-        return qel_wire("encode", name, data=text) == read.SerializeToString()
+        return all(comes_back(type(message), written(message.DESCRIPTOR)) for _ in range(4))
     lines = [line.split("doubtful ")[1].split("broken ")[-1].strip().split(", ")
              for line in qel_wire("guess", "--all", data=data).decode().splitlines()]
     first = next(names for names in lines if is_record(message.DESCRIPTOR) in map(is_record, map(type_of, names)))
     alike = {other.name for other in types if wire_types(other) == wire_types(message.DESCRIPTOR)}
     return name in first and set(first) <= alike and sum(map(len, lines)) == len(types)
+
+
+# ---- There and back
+
+# A group, 4 and 8 bytes, a text, a varint, as unknown fields.
+UNKNOWN = [bytes.fromhex(each) for each in ("c33e0801c43e", "7d01020304", "810101ff030405060708", "c20603616263", "b80c11")]
+
+
+def written(descriptor, depth=0):
+    """Bytes of the message with fields in any order, again and again, and unknown ones."""
+    return b"".join(written_field(CHANCE.choice(descriptor.fields), depth) if CHANCE.random() < 0.8
+                    else CHANCE.choice(UNKNOWN) for _ in range(CHANCE.randrange(12)))
+
+
+def written_field(field, depth):
+    if field.message_type:
+        value = written(field.message_type, depth + 1) if depth < 3 else b""
+    elif field.type == field.TYPE_STRING:
+        value = "".join(CHANCE.choices('a"\'\\\n\0\x7f\x85é안😀', k=CHANCE.randrange(6))).encode()
+    elif field.type == field.TYPE_BYTES:
+        value = CHANCE.randbytes(CHANCE.randrange(6))
+    else:
+        most = {field.TYPE_BOOL: 1, field.TYPE_ENUM: 2**31 - 1}.get(field.type, 2**64 - 1)
+        return varint(field.number << 3) + varint(CHANCE.randrange(1 << CHANCE.randrange(65)) & most)
+    return varint(field.number << 3 | 2) + varint(len(value)) + value
+
+
+def comes_back(kind, data):
+    """Whether the text form of the bytes, and their JSON form without what it has no place for, become
+    what the class makes of them."""
+    read, name = kind.FromString(data), kind.DESCRIPTOR.name
+    text = qel_wire("decode", "--show-token", name, data=data)
+    is_same = qel_wire("encode", name, data=text) == read.SerializeToString()
+    read.DiscardUnknownFields()
+    as_json = qel_wire("decode", "--show-token", "--json", name, data=data)
+    return is_same and qel_wire("encode", name, data=as_json) == read.SerializeToString()
 
 
 def type_of(name):
@@ -128,41 +161,41 @@ def is_text(name, path):
     return field.type in (field.TYPE_STRING, field.TYPE_BYTES)
 
 
-def some_condition(chance, name, forms):
+def some_condition(name, forms):
     """A random condition on the messages, for qel-wire and for jq."""
-    path, value = chance.choice([(path, value) for form in forms for path, value in leaves(form)
+    path, value = CHANCE.choice([(path, value) for form in forms for path, value in leaves(form)
                                  if "\0" not in str(value)])
     values = [each for form in forms for at, each in leaves(form) if at == path]
     # jq has no whole numbers beyond 53 bits.
     is_small = all(is_number(each) and abs(int(each)) < 2**53 for each in values)
-    sign = chance.choice(["", "!", "=", "!="] + ["<", "<=", ">", ">="] * is_small + ["~"] * is_text(name, path))
+    sign = CHANCE.choice(["", "!", "=", "!="] + ["<", "<=", ">", ">="] * is_small + ["~"] * is_text(name, path))
     if sign in ("", "!"):
         return sign + path, f"any({jq_path(path)}; true)" + " | not" * (sign == "!")
     if sign == "~":
-        part = value[:chance.randrange(len(value) + 1)]
+        part = value[:CHANCE.randrange(len(value) + 1)]
         return f"{path}~{part}", f"any({jq_path(path)}; contains({json.dumps(part)}))"
     number = "tonumber" if sign in ("<", "<=", ">", ">=") else "."
     compared = f"{number} {'==' if sign == '=' else sign} ({json.dumps(value)} | {number})"
     return path + sign + quoted(value), f"any({jq_path(path)}; {compared})"
 
 
-def where_agrees(chance, name, data):
+def where_agrees(name, data):
     """One or two conditions."""
     with tempfile.NamedTemporaryFile() as file:
         file.write(b"".join(len(each).to_bytes(4, "big") + each for each in data))
         file.flush()
         decode = ["decode", name, "--show-token", "--json", "--frames=u32"]
         forms = documents(qel_wire(*decode, file.name))
-        conditions, tests = zip(*(some_condition(chance, name, forms) for _ in range(chance.randrange(1, 3))))
+        conditions, tests = zip(*(some_condition(name, forms) for _ in range(CHANCE.randrange(1, 3))))
         ours = qel_wire(*decode, *(f"--where={condition}" for condition in conditions), file.name)
     chosen = " and ".join(f"({test})" for test in tests)
     theirs = run("jq", "-c", f"select({chosen})", data="\n".join(map(json.dumps, forms)).encode())
     return documents(ours) == documents(theirs) or conditions
 
 
-def diff_agrees(chance, name, data):
+def diff_agrees(name, data):
     """The places at which two random messages differ, by qel-wire and by jq."""
-    pair = [chance.choice(data), chance.choice(data)]
+    pair = [CHANCE.choice(data), CHANCE.choice(data)]
     forms = [qel_wire("decode", name, "--show-token", "--json", data=each) for each in pair]
     first, second = ({path: value for path, value in json.loads(run("jq", "-c", LEAVES, data=form))} for form in forms)
     different = {path for path in {**first, **second} if first.get(path) != second.get(path)}
@@ -177,10 +210,9 @@ def diff_agrees(chance, name, data):
 
 
 def question(kind):
-    chance = random.Random(20261123)
     found = sorted(captures().items())
     for _ in range(100):
-        yield kind(chance, *chance.choice(found))
+        yield kind(*CHANCE.choice(found))
 
 
 # ---- Many messages
@@ -202,12 +234,11 @@ FRAMES = {
 
 def disagreements_on_frames():
     """Ten thousand messages of each kind in one file, and what each of them is alone."""
-    chance = random.Random(20261123)
     found = sorted(captures().items())
     for kind, head in FRAMES.items():
-        name, data = chance.choice(found)
+        name, data = CHANCE.choice(found)
         alone = {each: qel_wire("decode", name, data=each) for each in data}
-        many = chance.choices(data, k=10000)
+        many = CHANCE.choices(data, k=10000)
         printed = qel_wire("decode", name, f"--frames={kind}", data=b"".join(head(name, each) + each for each in many))
         messages_alone = re.split(rb"# message [0-9]+: .*\n", printed)
         if messages_alone != [b""] + [alone[each] for each in many]:
