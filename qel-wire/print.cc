@@ -2,6 +2,7 @@
 
 #include <cstdio>
 #include <nlohmann/json.hpp>
+#include <sstream>
 #include <vector>
 
 #include "merged.h"
@@ -36,6 +37,17 @@ std::string known_number(const Piece& piece) {
   }
 }
 
+std::string number_in_text(const Piece& piece) {
+  switch (piece.kind) {
+    case Piece::kFixed32:
+      return in_hex(piece.value, 8);
+    case Piece::kFixed64:
+      return in_hex(piece.value, 16);
+    default:
+      return piece.is_known ? known_number(piece) : std::to_string(piece.value);
+  }
+}
+
 class TextPrinter : public Visitor {
  public:
   TextPrinter(BytesForm form, const Colours& colours, std::ostream* out)
@@ -53,7 +65,9 @@ class TextPrinter : public Visitor {
       out_ << " {\n";
       return;
     }
-    out_ << ": " << colours_.value << value_in_text(piece, form_) << colours_.end;
+    out_ << ": " << colours_.value;
+    write_in_text(piece, form_, &out_);
+    out_ << colours_.end;
     const std::string time = time_of(piece);
     if (!time.empty()) {
       out_ << "  " << colours_.quiet << "# " << time << colours_.end;
@@ -168,22 +182,25 @@ class JsonPrinter : public Visitor {
 
 }  // namespace
 
-std::string value_in_text(const Piece& piece, BytesForm form) {
-  switch (piece.kind) {
-    case Piece::kVarint:
-      return piece.is_known ? known_number(piece) : std::to_string(piece.value);
-    case Piece::kFixed32:
-      return in_hex(piece.value, 8);
-    case Piece::kFixed64:
-      return in_hex(piece.value, 16);
-    default:
-      break;
+void write_in_text(const Piece& piece, BytesForm form, std::ostream* out) {
+  if (piece.kind != Piece::kBytes) {
+    *out << number_in_text(piece);
+    return;
   }
   // Not taken apart: a text that is no message looks like one often enough.
   const bool is_bytes = piece.is_known && piece.field->type() == FieldDescriptor::TYPE_BYTES;
   const bool in_hex_form =
       form == BytesForm::kHex && !piece.is_hidden && (is_bytes || !is_utf8(piece.bytes));
-  return in_hex_form ? in_hex_escapes(piece.bytes) : in_quotes(piece.bytes);
+  in_hex_form ? write_hex_escapes(piece.bytes, out) : write_in_quotes(piece.bytes, out);
+}
+
+std::string value_in_text(const Piece& piece, BytesForm form) {
+  if (piece.kind != Piece::kBytes) {  // far faster
+    return number_in_text(piece);
+  }
+  std::ostringstream text;
+  write_in_text(piece, form, &text);
+  return text.str();
 }
 
 std::string value_in_json(const Piece& piece, BytesForm form) {

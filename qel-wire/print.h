@@ -35,6 +35,7 @@ NotInJson print_json(std::string_view bytes, const google::protobuf::Descriptor&
                      std::ostream* out);
 
 // A number or a text as the text form has it.
+void write_in_text(const Piece& piece, BytesForm form, std::ostream* out);
 std::string value_in_text(const Piece& piece, BytesForm form);
 // The same as JSON has it: a known field's value.
 std::string value_in_json(const Piece& piece, BytesForm form);

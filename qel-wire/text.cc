@@ -74,6 +74,15 @@ void append_readable(std::string_view* text, std::string* to) {
   }
 }
 
+// Escapes may be four times as long as their text, so that all of them would take much memory.
+void write_if_long(std::string* part, std::ostream* out) {
+  constexpr size_t kLong = 4096;
+  if (part->size() > kLong) {
+    *out << *part;
+    part->clear();
+  }
+}
+
 }  // namespace
 
 std::string readable(std::string_view text) {
@@ -84,21 +93,22 @@ std::string readable(std::string_view text) {
   return result;
 }
 
-std::string in_quotes(std::string_view text) {
-  std::string result = "\"";
+void write_in_quotes(std::string_view text, std::ostream* out) {
+  std::string part = "\"";
   while (!text.empty()) {
+    write_if_long(&part, out);
     const char first = text.front();
     if (first == '\n') {
-      result += "\\n";
+      part += "\\n";
       text.remove_prefix(1);
       continue;
     }
     if (first == '"' || first == '\\') {
-      result += '\\';
+      part += '\\';
     }
-    append_readable(&text, &result);
+    append_readable(&text, &part);
   }
-  return result + '"';
+  *out << part << '"';
 }
 
 void append_hex(char byte, std::string* to) {
@@ -107,13 +117,14 @@ void append_hex(char byte, std::string* to) {
   *to += kDigits[static_cast<unsigned char>(byte) & 15U];
 }
 
-std::string in_hex_escapes(std::string_view bytes) {
-  std::string result = "\"";
+void write_hex_escapes(std::string_view bytes, std::ostream* out) {
+  std::string part = "\"";
   for (const char byte : bytes) {
-    result += "\\x";
-    append_hex(byte, &result);
+    write_if_long(&part, out);
+    part += "\\x";
+    append_hex(byte, &part);
   }
-  return result + '"';
+  *out << part << '"';
 }
 
 size_t size_of_character(std::string_view text) {

@@ -4,6 +4,7 @@
 
 #include <cstddef>
 #include <cstdint>
+#include <ostream>
 #include <string>
 #include <string_view>
 
@@ -14,9 +15,9 @@ namespace qel_wire {
 std::string readable(std::string_view text);
 
 // The same in quotes, as the text form has it.
-std::string in_quotes(std::string_view text);
+void write_in_quotes(std::string_view text, std::ostream* out);
 // In quotes too, with every byte as \x and two digits.
-std::string in_hex_escapes(std::string_view bytes);
+void write_hex_escapes(std::string_view bytes, std::ostream* out);
 
 // Two digits.
 void append_hex(char byte, std::string* to);
