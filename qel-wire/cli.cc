@@ -200,7 +200,7 @@ std::vector<std::string> option_names_of(const CLI::App& command) {
   refuse("there is no command " + named(word) + did_you_mean(word, names), "");
 }
 
-// What no option and no argument of the command is.
+// Refuses words that are neither an option nor an argument of the command.
 void refuse_rest(const CLI::App& app, const CLI::App& command) {
   std::vector<std::string> rest = command.remaining();
   for (const std::string& argument : app.remaining()) {

@@ -17,7 +17,7 @@ class Notes : public Visitor {
     }
     const bool may_be_left_out = piece.kind != Piece::kBytes && piece.kind != Piece::kMessage &&
                                  piece.kind != Piece::kPacked;
-    const bool is_left_out = may_be_left_out && hidden_.hides_field(piece);
+    const bool is_left_out = may_be_left_out && hidden_.hides(piece);
     left_out_ += is_left_out && hidden_groups_ == 0 ? 1 : 0;
     if (piece.kind == Piece::kGroup && (is_left_out || hidden_groups_ > 0)) {
       ++hidden_groups_;
@@ -53,19 +53,25 @@ class Notes : public Visitor {
 
 }  // namespace
 
+std::optional<Problem> check(std::string_view bytes, const google::protobuf::Descriptor& type,
+                             const Hidden& hidden, std::vector<std::string>* notes) {
+  Notes visitor(hidden);
+  const auto problem = walk(bytes, type, &visitor);
+  visitor.add_to(notes);
+  return problem;
+}
+
 Decoded decode(std::string_view bytes, const google::protobuf::Descriptor& type,
                const DecodeOptions& options, std::ostream* out) {
   Decoded result;
   const Hidden hidden = options.show_token ? Hidden() : Hidden(bytes, type);
-  Notes notes(hidden);
-  result.problem = walk(bytes, type, &notes);
+  result.problem = check(bytes, type, hidden, &result.notes);
   if (result.problem.has_value()) {
     if (!options.is_partial) {
-      return result;
+      return {{}, result.problem};
     }
     bytes = bytes.substr(0, result.problem->readable);
   }
-  notes.add_to(&result.notes);
   if (!options.as_json) {
     print_text(bytes, type, hidden, options.bytes_form, options.colours, out);
     return result;

@@ -28,6 +28,11 @@ struct Decoded {
   std::optional<Problem> problem;  // of broken bytes
 };
 
+// Says why the bytes are broken, if they are. The notes are on what no form of the message tells:
+// fields that are there again, and those that are left out because they are hidden.
+std::optional<Problem> check(std::string_view bytes, const google::protobuf::Descriptor& type,
+                             const Hidden& hidden, std::vector<std::string>* notes);
+
 // Writes the message in the text form or as JSON; nothing of broken bytes, unless it is partial.
 Decoded decode(std::string_view bytes, const google::protobuf::Descriptor& type,
                const DecodeOptions& options, std::ostream* out);

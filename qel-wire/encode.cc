@@ -5,7 +5,6 @@
 #include <google/protobuf/io/zero_copy_stream_impl_lite.h>
 #include <google/protobuf/unknown_field_set.h>
 
-#include <charconv>
 #include <limits>
 #include <nlohmann/json.hpp>
 #include <optional>
@@ -14,6 +13,7 @@
 #include "failure.h"
 #include "misread.h"
 #include "notation.h"
+#include "scan.h"
 #include "schema.h"
 #include "token.h"
 
@@ -504,11 +504,9 @@ class JsonParser : public nlohmann::json_sax<nlohmann::json> {
   }
 
   Reason set_digits(Message* message, const std::string& digits) {
-    int64_t value = 0;
-    const auto [end, error] = std::from_chars(digits.data(), digits.data() + digits.size(), value);
-    return error == std::errc() && end == digits.data() + digits.size()
-               ? set_number(message, field(), value)
-               : "'" + digits + "' is no number";
+    const auto value = number<int64_t>(digits);
+    return value.has_value() ? set_number(message, field(), *value)
+                             : "'" + digits + "' is no number";
   }
 
   const std::string& text_;

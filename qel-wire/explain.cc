@@ -144,7 +144,7 @@ struct Row {
 class Rows {
  public:
   virtual ~Rows() = default;
-  virtual void begin(const Piece& /*container*/) {}
+  virtual void begin(const Piece& /*container*/, bool /*is_hidden*/) {}
   virtual void end() {}
   virtual void write(const Row& row) = 0;
 };
@@ -275,7 +275,9 @@ class JsonLines : public Rows {
   JsonLines(const std::string& type, const ExplainOptions& options, std::ostream* out)
       : type_(type), form_(options.bytes_form), message_(options.message), out_(*out) {}
 
-  void begin(const Piece& container) override { path_.push_back(step(container)); }
+  void begin(const Piece& container, bool is_hidden) override {
+    path_.push_back(is_hidden ? "?" : step(container));
+  }
   void end() override { path_.pop_back(); }
 
   void write(const Row& row) override {
@@ -334,13 +336,13 @@ class Explanation : public Visitor {
   Explanation(const Hidden& hidden, Rows* rows) : hidden_(hidden), rows_(*rows) {}
 
   void begin(const Piece& piece) override {
-    const bool is_text = piece.kind == Piece::kBytes;
     const size_t end = piece.is_container() ? piece.value_offset : piece.end;
-    if (!is_text && hidden_.hides_field(piece)) {
+    const bool is_left_out = piece.kind != Piece::kBytes && hidden_.hides(piece);
+    if (is_left_out) {
       leave_out(piece.offset, end, piece.depth);
     } else {
       Piece shown = piece;
-      if (is_text && hidden_.hides_text(piece)) {
+      if (hidden_.hides(piece)) {
         shown.is_hidden = true;
         shown.bytes = kNotShown;
       }
@@ -348,7 +350,7 @@ class Explanation : public Visitor {
              false, doubts_of(shown)});
     }
     if (piece.is_container()) {
-      rows_.begin(piece);
+      rows_.begin(piece, is_left_out);
     }
   }
 

@@ -86,11 +86,11 @@ Head head_of(std::string_view bytes, const std::string& frames) {
   if (frames == "example") {
     return example(bytes);
   }
-  return number_of(bytes, frames[1] == '1' ? 2 : 4, frames.size() > 3);
+  return number_of(bytes, frames.substr(0, 3) == "u16" ? 2 : 4, frames.substr(3) == "le");
 }
 
 // Why a frame cannot be read, or nothing. So many bytes are left from its head on.
-std::string problem_of(const Head& head, size_t left) {
+std::string problem_of_head(const Head& head, size_t left) {
   if (!head.problem.empty()) {
     return head.problem;
   }
@@ -108,7 +108,7 @@ std::string cut_frames(std::string_view stream, const std::string& frames, const
                        size_t begin) {
   for (size_t at = begin; at < stream.size();) {
     const Head head = head_of(stream.substr(at), frames);
-    const std::string problem = problem_of(head, stream.size() - at);
+    const std::string problem = problem_of_head(head, stream.size() - at);
     if (!problem.empty()) {
       return "the frame at offset " + std::to_string(at) + " cannot be read: " + problem;
     }

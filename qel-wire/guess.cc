@@ -111,9 +111,6 @@ class Race {
         fields_.push_back({&descriptor, 0, 0, 0, {}, {}});
       }
     }
-    std::sort(candidate.fields.begin(), candidate.fields.end(), [this](size_t a, size_t b) {
-      return fields_[a].descriptor->number() < fields_[b].descriptor->number();
-    });
     candidates_.push_back(candidate);
   }
 
@@ -165,10 +162,31 @@ class Race {
     }
   }
 
+  using Tail = std::pair<Fitting, bool>;  // and whether it is broken
+
+  // Read once for all messages that have its field alike, or not at all.
+  const Tail& tail_of(const Candidate& candidate, std::string_view rest) {
+    Piece piece;
+    Level level(nullptr, rest.size(), 0);
+    Reader(rest).next(&level, &piece);
+    const auto field =
+        std::find_if(candidate.fields.begin(), candidate.fields.end(), [&](size_t index) {
+          return fields_[index].descriptor->number() == static_cast<int>(piece.number);
+        });
+    const auto [tail, is_new] =
+        tails_.try_emplace(field == candidate.fields.end() ? fields_.size() : *field);
+    if (is_new) {
+      tail->second.second = walk(rest, *candidate.type, &tail->second.first).has_value();
+    }
+    return tail->second;
+  }
+
   // The rest is a field that reaches behind the end, which messages and lists may do.
   void finish(Candidate* candidate, std::string_view rest) {
     Fitting all;
-    candidate->fit.is_broken = walk(rest, *candidate->type, &all).has_value();
+    if (!rest.empty()) {
+      std::tie(all, candidate->fit.is_broken) = tail_of(*candidate, rest);
+    }
     const auto number_in_rest = static_cast<int>(all.last_number);
     size_t unknown = count_;
     size_t odd = odd_;  // of unknown fields; of others it is counted with them
@@ -211,7 +229,8 @@ class Race {
   std::vector<Field> fields_;
   std::vector<std::vector<size_t>> by_number_;
   std::vector<Candidate> candidates_;
-  size_t count_ = 0;  // of fields in the bytes
+  std::map<size_t, Tail> tails_;  // by the field's index
+  size_t count_ = 0;              // of fields in the bytes
   size_t odd_ = 0;
 };
 

@@ -97,7 +97,7 @@ class Messages {
 
   // In the order in which they were complete.
   void of_capture(const std::string& file, const std::string& source) {
-    const Capture capture = read(file);
+    const Capture capture = read_capture(file);
     for (const std::string& note : capture.notes) {
       complain(source + note);
     }
@@ -127,17 +127,9 @@ class Messages {
     connections_ += capture.streams.empty() ? 0 : capture.streams.back().connection;
   }
 
-  static Capture read(const std::string& file) {
-    try {
-      return read_capture(file);
-    } catch (const CaptureError& error) {
-      throw Failure{kBroken, error.what()};
-    }
-  }
-
   void add(const Stream& stream, const std::string& place, std::vector<Arrived>* all) {
     const auto add_frame = [&](const Frame& frame) {
-      const size_t last = frame.offset + frame.size - (frame.size > 0 ? 1 : 0);
+      const size_t last = frame.offset + frame.size - 1;  // of its head, if it is empty
       all->push_back({&stream, frame, stream.segment_at(last).arrival});
     };
     if (!call_.frames.empty()) {

@@ -70,8 +70,8 @@ class Conditions {
     }
   }
 
-  // The status if the message meets one of them not, otherwise nothing. Broken messages and what is
-  // hidden meet none, which is said.
+  // The status with which the message is left out, or nothing if it meets all of them. Broken
+  // messages and what is hidden meet none, which is said.
   std::optional<int> refuse(const qel_wire::Found& found, const Descriptor& type) const {
     if (conditions_.empty()) {
       return std::nullopt;
@@ -330,23 +330,30 @@ int diff(const Call& call) {
     const Descriptor* type;
   };
   std::vector<Side> sides;
-  for (const std::string& file : call.files) {
+  for (size_t i = 0; i < call.files.size(); ++i) {
+    const std::string& file = call.files[i];
     Call one = call;
     one.files = {file};
     qel_wire::for_each_message(one, [&](const qel_wire::Found& found) {
       const Descriptor& type = is_auto(message)
                                    ? *qel_wire::guess(found.bytes).front().types.front()
                                    : message_of(message);
-      if (const auto problem = qel_wire::problem_of(found.bytes, type)) {
+      const auto hidden =
+          call.show_token ? qel_wire::Hidden() : qel_wire::Hidden(found.bytes, type);
+      std::vector<std::string> notes;
+      if (const auto problem = qel_wire::check(found.bytes, type, hidden, &notes)) {
         throw Failure{kBroken, qel_wire::named(file) + " is broken at offset " +
                                    std::to_string(problem->offset) + ": " + problem->reason};
+      }
+      for (const std::string& note : notes) {
+        qel_wire::complain(file + ": " + note);
       }
       sides.push_back({std::string(found.bytes), &type});
       return kDone;
     });
-  }
-  if (sides.size() != 2) {
-    throw Failure{kWrongCall, "diff takes one message of each file"};
+    if (sides.size() != i + 1) {
+      throw Failure{kWrongCall, "diff takes one message of each file"};
+    }
   }
   if (is_auto(message)) {
     std::cout << "# " << sides[0].type->name() << ", " << sides[1].type->name()

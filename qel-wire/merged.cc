@@ -1,10 +1,10 @@
 #include "merged.h"
 
-#include <algorithm>
 #include <array>
 #include <functional>
 #include <optional>
-#include <vector>
+
+#include "schema.h"
 
 namespace qel_wire {
 namespace {
@@ -46,7 +46,10 @@ class Merging {
 
   void message(const Fields& fields) {
     const Present present = present_in(fields);
-    for (const FieldDescriptor* field : by_number(*fields.type)) {
+    for (const FieldDescriptor* field : fields_by_number(*fields.type)) {
+      if (field == nullptr) {
+        continue;
+      }
       const auto index = static_cast<size_t>(field->index());
       const uint64_t bit = uint64_t{1} << index;
       if ((present.known & bit) == 0) {
@@ -89,20 +92,6 @@ class Merging {
     }
   }
 
-  static const std::vector<const FieldDescriptor*>& by_number(const Descriptor& type) {
-    static std::vector<std::vector<const FieldDescriptor*>> all(
-        static_cast<size_t>(type.file()->message_type_count()));
-    auto& fields = all[static_cast<size_t>(type.index())];
-    if (fields.empty()) {
-      for (int i = 0; i < type.field_count(); ++i) {
-        fields.push_back(type.field(i));
-      }
-      std::sort(fields.begin(), fields.end(),
-                [](const auto* a, const auto* b) { return a->number() < b->number(); });
-    }
-    return fields;
-  }
-
   Present present_in(const Fields& fields) {
     Present present;
     for_each(fields, [&](Piece* piece, const Level& level, Reader* reader) {
@@ -110,7 +99,7 @@ class Merging {
         present.unknown = true;
         return;
       }
-      if (piece->kind != Piece::kBytes && !piece->is_container() && hidden_.hides_field(*piece)) {
+      if (piece->kind != Piece::kBytes && !piece->is_container() && hidden_.hides(*piece)) {
         return;
       }
       const auto index = static_cast<size_t>(piece->field->index());
@@ -183,7 +172,7 @@ class Merging {
   }
 
   void group(Piece* piece, const Level& around, Reader* reader) {
-    if (hidden_.hides_field(*piece)) {
+    if (hidden_.hides(*piece)) {
       reader->skip(piece, around);
       return;
     }
@@ -202,7 +191,7 @@ class Merging {
 
   // A text, or a number.
   void value(Piece* piece) {
-    if (piece->kind == Piece::kBytes ? hidden_.hides_text(*piece) : hidden_.hides_field(*piece)) {
+    if (hidden_.hides(*piece)) {
       if (piece->kind != Piece::kBytes) {
         return;
       }

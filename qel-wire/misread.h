@@ -8,8 +8,8 @@
 
 namespace qel_wire {
 
-// Thrown: where a text is not what it should be. Lines and columns, in bytes, count from 1; a line
-// of 0 says that the place is not known.
+// Thrown: where a text is not what it should be. Lines and columns count from 1; columns are bytes,
+// but a tab of the text form goes to the next multiple of 8. A line of 0: the place is not known.
 struct Misread {
   size_t line = 0;
   size_t column = 0;

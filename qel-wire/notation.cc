@@ -42,31 +42,20 @@ std::string from_base64(std::string_view text) {
 }  // namespace
 
 std::string from_notation(std::string_view text, Notation notation) {
-  switch (notation) {
-    case Notation::kHex:
-      return from_hex(text);
-    case Notation::kBase64:
-      return from_base64(text);
-    default:
-      return std::string(text);
-  }
+  return notation == Notation::kHex ? from_hex(text) : from_base64(text);
 }
 
 std::string to_notation(std::string_view bytes, Notation notation) {
   const auto* data = reinterpret_cast<const uint8_t*>(bytes.data());
   std::string text;
-  switch (notation) {
-    case Notation::kHex:
-      text.resize(BASE16_ENCODE_LENGTH(bytes.size()));
-      base16_encode_update(text.data(), bytes.size(), data);
-      return text;
-    case Notation::kBase64:
-      text.resize(BASE64_ENCODE_RAW_LENGTH(bytes.size()));
-      base64_encode_raw(text.data(), bytes.size(), data);
-      return text;
-    default:
-      return std::string(bytes);
+  if (notation == Notation::kHex) {
+    text.resize(BASE16_ENCODE_LENGTH(bytes.size()));
+    base16_encode_update(text.data(), bytes.size(), data);
+  } else {
+    text.resize(BASE64_ENCODE_RAW_LENGTH(bytes.size()));
+    base64_encode_raw(text.data(), bytes.size(), data);
   }
+  return text;
 }
 
 }  // namespace qel_wire

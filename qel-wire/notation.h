@@ -9,7 +9,8 @@ namespace qel_wire {
 
 enum class Notation { kRaw, kHex, kBase64 };
 
-// From hex as it is found, or from base64 of either alphabet, padded or not. Throws Misread.
+// From and to one of the others than kRaw: hex as it is found, base64 of either alphabet, padded or
+// not. Throws Misread.
 std::string from_notation(std::string_view text, Notation notation);
 std::string to_notation(std::string_view bytes, Notation notation);
 

@@ -21,6 +21,7 @@
 #include <optional>
 #include <utility>
 
+#include "failure.h"
 #include "text.h"
 
 namespace qel_wire {
@@ -42,7 +43,7 @@ using Remark = std::string_view;
 constexpr Remark kWhole;
 constexpr Remark kOther = " left out: of other protocols than TCP and UDP";
 constexpr Remark kFragment = " left out: fragments of IP packets, which are not put together";
-constexpr Remark kBroken = " left out: headers that are broken or not captured whole";
+constexpr Remark kBrokenHeader = " left out: headers that are broken or not captured whole";
 constexpr Remark kIncomplete = " not captured whole";
 
 // Whether the packet goes on with such a header; it still does after that.
@@ -86,17 +87,17 @@ Remark read_transport(int protocol, Packet* packet) {
   constexpr size_t kUdpHeader = 8;  // the ports, which both begin with, and the length
   const std::string_view header = packet->rest;
   if (header.size() < kUdpHeader) {
-    return kBroken;
+    return kBrokenHeader;
   }
   packet->from_higher = number_at(0, header) >= number_at(2, header);
   packet->from += ":" + std::to_string(number_at(0, header));
   packet->to += ":" + std::to_string(number_at(2, header));
   if (protocol == IPPROTO_UDP) {
-    return enter(kUdpHeader, number_at(4, header), packet) ? kWhole : kBroken;
+    return enter(kUdpHeader, number_at(4, header), packet) ? kWhole : kBrokenHeader;
   }
   tcphdr tcp;
   if (!look(*packet, &tcp) || tcp.th_off < 5 || !skip(tcp.th_off * size_t{4}, packet)) {
-    return kBroken;
+    return kBrokenHeader;
   }
   packet->tcp = tcp;
   return kWhole;
@@ -113,7 +114,7 @@ Remark read_ipv4(Packet* packet) {
   ip header;
   if (!look(*packet, &header) || header.ip_hl < 5 ||
       !enter(header.ip_hl * size_t{4}, ntohs(header.ip_len), packet)) {
-    return kBroken;
+    return kBrokenHeader;
   }
   if ((ntohs(header.ip_off) & (IP_MF | IP_OFFMASK)) != 0) {
     return kFragment;
@@ -126,18 +127,18 @@ Remark read_ipv4(Packet* packet) {
 Remark read_ipv6(Packet* packet) {
   ip6_hdr header;
   if (!look(*packet, &header)) {
-    return kBroken;
+    return kBrokenHeader;
   }
   const size_t length = ntohs(header.ip6_plen);
   if (!enter(sizeof header, length == 0 ? 0 : sizeof header + length, packet)) {
-    return kBroken;
+    return kBrokenHeader;
   }
   int protocol = header.ip6_nxt;
   while (protocol == IPPROTO_HOPOPTS || protocol == IPPROTO_ROUTING ||
          protocol == IPPROTO_DSTOPTS || protocol == IPPROTO_FRAGMENT) {
     ip6_frag extension;  // the others have their size where it has a 0
     if (!look(*packet, &extension) || !skip((extension.ip6f_reserved + size_t{1}) * 8, packet)) {
-      return kBroken;
+      return kBrokenHeader;
     }
     if (protocol == IPPROTO_FRAGMENT &&
         (extension.ip6f_offlg & (IP6F_OFF_MASK | IP6F_MORE_FRAG)) != 0) {
@@ -171,14 +172,14 @@ constexpr Link kLinks[] = {
 Remark read_packet(const Link& link, Packet* packet) {
   std::string_view header = packet->rest;
   if (!skip(link.size, packet)) {
-    return kBroken;
+    return kBrokenHeader;
   }
   if (link.protocol.has_value()) {
     uint16_t protocol = number_at(*link.protocol, header);
     while (protocol == ETHERTYPE_VLAN || protocol == 0x88a8) {  // which may be around a VLAN
       header = packet->rest;
       if (!skip(4, packet)) {
-        return kBroken;
+        return kBrokenHeader;
       }
       protocol = number_at(2, header);
     }
@@ -187,7 +188,7 @@ Remark read_packet(const Link& link, Packet* packet) {
     }
   }
   const int version = packet->rest.empty() ? 0 : (packet->rest.front() >> 4) & 0xf;
-  return version == 4 ? read_ipv4(packet) : version == 6 ? read_ipv6(packet) : kBroken;
+  return version == 4 ? read_ipv4(packet) : version == 6 ? read_ipv6(packet) : kBrokenHeader;
 }
 
 // ---- From there to streams
@@ -379,7 +380,7 @@ Pcap opened(const std::string& file) {
                                                      reason.data()),
             pcap_close);
   if (pcap == nullptr) {
-    throw CaptureError(reason.data());
+    throw Failure{kBroken, reason.data()};
   }
   static_cast<void>(input.release());  // it is closed with the other
   return pcap;
@@ -392,15 +393,16 @@ const Link& link_of(pcap_t* pcap) {
       return link;
     }
   }
-  throw CaptureError(std::string("packets of this kind are not read: ") +
-                     pcap_datalink_val_to_description_or_dlt(type));
+  throw Failure{kBroken, std::string("packets of this kind are not read: ") +
+                             pcap_datalink_val_to_description_or_dlt(type)};
 }
 
-// A damaged file may have any number of seconds.
+// A damaged file may have any numbers.
 std::chrono::nanoseconds time_of(const timeval& time) {
   constexpr int64_t kMost = 9'000'000'000;
-  return std::chrono::seconds(std::clamp<int64_t>(time.tv_sec, -kMost, kMost)) +
-         std::chrono::nanoseconds(time.tv_usec);
+  return std::max<std::chrono::nanoseconds>(
+      std::chrono::nanoseconds(0), std::chrono::seconds(std::min<int64_t>(time.tv_sec, kMost)) +
+                                       std::chrono::nanoseconds(time.tv_usec));
 }
 
 }  // namespace

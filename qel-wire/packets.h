@@ -4,7 +4,6 @@
 
 #include <chrono>
 #include <cstddef>
-#include <stdexcept>
 #include <string>
 #include <string_view>
 #include <vector>
@@ -46,16 +45,11 @@ struct Capture {
   std::vector<std::string> notes;  // what was left out, and whether reading ends early
 };
 
-// Says why a file cannot be read, with none of its bytes.
-class CaptureError : public std::runtime_error {
-  using std::runtime_error::runtime_error;
-};
-
 // Whether the bytes begin as a file of pcap or pcapng does.
 bool is_capture(std::string_view bytes);
 
-// Throws a CaptureError if the bytes are no capture, or one of another kind of network. Of a file
-// that breaks off, it reads what is before that.
+// Throws a Failure, which has none of the bytes, if the bytes are no capture, or one of another
+// kind of network. Of a file that breaks off, it reads what is before that.
 Capture read_capture(const std::string& file);
 
 }  // namespace qel_wire

@@ -3,13 +3,13 @@
 #include <strings.h>
 
 #include <algorithm>
-#include <charconv>
 #include <optional>
 
 #include "failure.h"
 #include "merged.h"
 #include "notation.h"
 #include "print.h"
+#include "scan.h"
 #include "schema.h"
 #include "walk.h"
 
@@ -105,22 +105,21 @@ std::vector<const FieldDescriptor*> fields_of(const Descriptor* type, const std:
   return fields;
 }
 
-std::optional<int64_t> number_in(const std::string& text) {
-  int64_t number = 0;
-  const auto [end, error] = std::from_chars(text.data(), text.data() + text.size(), number);
-  return error == std::errc() && end == text.data() + text.size() ? std::optional(number)
-                                                                  : std::nullopt;
+// Where the first step of the path begins that is the number of an unknown field. If there is none,
+// where one would begin behind the path.
+size_t begin_of_unknown(const std::string& path) {
+  size_t begin = 0;
+  while (begin <= path.size() && !is_decimal(path[begin])) {
+    begin = std::min(path.find('.', begin), path.size()) + 1;
+  }
+  return begin;
 }
 
 // Of an unknown field, as decode writes it.
-std::optional<int64_t> unknown_number_in(const std::string& text) {
-  const bool is_hex = text.compare(0, 2, "0x") == 0;
-  uint64_t number = 0;
-  const char* const end = text.data() + text.size();
-  const auto [stop, error] =
-      std::from_chars(text.data() + (is_hex ? 2 : 0), end, number, is_hex ? 16 : 10);
-  return error == std::errc() && stop == end ? std::optional(static_cast<int64_t>(number))
-                                             : number_in(text);
+std::optional<int64_t> unknown_number_in(std::string_view text) {
+  const bool is_hex = take_prefix("0x", &text);
+  const auto value = number<uint64_t>(text, is_hex ? 16 : 10);
+  return value.has_value() ? std::optional(static_cast<int64_t>(*value)) : number<int64_t>(text);
 }
 
 // As a number that values of the field can be compared with.
@@ -135,7 +134,7 @@ std::optional<int64_t> number_for(const FieldDescriptor& field, const std::strin
       return member->number();
     }
   }
-  return number_in(text);
+  return number<int64_t>(text);
 }
 
 bool is_text(const FieldDescriptor& field) {
@@ -171,48 +170,34 @@ std::optional<int> compare(const Piece& piece, const std::string& text) {
 
 // ---- Differences
 
+// The places of a message's fields and their values, in their order: what is shown, and the bytes
+// of a text that is not. Other hidden fields are left out.
 class Values : public Paths {
  public:
-  explicit Values(std::vector<std::pair<std::string, std::string>>* values) : values_(*values) {}
+  using Value = std::pair<std::string, std::string_view>;
+
+  Values(std::string_view bytes, const Descriptor& type, bool show_token)
+      : list{{"message", {type.name(), ""}}}, bytes_(bytes) {
+    walk_merged(bytes, type, show_token ? Hidden() : Hidden(bytes, type), this);
+    by_place = {list.begin(), list.end()};
+  }
+
+  std::vector<std::pair<std::string, Value>> list;
+  std::map<std::string, Value> by_place;
 
  private:
   void field(const std::string& /*path*/, const std::string& place, const Piece& piece) override {
     if (!piece.is_container()) {
-      values_.emplace_back(place, value_in_text(piece, BytesForm::kUsual));
+      const size_t hidden = piece.is_hidden ? piece.end - piece.value_offset : 0;
+      list.push_back(
+          {place,
+           {value_in_text(piece, BytesForm::kUsual), bytes_.substr(piece.value_offset, hidden)}});
     }
   }
 
-  void nothing_in(const std::string& place) override { values_.emplace_back(place, "{}"); }
+  void nothing_in(const std::string& place) override { list.push_back({place, {"{}", ""}}); }
 
-  std::vector<std::pair<std::string, std::string>>& values_;
-};
-
-using List = std::vector<std::pair<std::string, std::string>>;
-
-// The places and the values of a message, in their order.
-List values_of(std::string_view bytes, const Descriptor& type, const Hidden& hidden) {
-  List values{{"message", type.name()}};
-  Values visitor(&values);
-  walk_merged(bytes, type, hidden, &visitor);
-  return values;
-}
-
-// The values of a message, and what is shown of them.
-struct Side {
-  Side(std::string_view bytes, const Descriptor& type, bool show_token)
-      : values(values_of(bytes, type, Hidden())), by_place(values.begin(), values.end()) {
-    const List all = show_token ? values : values_of(bytes, type, Hidden(bytes, type));
-    shown = {all.begin(), all.end()};
-  }
-
-  std::string shown_at(const std::string& place) const {
-    const auto found = shown.find(place);
-    return found != shown.end() ? found->second : kNotShown;
-  }
-
-  List values;
-  std::map<std::string, std::string> by_place;
-  std::map<std::string, std::string> shown;
+  std::string_view bytes_;
 };
 
 }  // namespace
@@ -288,11 +273,12 @@ void Condition::parse(const std::string& text) {
 
 Condition::Condition(const std::string& text, const Descriptor* type) {
   parse(text);
-  const char last = path_[path_.rfind('.') + 1];
-  if (last >= '0' && last <= '9') {
+  const size_t unknown = begin_of_unknown(path_);
+  const auto fields = unknown > 0 ? fields_of(type, path_.substr(0, unknown - 1))
+                                  : std::vector<const FieldDescriptor*>();
+  if (unknown <= path_.size()) {
     return;  // of an unknown field, about which nothing is known
   }
-  const auto fields = fields_of(type, path_);
   if (sign_ == Sign::kIsThere || sign_ == Sign::kIsAbsent) {
     return;
   }
@@ -319,26 +305,26 @@ bool Condition::holds(std::string_view bytes, const Descriptor& type, const Hidd
 bool diff(std::string_view first, const Descriptor& first_type, std::string_view second,
           const Descriptor& second_type, bool show_token, const Colours& colours,
           std::ostream* out) {
-  const Side before(first, first_type, show_token);
-  const Side after(second, second_type, show_token);
+  const Values before(first, first_type, show_token);
+  const Values after(second, second_type, show_token);
   bool is_different = false;
-  const auto write = [&](char sign, const std::string& colour, const std::string& place,
-                         const Side& side) {
+  const auto write = [&](char sign, const std::string& colour, const auto& field) {
     is_different = true;
-    *out << colour << sign << ' ' << place << ": " << side.shown_at(place) << colours.end << '\n';
+    *out << colour << sign << ' ' << field.first << ": " << field.second.first << colours.end
+         << '\n';
   };
-  for (const auto& [place, value] : before.values) {
-    const auto other = after.by_place.find(place);
+  for (const auto& field : before.list) {
+    const auto other = after.by_place.find(field.first);
     if (other == after.by_place.end()) {
-      write('-', colours.wrong, place, before);
-    } else if (other->second != value) {
-      write('-', colours.wrong, place, before);
-      write('+', colours.value, place, after);
+      write('-', colours.wrong, field);
+    } else if (other->second != field.second) {
+      write('-', colours.wrong, field);
+      write('+', colours.value, *other);
     }
   }
-  for (const auto& [place, value] : after.values) {
-    if (before.by_place.count(place) == 0) {
-      write('+', colours.value, place, after);
+  for (const auto& field : after.list) {
+    if (before.by_place.count(field.first) == 0) {
+      write('+', colours.value, field);
     }
   }
   return is_different;

@@ -1,7 +1,5 @@
 #include "scan.h"
 
-#include <charconv>
-
 namespace qel_wire {
 
 std::string_view take_line(std::string_view* text) {
@@ -18,13 +16,6 @@ bool take_prefix(std::string_view prefix, std::string_view* text) {
   const bool has_it = text->substr(0, prefix.size()) == prefix;
   take(has_it ? prefix.size() : 0, text);
   return has_it;
-}
-
-std::optional<uint64_t> number(std::string_view digits, int base) {
-  uint64_t value = 0;
-  const char* const end = digits.data() + digits.size();
-  const auto [stop, error] = std::from_chars(digits.data(), end, value, base);
-  return error == std::errc() && stop == end ? std::optional(value) : std::nullopt;
 }
 
 void append_pairs(std::string_view digits, std::string* bytes) {

@@ -4,6 +4,7 @@
 
 #include <algorithm>
 #include <cctype>
+#include <charconv>
 #include <cstddef>
 #include <cstdint>
 #include <optional>
@@ -38,6 +39,10 @@ inline bool is_space(char c) {
   return is_blank(c) || c == '\n';
 }
 
+inline bool is_decimal(char c) {
+  return c >= '0' && c <= '9';
+}
+
 inline bool is_digit(char c) {
   return std::isxdigit(static_cast<unsigned char>(c)) != 0;
 }
@@ -66,8 +71,14 @@ std::string_view take_line(std::string_view* text);
 // Whether the text began with it.
 bool take_prefix(std::string_view prefix, std::string_view* text);
 
-// All of the digits, if they are a number.
-std::optional<uint64_t> number(std::string_view digits, int base);
+// All of the digits, if they are such a number.
+template <typename Number = uint64_t>
+std::optional<Number> number(std::string_view digits, int base = 10) {
+  Number value = 0;
+  const char* const end = digits.data() + digits.size();
+  const auto [stop, error] = std::from_chars(digits.data(), end, value, base);
+  return error == std::errc() && stop == end ? std::optional(value) : std::nullopt;
+}
 
 void append_pairs(std::string_view digits, std::string* bytes);
 

@@ -79,6 +79,7 @@ std::string with_coloured_names(const std::string& text, const Colours& colours)
 struct Facts {
   bool is_record = false;
   Use use = Use::kNone;
+  std::vector<const FieldDescriptor*> fields;  // by their numbers
 };
 
 std::vector<Facts> all_facts() {
@@ -86,16 +87,17 @@ std::vector<Facts> all_facts() {
 #include "interface.inc"
   };
   std::vector<Facts> facts(static_cast<size_t>(schema_file().message_type_count()));
-  for (const std::string& name : message_names()) {
-    const Descriptor& type = *message_named(name);
-    const auto use = uses.find(name);
-    if (use != uses.end()) {
-      facts[static_cast<size_t>(type.index())].use = use->second;
-    }
+  for (size_t m = 0; m < facts.size(); ++m) {
+    const Descriptor& type = *schema_file().message_type(static_cast<int>(m));
+    const auto use = uses.find(type.name());
+    facts[m].use = use != uses.end() ? use->second : Use::kNone;
     for (int i = 0; i < type.field_count(); ++i) {
-      const Descriptor* record = type.field(i)->message_type();
-      if (record != nullptr) {
-        facts[static_cast<size_t>(record->index())].is_record = true;
+      const FieldDescriptor& field = *type.field(i);
+      const auto number = static_cast<size_t>(field.number());
+      facts[m].fields.resize(std::max(facts[m].fields.size(), number + 1));
+      facts[m].fields[number] = &field;
+      if (field.message_type() != nullptr) {
+        facts[static_cast<size_t>(field.message_type()->index())].is_record = true;
       }
     }
   }
@@ -172,6 +174,10 @@ bool is_time(const FieldDescriptor& field) {
 bool may_be_request_id(uint32_t number) {
   return number == static_cast<uint32_t>(ChatRequest::kRequestIdFieldNumber) ||
          number == static_cast<uint32_t>(ClientEcho::kRequestIdFieldNumber);
+}
+
+const std::vector<const FieldDescriptor*>& fields_by_number(const Descriptor& type) {
+  return facts_about(type).fields;
 }
 
 bool is_record(const Descriptor& type) {

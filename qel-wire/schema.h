@@ -21,6 +21,10 @@ const google::protobuf::FieldDescriptor* field_named(const google::protobuf::Des
 const google::protobuf::EnumValueDescriptor* member_named(
     const google::protobuf::EnumDescriptor& enumeration, const std::string& name);
 
+// At the index of each number the field with it, or null. The descriptor's own table is far slower.
+const std::vector<const google::protobuf::FieldDescriptor*>& fields_by_number(
+    const google::protobuf::Descriptor& type);
+
 // An empty one.
 std::unique_ptr<google::protobuf::Message> new_message(const google::protobuf::Descriptor& type);
 

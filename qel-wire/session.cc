@@ -90,11 +90,14 @@ Use other(Use use) {
 Session::Open::iterator Session::request_answered_by(const Found& found, const Descriptor* type) {
   for (const int64_t id : possible_request_ids(found.bytes)) {
     const auto [first, end] = open_.equal_range(id);
+    std::set<Types> refused;  // the same requests as often as they are open
     for (auto request = end; request != first;) {
       --request;
-      if (is_from_other_end(request->second, found) &&
-          reply_among(request->second, found, type) != nullptr) {
-        return request;
+      if (is_from_other_end(request->second, found) && refused.count(request->second.types) == 0) {
+        if (reply_among(request->second, found, type) != nullptr) {
+          return request;
+        }
+        refused.insert(request->second.types);
       }
     }
   }

@@ -62,7 +62,7 @@ void append_octal(std::string_view bytes, std::string* to) {
   }
 }
 
-// Takes the text's first character, or byte if that is none, away from it.
+// Takes the text's first character away, or its first byte if it does not begin with a character.
 void append_readable(std::string_view* text, std::string* to) {
   const Character character = first_character(*text);
   const std::string_view bytes = text->substr(0, character.size == 0 ? 1 : character.size);

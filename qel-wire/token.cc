@@ -183,15 +183,12 @@ Hidden::Hidden(std::string_view bytes, const Descriptor& type) {
   hidden_ = std::move(search).found(is_whole);
 }
 
-bool Hidden::hides_text(const Piece& piece) const {
-  return any(piece.value_offset, piece.end);
-}
-
-bool Hidden::hides_field(const Piece& piece) const {
+bool Hidden::hides(const Piece& piece) const {
   // A tag alone, behind a text, tells one character at the most; but groups are nothing but tags.
   const bool is_tag_shown = piece.kind != Piece::kGroup && !piece.is_element();
-  return any(piece.offset + (is_tag_shown ? 1 : 0),
-             piece.is_container() ? piece.value_offset : piece.end);
+  return any(
+      piece.kind == Piece::kBytes ? piece.value_offset : piece.offset + (is_tag_shown ? 1 : 0),
+      piece.is_container() ? piece.value_offset : piece.end);
 }
 
 bool Hidden::hides_end(const Piece& piece) const {

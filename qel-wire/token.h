@@ -28,10 +28,8 @@ class Hidden {
 
   bool hides_any() const { return !hidden_.empty(); }
   bool at(size_t offset) const { return !hidden_.empty() && hidden_[offset]; }
-  // Whether the text of the piece, which is kBytes, is hidden.
-  bool hides_text(const Piece& piece) const;
-  // Whether a piece that is no text is hidden: a number, or what a container begins with.
-  bool hides_field(const Piece& piece) const;
+  // Whether the text of a piece is hidden, or the number, or what a container begins with.
+  bool hides(const Piece& piece) const;
   // Whether the end of a group is.
   bool hides_end(const Piece& piece) const;
 

@@ -3,8 +3,8 @@
 #include <google/protobuf/wire_format_lite.h>
 
 #include <algorithm>
-#include <vector>
 
+#include "schema.h"
 #include "text.h"
 
 namespace qel_wire {
@@ -29,32 +29,6 @@ std::string described(const Piece& piece, std::string_view what) {
 WireFormatLite::WireType wire_type_of(const FieldDescriptor& field) {
   return WireFormatLite::WireTypeForFieldType(static_cast<WireFormatLite::FieldType>(field.type()));
 }
-
-// The schema's fields by their numbers. The descriptor's own table takes several times as long.
-class Numbers {
- public:
-  static const FieldDescriptor* find(const Descriptor& type, uint32_t number) {
-    static const std::vector<Numbers> all = of_all(*type.file());
-    const auto& fields = all[static_cast<size_t>(type.index())].fields_;
-    return number < fields.size() ? fields[number] : nullptr;
-  }
-
- private:
-  static std::vector<Numbers> of_all(const google::protobuf::FileDescriptor& file) {
-    std::vector<Numbers> all(static_cast<size_t>(file.message_type_count()));
-    for (size_t i = 0; i < all.size(); ++i) {
-      const Descriptor& type = *file.message_type(static_cast<int>(i));
-      for (int f = 0; f < type.field_count(); ++f) {
-        const auto number = static_cast<size_t>(type.field(f)->number());
-        all[i].fields_.resize(std::max(all[i].fields_.size(), number + 1));
-        all[i].fields_[number] = type.field(f);
-      }
-    }
-    return all;
-  }
-
-  std::vector<const FieldDescriptor*> fields_;
-};
 
 bool walk_level(Reader* reader, Level* level, Visitor* visitor) {
   for (Piece piece; reader->next(level, &piece);) {
@@ -138,7 +112,7 @@ bool Reader::fail(const Level& level, const Piece& piece, size_t offset,
   return false;
 }
 
-// What ends there.
+// Names what ends at that offset.
 std::string Reader::ender(size_t end) const {
   return end == bytes_.size() ? "the input ends" : "the message around it ends";
 }
@@ -200,7 +174,9 @@ bool Reader::field(Level* level, uint64_t tag, Piece* piece) {
   if (kept_tag == 0) {
     return fail(*level, *piece, piece->offset, "a tag of 0 is no field");
   }
-  piece->field = level->type_ == nullptr ? nullptr : Numbers::find(*level->type_, piece->number);
+  if (level->type_ != nullptr && piece->number < fields_by_number(*level->type_).size()) {
+    piece->field = fields_by_number(*level->type_)[piece->number];
+  }
   if (piece->field != nullptr) {
     // Repeated numbers are taken packed too.
     const bool is_packed =

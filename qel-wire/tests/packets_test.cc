@@ -10,6 +10,8 @@
 #include <string>
 #include <vector>
 
+#include "failure.h"
+
 namespace {
 
 using qel_wire::read_capture;
@@ -169,8 +171,8 @@ std::string arrivals(const std::vector<std::string>& packets) {
 std::string complaint_about(const std::string& file) {
   try {
     read_capture(file);
-  } catch (const qel_wire::CaptureError& error) {
-    return error.what();
+  } catch (const qel_wire::Failure& failure) {
+    return failure.reason;
   }
   return "none";
 }

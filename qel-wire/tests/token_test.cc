@@ -229,18 +229,35 @@ std::string bytes_of(const std::string& value) {
   return '\0' + read_as(value, Notation::kBase64) + '\0' + read_as(value, Notation::kHex) + '\0';
 }
 
+// The tags of groups whose numbers are steps of paths, or begin groups in the text form.
+std::string group_tags_of(const std::string& line) {
+  constexpr int kStartOfGroup = 3;
+  std::string tags;
+  int number = 0;
+  for (size_t i = 0; i < line.size(); ++i) {
+    const bool is_digit = std::isdigit(static_cast<unsigned char>(line[i])) != 0;
+    if (!is_digit && (line[i] == '.' || line.substr(i, 2) == " {")) {
+      tags += static_cast<char>(number << 3 | kStartOfGroup);
+    }
+    number = is_digit ? number % 100 * 10 + line[i] - '0' : 0;
+  }
+  return tags;
+}
+
 // The first four successive bytes of the token that the output tells in any notation, or nothing.
 std::string told(const std::string& output, const std::string& token) {
   std::string rows;
   std::string values;
+  std::string tags;
   std::istringstream lines(output);
   for (std::string line; std::getline(lines, line);) {
     if (std::isxdigit(line[0]) != 0) {
       add_row(line, &rows);
     }
     values += bytes_of(value_of(line));
+    tags += group_tags_of(line);
   }
-  const std::string bytes = unescaped(output) + '\0' + rows + '\0' + values;
+  const std::string bytes = unescaped(output) + '\0' + rows + '\0' + values + '\0' + tags;
   for (size_t i = 0; i + 4 <= token.size(); ++i) {
     if (bytes.find(token.substr(i, 4)) != std::string::npos) {
       return token.substr(i, 4);
@@ -258,6 +275,13 @@ TEST(Told, OfEachNotation_IsSeen) {
         "\"\\x41\\x62\\x43\\x64\"", "  \"x\": \"41624364\"\n",
         "{\"value\":\"65\"}\n{\"value\":\"98\"}\n{\"value\":67}\n{\"value\":100}\n"}) {
     EXPECT_EQ(told(output, token), token) << output;
+  }
+}
+
+TEST(Told, OfGroups_IsSeen) {
+  for (const char* output :
+       {"- 12.8.7.15.1: 1\n", "\"path\":\"12.8.7.15.1\"", "12 {\n  8 {\n    7 {\n      15 {\n"}) {
+    EXPECT_EQ(told(output, "cC;{"), "cC;{") << output;
   }
 }
 
