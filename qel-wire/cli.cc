@@ -48,13 +48,12 @@ class Options {
     return *this;
   }
 
-  Options& files(const char* name, const char* description) {
-    command_.add_option(name, call_.files, description)->type_name("");
-    return *this;
-  }
-
-  Options& files(const char* name, const char* description, int least, int most) {
-    files(name, description).command_.get_option(name)->expected(least, most);
+  Options& files(const char* description, int least = 0,
+                 int most = CLI::detail::expected_max_vector_size) {
+    command_.add_option("FILE", call_.files, description)
+        ->type_name("")
+        ->expected(least, most)
+        ->required(least > 0);
     return *this;
   }
 
@@ -73,11 +72,12 @@ class Options {
     return *this;
   }
 
-  // The choices are parted by '|', as help shows them.
+  // The choices are parted by '|', as help shows them. An argument has to be given, an option not.
   Options& choice(const char* name, std::string* value, const std::string& choices,
                   const char* description) {
     command_.add_option(name, *value, description)
         ->type_name(choices)
+        ->required(name[0] != '-')
         ->check([choices](const std::string& chosen) -> std::string {
           const auto all = parts_of(choices);
           return std::count(all.begin(), all.end(), chosen) > 0 ? "" : "not one of " + choices;
@@ -87,15 +87,14 @@ class Options {
 
   // What commands that take bytes have in common.
   Options& input() {
-    return files("FILE",
-                 "bytes, or packets as pcap or pcapng; standard input if there is none, or for '-'")
+    return files("bytes, or packets as pcap or pcapng; standard input if there is none, or for '-'")
         .notation("the bytes, or a file's, are ")
         .choice("--frames", &call_.frames, kFramings,
                 "many messages: what tells where each of them ends");
   }
 
-  Options& value(const char* name, std::string* value, const char* type, const char* description) {
-    command_.add_option(name, *value, description)->type_name(type);
+  Options& name(const char* option, const char* type, const char* description) {
+    command_.add_option(option, call_.message, description)->type_name(type);
     return *this;
   }
 
@@ -140,7 +139,7 @@ std::unique_ptr<CLI::App> make_table(Call* call) {
       .output();
   command("encode", "the bytes of a message that is given in the text form or as JSON")
       .message("its name")
-      .files("FILE", "the text; standard input if there is none, or for '-'", 0, 1)
+      .files("the text; standard input if there is none, or for '-'", 0, 1)
       .notation("write ")
       .choice("--bytes", &call->bytes, "hex", "how JSON has what is no text");
   command("explain", "each field with its offset and its bytes, and what is wrong with them")
@@ -161,18 +160,14 @@ std::unique_ptr<CLI::App> make_table(Call* call) {
       .where()
       .flag("--show-token", &call->show_token, "let --where see what may be the access token");
   command("diff", "in which fields the messages of two files differ")
-      .files("FILE", "the two files, of one message each", 2, 2)
+      .files("the two files, of one message each", 2, 2)
       .notation("the files are ")
-      .value("--message", &call->message, "MESSAGE", "their name, instead of the best guesses")
+      .name("--message", "MESSAGE", "their name, instead of the best guesses")
       .flag("--show-token", &call->show_token, "show what may be the access token");
-  app->get_subcommand("diff")->get_option("FILE")->required();
-  command("schema", "the names of messages and enumerations, or the definition of one");
-  app->get_subcommand("schema")
-      ->add_option("NAME", call->message, "the message or the enumeration")
-      ->type_name("");
+  command("schema", "the names of messages and enumerations, or the definition of one")
+      .name("NAME", "", "the message or the enumeration");
   command("completion", "what a shell needs to complete commands, options and names")
       .choice("SHELL", &call->message, "bash|zsh|fish", "bash, zsh or fish");
-  app->get_subcommand("completion")->get_option("SHELL")->required();
   command("man", "its man page, for man -l");
   return app;
 }

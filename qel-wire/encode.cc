@@ -16,6 +16,7 @@
 #include "scan.h"
 #include "schema.h"
 #include "token.h"
+#include "walk.h"
 
 namespace qel_wire {
 namespace {
@@ -26,8 +27,6 @@ using google::protobuf::Message;
 using google::protobuf::Reflection;
 using google::protobuf::UnknownFieldSet;
 using google::protobuf::io::Tokenizer;
-
-constexpr int kDeepest = 100;
 
 // ---- A message's fields. Each of these says why the field does not take the value, or nothing.
 
@@ -213,7 +212,7 @@ class TextParser : private google::protobuf::io::ErrorCollector {
       fail("'{' is missing");
     }
     if (++depth_ > kDeepest) {
-      fail("more than " + std::to_string(kDeepest) + " levels of nesting");
+      fail(too_deep());
     }
     return is_angle ? ">" : "}";
   }

@@ -18,23 +18,13 @@ struct Head {
   std::string problem;  // why it is none
 };
 
-uint64_t big_endian(std::string_view bytes) {
-  uint64_t number = 0;
-  for (const char byte : bytes) {
-    number = number << 8U | static_cast<unsigned char>(byte);
-  }
-  return number;
-}
-
 Head number_of(std::string_view bytes, size_t size, bool is_little_endian) {
-  if (bytes.size() < size) {
-    return {size, 0, "", ""};
+  Head head{size, 0, "", ""};
+  for (size_t i = 0; i < size && size <= bytes.size(); ++i) {
+    const char byte = bytes[is_little_endian ? size - 1 - i : i];
+    head.length = head.length << 8U | static_cast<unsigned char>(byte);
   }
-  std::string digits(bytes.substr(0, size));
-  if (is_little_endian) {
-    digits.assign(digits.rbegin(), digits.rend());
-  }
-  return {size, big_endian(digits), "", ""};
+  return head;
 }
 
 Head varint(std::string_view bytes) {
@@ -98,10 +88,7 @@ std::string problem_of_head(const Head& head, size_t left) {
     return "the input ends before its message";
   }
   const size_t there = left - head.size;
-  return there >= head.length
-             ? ""
-             : "the length of its message is " + counted(head.length, "byte") + ", of which " +
-                   std::to_string(there) + (there == 1 ? " is there" : " are there");
+  return there >= head.length ? "" : "the length of its message is " + too_long(head.length, there);
 }
 
 std::string cut_frames(std::string_view stream, const std::string& frames, const TakeFrame& take,

@@ -43,7 +43,11 @@ using qel_wire::kWrongCall;
 using qel_wire::Notation;
 
 // Which name is not said: it may be a piece of a token, if the stream is cut.
-constexpr char kNoSuchName[] = ": its frame has a name that no message has";
+constexpr char kNoSuchName[] = "its frame has a name that no message has";
+
+void complain_about(const qel_wire::Found& found, const std::string& text) {
+  qel_wire::complain((found.place.empty() ? "" : found.place + ": ") + text);
+}
 
 const Descriptor& message_of(const std::string& name) {
   const Descriptor* type = qel_wire::message_named(name);
@@ -76,9 +80,8 @@ class Conditions {
     if (conditions_.empty()) {
       return std::nullopt;
     }
-    const std::string where = found.place.empty() ? "" : found.place + ": ";
     if (qel_wire::problem_of(found.bytes, type).has_value()) {
-      qel_wire::complain(where + "broken, and so left out");
+      complain_about(found, "broken, and so left out");
       return kBroken;
     }
     const qel_wire::Hidden hidden =
@@ -89,8 +92,7 @@ class Conditions {
       return std::nullopt;
     }
     if (hidden.hides_any()) {
-      qel_wire::complain(where +
-                         "left out; some of its fields are hidden: --show-token shows them");
+      complain_about(found, "left out; some of its fields are hidden: --show-token shows them");
     }
     return kDone;
   }
@@ -122,7 +124,7 @@ int for_each_known(const Call& call, Take take) {
   return qel_wire::for_each_message(call, [&](const qel_wire::Found& found) {
     const Descriptor* type = found.name.empty() ? named : qel_wire::message_named(found.name);
     if (!found.name.empty() && type == nullptr) {
-      qel_wire::complain(found.place + kNoSuchName);
+      complain_about(found, kNoSuchName);
       return kBroken;
     }
     if (!is_guessing && type != named) {
@@ -186,14 +188,13 @@ int decode(const Call& call) {
   options.is_partial = call.partial;
   return for_each_known(call, [&](const qel_wire::Found& found, const Descriptor& type) {
     const auto decoded = qel_wire::decode(found.bytes, type, options, &std::cout);
-    const std::string where = found.place.empty() ? "" : found.place + ": ";
     for (const std::string& note : decoded.notes) {
-      qel_wire::complain(where + note);
+      complain_about(found, note);
     }
     if (const auto& problem = decoded.problem) {
-      qel_wire::complain(where + "broken at offset " + std::to_string(problem->offset) + ": " +
-                         problem->reason +
-                         (call.partial ? "" : " ('qel-wire explain' shows what comes before)"));
+      complain_about(
+          found, "broken at offset " + std::to_string(problem->offset) + ": " + problem->reason +
+                     (call.partial ? "" : " ('qel-wire explain' shows what comes before)"));
       return kBroken;
     }
     return kDone;
@@ -297,7 +298,7 @@ int session(const Call& call) {
     const qel_wire::Entry entry = session.add(found);
     const bool is_named = found.name.empty() || qel_wire::message_named(found.name) != nullptr;
     if (!is_named) {
-      qel_wire::complain(found.place + kNoSuchName);
+      complain_about(found, kNoSuchName);
     }
     if (const auto status = conditions.refuse(found, *entry.types.front())) {
       return *status;
@@ -367,21 +368,16 @@ int diff(const Call& call) {
 
 int schema(const Call& call) {
   if (call.message.empty()) {
-    for (const auto& names : {qel_wire::message_names(), qel_wire::enumeration_names()}) {
-      for (const std::string& name : names) {
-        std::cout << name << '\n';
-      }
+    for (const std::string& name : qel_wire::all_names()) {
+      std::cout << name << '\n';
     }
     return kDone;
   }
   const std::string definition = qel_wire::schema_of(call.message, colours_of(call));
   if (definition.empty()) {
-    std::vector<std::string> names = qel_wire::message_names();
-    const std::vector<std::string> enumerations = qel_wire::enumeration_names();
-    names.insert(names.end(), enumerations.begin(), enumerations.end());
     throw Failure{kWrongCall, "there is no message and no enumeration " +
                                   qel_wire::named(call.message) +
-                                  qel_wire::did_you_mean(call.message, names) +
+                                  qel_wire::did_you_mean(call.message, qel_wire::all_names()) +
                                   " ('qel-wire schema' lists them)"};
   }
   std::cout << definition;

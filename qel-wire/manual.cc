@@ -41,17 +41,15 @@ std::string values_of(const CLI::Option& option) {
 
 // The words that may be the command's first argument; if there are none, that is a file.
 std::vector<std::string> words_of(const CLI::App& command) {
-  std::vector<std::string> words = message_names();
-  if (const CLI::Option* message = command.get_option_no_throw("MESSAGE")) {
-    if (message->get_description().find("'auto'") != std::string::npos) {
+  if (command.get_option_no_throw("MESSAGE") != nullptr) {
+    std::vector<std::string> words = message_names();
+    if (command.get_name() != "encode") {  // which cannot guess
       words.insert(words.begin(), "auto");
     }
     return words;
   }
   if (command.get_option_no_throw("NAME") != nullptr) {
-    const std::vector<std::string> enumerations = enumeration_names();
-    words.insert(words.end(), enumerations.begin(), enumerations.end());
-    return words;
+    return all_names();
   }
   const CLI::Option* shell = command.get_option_no_throw("SHELL");
   return shell != nullptr ? CLI::detail::split(shell->get_type_name(), '|')

@@ -99,7 +99,7 @@ class JsonPrinter : public Visitor {
     } else {
       begin_value(*piece.field);
       if (piece.kind == Piece::kMessage) {
-        objects_.emplace_back();
+        objects_.push_back(nullptr);
         out_ << '{';
       } else {
         const bool is_text =
@@ -125,24 +125,20 @@ class JsonPrinter : public Visitor {
   }
 
  private:
-  struct Object {
-    const FieldDescriptor* last = nullptr;  // whose value was the last
-  };
-
   void begin_value(const FieldDescriptor& field) {
-    Object& object = objects_.back();
-    if (object.last == &field) {  // the next of a list
+    const FieldDescriptor*& last = objects_.back();
+    if (last == &field) {  // the next of a list
       out_ << ',';
       new_line();
       return;
     }
     end_list();
-    if (object.last != nullptr) {
+    if (last != nullptr) {
       out_ << ',';
     }
     new_line();
     out_ << colours_.name << '"' << field.name() << '"' << colours_.end << ": ";
-    object.last = &field;
+    last = &field;
     if (field.is_repeated()) {
       out_ << '[';
       ++lists_;
@@ -151,8 +147,8 @@ class JsonPrinter : public Visitor {
   }
 
   void end_list() {
-    const Object& object = objects_.back();
-    if (object.last != nullptr && object.last->is_repeated()) {
+    const FieldDescriptor* last = objects_.back();
+    if (last != nullptr && last->is_repeated()) {
       --lists_;
       new_line();
       out_ << ']';
@@ -161,7 +157,7 @@ class JsonPrinter : public Visitor {
 
   void end_object() {
     end_list();
-    const bool is_empty = objects_.back().last == nullptr;
+    const bool is_empty = objects_.back() == nullptr;
     objects_.pop_back();
     if (!is_empty) {
       new_line();
@@ -174,8 +170,9 @@ class JsonPrinter : public Visitor {
   BytesForm form_;
   const Colours& colours_;
   std::ostream& out_;
-  std::vector<Object> objects_;  // around the next value
-  size_t lists_ = 0;             // the same
+  // The objects around the next value: of each the field whose value was the last.
+  std::vector<const FieldDescriptor*> objects_;
+  size_t lists_ = 0;  // the same
   NotInJson lost_;
   size_t unknown_groups_ = 0;  // around the next value
 };

@@ -70,8 +70,8 @@ std::vector<const FieldDescriptor*> fields_of(const Descriptor* type, const std:
   std::vector<const Descriptor*> types{type};
   if (type == nullptr) {
     types.clear();
-    for (const std::string& name : message_names()) {
-      types.push_back(message_named(name));
+    for (int i = 0; i < schema_file().message_type_count(); ++i) {
+      types.push_back(schema_file().message_type(i));
     }
   }
   std::vector<const FieldDescriptor*> fields;
@@ -288,8 +288,8 @@ Condition::Condition(const std::string& text, const Descriptor* type) {
     if (is_text(*field) || (is_number && number_for(*field, value_).has_value())) {
       return;
     }
-    for (int i = 0; field->enum_type() != nullptr && i < field->enum_type()->value_count(); ++i) {
-      members.push_back(field->enum_type()->value(i)->name());
+    if (field->enum_type() != nullptr) {
+      members = member_names(*field->enum_type());
     }
   }
   throw Failure{kWrongCall, "'" + path_ + "' has no value such as '" + value_ + "'" +

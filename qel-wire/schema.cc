@@ -139,9 +139,12 @@ std::vector<std::string> message_names() {
                   [](int i) { return schema_file().message_type(i); });
 }
 
-std::vector<std::string> enumeration_names() {
-  return names_of(schema_file().enum_type_count(),
-                  [](int i) { return schema_file().enum_type(i); });
+std::vector<std::string> all_names() {
+  std::vector<std::string> names = message_names();
+  for (int i = 0; i < schema_file().enum_type_count(); ++i) {
+    names.push_back(schema_file().enum_type(i)->name());
+  }
+  return names;
 }
 
 std::vector<std::string> field_names(const Descriptor& type) {

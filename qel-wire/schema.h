@@ -28,15 +28,15 @@ const std::vector<const google::protobuf::FieldDescriptor*>& fields_by_number(
 // An empty one.
 std::unique_ptr<google::protobuf::Message> new_message(const google::protobuf::Descriptor& type);
 
-// The names of all messages, and then of all enumerations, in the order of the schema.
+// In the order of the schema; all are the names of messages, and then of enumerations.
 std::vector<std::string> message_names();
-std::vector<std::string> enumeration_names();
+std::vector<std::string> all_names();
 std::vector<std::string> field_names(const google::protobuf::Descriptor& type);
 std::vector<std::string> member_names(const google::protobuf::EnumDescriptor& enumeration);
 
 // The definition of the message or the enumeration, and of all that a message contains; empty if
 // there is none of that name, in any case of letters.
-std::string schema_of(const std::string& name, const Colours& colours = Colours(false));
+std::string schema_of(const std::string& name, const Colours& colours);
 
 // Whether the field's number is a time, in milliseconds since 1970.
 bool is_time(const google::protobuf::FieldDescriptor& field);

@@ -165,6 +165,11 @@ std::string counted(size_t count, const std::string& what) {
   return std::to_string(count) + " " + what + (count == 1 ? "" : "s");
 }
 
+std::string too_long(size_t length, size_t there) {
+  return counted(length, "byte") + ", of which " + std::to_string(there) +
+         (there == 1 ? " is there" : " are there");
+}
+
 std::string utc(int64_t milliseconds) {
   const std::time_t seconds = milliseconds / 1000;
   std::tm parts{};

@@ -35,6 +35,9 @@ std::string invisible_characters(std::string_view text);
 // "1 byte", "2 bytes"
 std::string counted(size_t count, const std::string& what);
 
+// Of a length that reaches too far: "2 bytes, of which 1 is there".
+std::string too_long(size_t length, size_t there);
+
 // "2023-11-14 22:13:20.000 UTC" of milliseconds since 1970.
 std::string utc(int64_t milliseconds);
 

@@ -15,7 +15,6 @@ using google::protobuf::FieldDescriptor;
 using google::protobuf::internal::WireFormatLite;
 
 constexpr size_t kLongestVarint = 10;
-constexpr int kDeepest = 100;
 
 std::string name_of(const Piece& piece) {
   return "field " + std::to_string(piece.number);
@@ -249,17 +248,15 @@ bool Reader::length_delimited(const Level& level, Piece* piece) {
     piece->kind = Piece::kPacked;
   } else if (field != nullptr && field->message_type() != nullptr) {
     piece->kind = Piece::kMessage;
-    if (piece->depth >= kDeepest) {
-      return fail(level, *piece, piece->offset,
-                  "more than " + std::to_string(kDeepest) + " levels of nesting");
+    if (!may_nest(level, *piece)) {
+      return false;
     }
   } else {
     piece->kind = Piece::kBytes;
     if (piece->length > left) {
       return fail(level, *piece, at_,
                   ender(level.end_) + " within " + name_of(*piece) + ": its length is " +
-                      counted(piece->length, "byte") + ", of which " + std::to_string(left) +
-                      (left == 1 ? " is there" : " are there"));
+                      too_long(piece->length, left));
     }
     piece->bytes = bytes_.substr(at_, piece->length);
     at_ += piece->length;
@@ -275,9 +272,11 @@ bool Reader::length_delimited(const Level& level, Piece* piece) {
 bool Reader::group(const Level& level, Piece* piece) {
   piece->kind = Piece::kGroup;
   piece->value_offset = at_;
-  return piece->depth < kDeepest ||
-         fail(level, *piece, piece->offset,
-              "more than " + std::to_string(kDeepest) + " levels of nesting");
+  return may_nest(level, *piece);
+}
+
+bool Reader::may_nest(const Level& level, const Piece& piece) {
+  return piece.depth < kDeepest || fail(level, piece, piece.offset, too_deep());
 }
 
 // False in any case: the level is over, or broken.

@@ -18,6 +18,12 @@ namespace qel_wire {
 // No call takes more.
 constexpr size_t kMostBytes = size_t{64} << 20;
 
+// Nor more levels of messages and groups in each other.
+constexpr int kDeepest = 100;
+inline std::string too_deep() {
+  return "more than " + std::to_string(kDeepest) + " levels of nesting";
+}
+
 struct Piece {
   enum Kind { kVarint, kFixed64, kFixed32, kBytes, kMessage, kGroup, kPacked };
 
@@ -145,6 +151,7 @@ class Reader {
   bool fixed(const Level& level, Piece::Kind kind, size_t size, Piece* piece);
   bool length_delimited(const Level& level, Piece* piece);
   bool group(const Level& level, Piece* piece);
+  bool may_nest(const Level& level, const Piece& piece);
   bool end_of_group(const Level& level, const Piece& piece);
 
   std::string_view bytes_;
