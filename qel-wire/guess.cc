@@ -32,51 +32,79 @@ class Fitting : public Visitor {
   uint32_t last_number = 0;  // of a known field of the message itself
 };
 
-// A field that many messages have alike: they read its bytes in the same way.
+// What the messages of the schema have in common.
+struct Schema {
+  struct Message {
+    const Descriptor* type;
+    Use use;
+    bool is_record;
+    std::vector<size_t> fields;  // the indices of those that it has
+  };
+
+  Schema() {
+    for (int i = 0; i < schema_file().message_type_count(); ++i) {
+      const Descriptor& type = *schema_file().message_type(i);
+      messages.push_back({&type, use_of(type), is_record(type), {}});
+      for (int f = 0; f < type.field_count(); ++f) {
+        messages.back().fields.push_back(index_of(*type.field(f)));
+      }
+    }
+  }
+
+  std::vector<Message> messages;
+  // Of fields that messages have alike, as they read their bytes in the same way, one.
+  std::vector<const FieldDescriptor*> fields;
+  std::vector<std::vector<size_t>> by_number;  // their indices
+
+ private:
+  size_t index_of(const FieldDescriptor& field) {
+    const auto number = static_cast<size_t>(field.number());
+    by_number.resize(std::max(by_number.size(), number + 1));
+    for (const size_t index : by_number[number]) {
+      if (are_alike(*fields[index], field)) {
+        return index;
+      }
+    }
+    by_number[number].push_back(fields.size());
+    fields.push_back(&field);
+    return fields.size() - 1;
+  }
+
+  static bool are_alike(const FieldDescriptor& one, const FieldDescriptor& other) {
+    return one.type() == other.type() && one.is_repeated() == other.is_repeated() &&
+           one.enum_type() == other.enum_type() && one.message_type() == other.message_type();
+  }
+};
+
+// What the bytes have of a field.
 struct Field {
-  const FieldDescriptor* descriptor;  // of one of them
-  size_t count = 0;                   // how often it was there
-  size_t odd = 0;                     // how often no encoder writes it so
-  size_t first = 0;                   // when it was there first
+  size_t count = 0;  // how often it was there
+  size_t odd = 0;    // how often no encoder writes it so
+  size_t first = 0;  // when it was there first
   Fitting fitting;
   std::vector<size_t> counts;  // of all fields, when it was there first
   bool is_broken = false;      // no message that has it reads on
-
-  bool is_like(const FieldDescriptor& other) const {
-    return other.number() == descriptor->number() && other.type() == descriptor->type() &&
-           other.is_repeated() == descriptor->is_repeated() &&
-           other.enum_type() == descriptor->enum_type() &&
-           other.message_type() == descriptor->message_type();
-  }
-
-  bool takes(Piece::Kind kind) const {
-    const auto type = descriptor->cpp_type();
-    const bool is_number =
-        type != FieldDescriptor::CPPTYPE_STRING && type != FieldDescriptor::CPPTYPE_MESSAGE;
-    return kind == Piece::kVarint
-               ? is_number
-               : kind == Piece::kBytes && (!is_number || descriptor->is_packable());
-  }
 };
 
-struct Candidate {
-  const Descriptor* type;
-  std::vector<size_t> fields;  // their indices, by their numbers
-  bool is_over = false;        // broken before the end
-  Fit fit;
-};
+bool takes(const FieldDescriptor& field, Piece::Kind kind) {
+  const auto type = field.cpp_type();
+  const bool is_number =
+      type != FieldDescriptor::CPPTYPE_STRING && type != FieldDescriptor::CPPTYPE_MESSAGE;
+  return kind == Piece::kVarint ? is_number
+                                : kind == Piece::kBytes && (!is_number || field.is_packable());
+}
 
 // Reads the bytes once, for all messages: there are 81, and captures are large.
 class Race {
  public:
-  Race() {
-    for (int i = 0; i < schema_file().message_type_count(); ++i) {
-      enter(*schema_file().message_type(i));
-    }
-  }
+  Race(const Schema& schema, std::string_view bytes)
+      : schema_(schema),
+        bytes_(bytes),
+        fields_(schema.fields.size()),
+        fits_(schema.messages.size()) {}
 
-  std::vector<Candidate> run(std::string_view bytes) && {
-    bytes_ = bytes;
+  // How well each message fits.
+  std::vector<Fit> run() && {
     Reader reader(bytes_);
     Level level(nullptr, bytes_.size(), 0);
     size_t end = 0;
@@ -87,41 +115,23 @@ class Race {
       }
       take(piece);
     }
-    for (Candidate& candidate : candidates_) {
-      if (!candidate.is_over) {
-        finish(&candidate, bytes_.substr(end));
+    for (size_t message = 0; message < fits_.size(); ++message) {
+      if (!fits_[message].is_broken) {
+        finish(message, bytes_.substr(end));
       }
     }
-    return std::move(candidates_);
+    return std::move(fits_);
   }
 
  private:
-  void enter(const Descriptor& type) {
-    Candidate candidate{&type, {}, false, {}};
-    for (int i = 0; i < type.field_count(); ++i) {
-      const FieldDescriptor& descriptor = *type.field(i);
-      const auto alike = std::find_if(fields_.begin(), fields_.end(), [&](const Field& field) {
-        return field.is_like(descriptor);
-      });
-      candidate.fields.push_back(static_cast<size_t>(alike - fields_.begin()));
-      if (alike == fields_.end()) {
-        const auto number = static_cast<size_t>(descriptor.number());
-        by_number_.resize(std::max(by_number_.size(), number + 1));
-        by_number_[number].push_back(fields_.size());
-        fields_.push_back({&descriptor, 0, 0, 0, {}, {}});
-      }
-    }
-    candidates_.push_back(candidate);
-  }
-
   void take(const Piece& piece) {
     ++count_;
     odd_ += piece.is_odd() ? 1 : 0;
-    if (piece.number >= by_number_.size()) {
+    if (piece.number >= schema_.by_number.size()) {
       return;
     }
-    for (const size_t index : by_number_[piece.number]) {
-      if (!fields_[index].is_broken && fields_[index].takes(piece.kind)) {
+    for (const size_t index : schema_.by_number[piece.number]) {
+      if (!fields_[index].is_broken && takes(*schema_.fields[index], piece.kind)) {
         take(piece, index);
       }
     }
@@ -138,11 +148,10 @@ class Race {
     ++field.count;
     field.odd += piece.is_odd() ? 1 : 0;
     Piece known = piece;
-    known.field = field.descriptor;
+    known.field = schema_.fields[index];
     known.is_known = true;
-    if (piece.kind == Piece::kBytes &&
-        field.descriptor->cpp_type() != FieldDescriptor::CPPTYPE_STRING) {
-      known.kind = field.descriptor->message_type() != nullptr ? Piece::kMessage : Piece::kPacked;
+    if (piece.kind == Piece::kBytes && known.field->cpp_type() != FieldDescriptor::CPPTYPE_STRING) {
+      known.kind = known.field->message_type() != nullptr ? Piece::kMessage : Piece::kPacked;
     }
     field.fitting.begin(known);
     if (known.is_container() && !walk_content(bytes_, known, &field.fitting)) {
@@ -153,11 +162,12 @@ class Race {
 
   // A field is broken, and so are the messages that have it.
   void end_all_with(size_t index) {
-    for (Candidate& candidate : candidates_) {
-      const auto& fields = candidate.fields;
-      if (!candidate.is_over && std::find(fields.begin(), fields.end(), index) != fields.end()) {
-        finish(&candidate, "");
-        candidate.fit.is_broken = candidate.is_over = true;
+    for (size_t message = 0; message < fits_.size(); ++message) {
+      const auto& fields = schema_.messages[message].fields;
+      if (!fits_[message].is_broken &&
+          std::find(fields.begin(), fields.end(), index) != fields.end()) {
+        finish(message, "");
+        fits_[message].is_broken = true;
       }
     }
   }
@@ -165,70 +175,71 @@ class Race {
   using Tail = std::pair<Fitting, bool>;  // and whether it is broken
 
   // Read once for all messages that have its field alike, or not at all.
-  const Tail& tail_of(const Candidate& candidate, std::string_view rest) {
+  const Tail& tail_of(const Schema::Message& message, std::string_view rest) {
     Piece piece;
     Level level(nullptr, rest.size(), 0);
     Reader(rest).next(&level, &piece);
     const auto field =
-        std::find_if(candidate.fields.begin(), candidate.fields.end(), [&](size_t index) {
-          return fields_[index].descriptor->number() == static_cast<int>(piece.number);
+        std::find_if(message.fields.begin(), message.fields.end(), [&](size_t index) {
+          return schema_.fields[index]->number() == static_cast<int>(piece.number);
         });
     const auto [tail, is_new] =
-        tails_.try_emplace(field == candidate.fields.end() ? fields_.size() : *field);
+        tails_.try_emplace(field == message.fields.end() ? fields_.size() : *field);
     if (is_new) {
-      tail->second.second = walk(rest, *candidate.type, &tail->second.first).has_value();
+      tail->second.second = walk(rest, *message.type, &tail->second.first).has_value();
     }
     return tail->second;
   }
 
   // The rest is a field that reaches behind the end, which messages and lists may do.
-  void finish(Candidate* candidate, std::string_view rest) {
+  void finish(size_t message, std::string_view rest) {
+    const Schema::Message& of = schema_.messages[message];
+    Fit& fit = fits_[message];
+    fit.is_record = of.is_record;
     Fitting all;
     if (!rest.empty()) {
-      std::tie(all, candidate->fit.is_broken) = tail_of(*candidate, rest);
+      std::tie(all, fit.is_broken) = tail_of(of, rest);
     }
     const auto number_in_rest = static_cast<int>(all.last_number);
     size_t unknown = count_;
     size_t odd = odd_;  // of unknown fields; of others it is counted with them
-    for (const size_t index : candidate->fields) {
+    for (const size_t index : of.fields) {
       const Field& field = fields_[index];
+      if (field.count == 0) {
+        fit.absent += schema_.fields[index]->number() != number_in_rest ? 1 : 0;
+        continue;
+      }
       all.known += field.fitting.known;
       all.unknown += field.fitting.unknown;
-      all.doubtful += field.fitting.doubtful + out_of_place(*candidate, field);
+      all.doubtful += field.fitting.doubtful + out_of_place(of, index);
       unknown -= field.count;
       odd -= field.odd;
-      const bool is_absent = field.count == 0 && field.descriptor->number() != number_in_rest;
-      candidate->fit.absent += is_absent ? 1 : 0;
     }
-    candidate->fit.known = all.known;
-    candidate->fit.unknown = all.unknown + unknown;
-    candidate->fit.doubtful = all.doubtful + odd;
+    fit.known = all.known;
+    fit.unknown = all.unknown + unknown;
+    fit.doubtful = all.doubtful + odd;
   }
 
   // How often the field was there again, though it is not repeated, or behind one with a higher
   // number.
-  size_t out_of_place(const Candidate& candidate, const Field& field) const {
+  size_t out_of_place(const Schema::Message& message, size_t index) const {
+    const FieldDescriptor& field = *schema_.fields[index];
     const Field* first_behind = nullptr;
-    for (const size_t index : candidate.fields) {
-      const Field& other = fields_[index];
-      if (other.descriptor->number() > field.descriptor->number() && other.count > 0 &&
-          (first_behind == nullptr || other.first < first_behind->first)) {
-        first_behind = &other;
+    for (const size_t other : message.fields) {
+      if (schema_.fields[other]->number() > field.number() && fields_[other].count > 0 &&
+          (first_behind == nullptr || fields_[other].first < first_behind->first)) {
+        first_behind = &fields_[other];
       }
     }
-    if (field.count == 0) {
-      return 0;
-    }
-    const auto index = static_cast<size_t>(&field - fields_.data());
-    const size_t before = first_behind == nullptr ? field.count : first_behind->counts[index];
-    const size_t late = field.count - before;
-    return field.descriptor->is_repeated() ? late : field.count - (before == 0 ? 0 : 1);
+    const size_t count = fields_[index].count;
+    const size_t before = first_behind == nullptr ? count : first_behind->counts[index];
+    return field.is_repeated() ? count - before : count - (before == 0 ? 0 : 1);
   }
 
+  const Schema& schema_;
   std::string_view bytes_;
-  std::vector<Field> fields_;
-  std::vector<std::vector<size_t>> by_number_;
-  std::vector<Candidate> candidates_;
+  std::vector<Field> fields_;     // by their indices
+  std::vector<Fit> fits_;         // of each message
   std::map<size_t, Tail> tails_;  // by the field's index
   size_t count_ = 0;              // of fields in the bytes
   size_t odd_ = 0;
@@ -239,28 +250,27 @@ auto quality(const Fit& fit) {
                     fit.absent, -static_cast<int64_t>(fit.known));
 }
 
-bool is_possible(const Descriptor& type, Use use) {
-  const Use usual = use_of(type);
-  return use == Use::kNone || usual == Use::kNone || usual == use;
-}
-
 }  // namespace
 
 std::vector<Fit> guess(std::string_view bytes, Use use) {
-  std::map<decltype(quality(Fit())), Fit> fits;
-  static const Race start;  // to which all messages have come
-  for (Candidate& candidate : Race(start).run(bytes)) {
-    if (is_possible(*candidate.type, use)) {
-      candidate.fit.is_record = is_record(*candidate.type);
-      fits.emplace(quality(candidate.fit), candidate.fit)
-          .first->second.types.push_back(candidate.type);
+  static const Schema schema;
+  const std::vector<Fit> fits = Race(schema, bytes).run();
+  // Of those that fit equally well, the C interface's come first, and then the schema's first one.
+  std::vector<std::tuple<decltype(quality(Fit())), bool, size_t>> ranks;
+  ranks.reserve(fits.size());
+  for (size_t i = 0; i < fits.size(); ++i) {
+    const Use usual = schema.messages[i].use;
+    if (use == Use::kNone || usual == Use::kNone || usual == use) {
+      ranks.emplace_back(quality(fits[i]), usual == Use::kNone, i);
     }
   }
+  std::sort(ranks.begin(), ranks.end());
   std::vector<Fit> result;
-  for (auto& [ignored, fit] : fits) {
-    std::stable_partition(fit.types.begin(), fit.types.end(),
-                          [](const Descriptor* type) { return use_of(*type) != Use::kNone; });
-    result.push_back(fit);
+  for (const auto& [how_well, is_other, i] : ranks) {
+    if (result.empty() || quality(result.back()) != how_well) {
+      result.push_back(fits[i]);
+    }
+    result.back().types.push_back(schema.messages[i].type);
   }
   return result;
 }

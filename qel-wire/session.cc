@@ -76,8 +76,7 @@ const Descriptor* reply_among(const Entry& request, const Found& found, const De
 }
 
 bool is_from_other_end(const Entry& request, const Found& found) {
-  return request.connection == found.connection &&
-         (request.end == Use::kNone || found.use == Use::kNone || request.end != found.use);
+  return request.end == Use::kNone || found.use == Use::kNone || request.end != found.use;
 }
 
 Use other(Use use) {
@@ -86,22 +85,26 @@ Use other(Use use) {
 
 }  // namespace
 
-// The last such request; type is null if it is not known.
-Session::Open::iterator Session::request_answered_by(const Found& found, const Descriptor* type) {
+// The last of them is answered; null if none is. The type is null if it is not known.
+Session::Alike* Session::requests_answered_by(const Found& found, const Descriptor* type) {
   for (const int64_t id : possible_request_ids(found.bytes)) {
-    const auto [first, end] = open_.equal_range(id);
-    std::set<Types> refused;  // the same requests as often as they are open
-    for (auto request = end; request != first;) {
-      --request;
-      if (is_from_other_end(request->second, found) && refused.count(request->second.types) == 0) {
-        if (reply_among(request->second, found, type) != nullptr) {
-          return request;
-        }
-        refused.insert(request->second.types);
+    const auto open = open_.find({found.connection, id});
+    if (open == open_.end()) {
+      continue;
+    }
+    Alike* answered = nullptr;
+    for (auto& [ignored, requests] : open->second) {
+      if (!requests.empty() && is_from_other_end(requests.back(), found) &&
+          (answered == nullptr || answered->back().number < requests.back().number) &&
+          reply_among(requests.back(), found, type) != nullptr) {
+        answered = &requests;
       }
     }
+    if (answered != nullptr) {
+      return answered;
+    }
   }
-  return open_.end();
+  return nullptr;
 }
 
 // A message that only one of the ends sends tells more than the ports.
@@ -126,30 +129,32 @@ Entry Session::add(const Found& found) {
   entry.end = found.use;
   const Descriptor* type = message_named(found.name);
   const Use use = use_of_sender(found, type);
-  const auto request = request_answered_by(found, type);
-  const bool is_reply = request != open_.end();
-  if (type == nullptr && is_reply) {
-    type = reply_among(request->second, found, nullptr);
+  Alike* const requests = requests_answered_by(found, type);
+  const Entry* const request = requests != nullptr ? &requests->back() : nullptr;
+  entry.is_guess = type == nullptr && (request == nullptr || request->is_guess);
+  if (type == nullptr && request != nullptr) {
+    type = reply_among(*request, found, nullptr);
   }
-  entry.is_guess = type == nullptr;
-  entry.types = entry.is_guess ? guess(found.bytes, use).front().types : Types{type};
+  entry.types = type == nullptr ? guess(found.bytes, use).front().types : Types{type};
   type = entry.types.front();
   entry.request_id = request_id_in(found.bytes, *type);
   entry.use = use != Use::kNone ? use : use_of(*type);
-  if (is_reply) {
-    entry.answers = request->second.number;
-    entry.use = entry.use != Use::kNone ? entry.use : other(request->second.use);
-    open_.erase(request);
+  if (request != nullptr) {
+    entry.answers = request->number;
+    entry.use = entry.use != Use::kNone ? entry.use : other(request->use);
+    requests->pop_back();
   } else if (reply_to(*type) != nullptr && !problem_of(found.bytes, *type).has_value()) {
-    open_.emplace(entry.request_id, entry);
+    open_[{entry.connection, entry.request_id}][{entry.end, entry.types}].push_back(entry);
   }
   return entry;
 }
 
 std::vector<Entry> Session::unanswered() const {
   std::vector<Entry> entries;
-  for (const auto& [ignored, entry] : open_) {
-    entries.push_back(entry);
+  for (const auto& [place, kinds] : open_) {
+    for (const auto& [kind, requests] : kinds) {
+      entries.insert(entries.end(), requests.begin(), requests.end());
+    }
   }
   std::sort(entries.begin(), entries.end(),
             [](const Entry& a, const Entry& b) { return a.number < b.number; });

@@ -10,6 +10,7 @@
 #include <optional>
 #include <set>
 #include <string>
+#include <utility>
 #include <vector>
 
 #include "input.h"
@@ -21,7 +22,7 @@ struct Entry {
   size_t number = 0;  // from 1
   // Of a guess all that fit equally well, otherwise one.
   std::vector<const google::protobuf::Descriptor*> types;
-  bool is_guess = false;  // of the bytes alone
+  bool is_guess = false;  // or answers a guess
   Use use = Use::kNone;   // whether the plug-in has sent or received it, as far as that is known
   Use end = Use::kNone;   // the same as the ports have it, which may turn it round
   size_t connection = 0;
@@ -39,16 +40,18 @@ class Session {
   std::vector<Entry> unanswered() const;
 
  private:
-  // By their requestIds; those without one are never answered.
-  using Open = std::multimap<std::optional<int64_t>, Entry>;
+  // Requests that are alike but for their numbers, in their order: there may be many.
+  using Alike = std::vector<Entry>;
+  using Kind = std::pair<Use, std::vector<const google::protobuf::Descriptor*>>;
 
-  Open::iterator request_answered_by(const Found& found, const google::protobuf::Descriptor* type);
+  Alike* requests_answered_by(const Found& found, const google::protobuf::Descriptor* type);
 
   Use use_of_sender(const Found& found, const google::protobuf::Descriptor* type);
 
   size_t count_ = 0;
   std::set<size_t> turned_;  // connections whose ends are the other way round than they seemed
-  Open open_;
+  // By their connections and requestIds; those without one are never answered.
+  std::map<std::pair<size_t, std::optional<int64_t>>, std::map<Kind, Alike>> open_;
 };
 
 }  // namespace qel_wire
