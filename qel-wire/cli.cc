@@ -57,11 +57,11 @@ class Options {
     return *this;
   }
 
-  Options& notation(const std::string& what) {
+  Options& notation(const std::string& what, const char* type = "") {
     auto* hex = command_.add_flag("--hex", call_.hex, what + "hex, as dumps and programs have it");
     auto* base64 = command_.add_flag("--base64", call_.base64, what + "base64");
     for (CLI::Option* option : {hex, base64}) {
-      option->type_name("[=BYTES]")->multi_option_policy(CLI::MultiOptionPolicy::Throw);
+      option->type_name(type)->multi_option_policy(CLI::MultiOptionPolicy::Throw);
     }
     hex->excludes(base64);
     return *this;
@@ -88,7 +88,7 @@ class Options {
   // What commands that take bytes have in common.
   Options& input() {
     return files("bytes, or packets as pcap or pcapng; standard input if there is none, or for '-'")
-        .notation("the bytes, or a file's, are ")
+        .notation("the bytes, or a file's, are ", "[=BYTES]")
         .choice("--frames", &call_.frames, kFramings,
                 "many messages: what tells where each of them ends");
   }
@@ -154,7 +154,12 @@ std::unique_ptr<CLI::App> make_table(Call* call) {
       .flag("--sent", &call->sent, "not those that a plug-in receives")
       .flag("--received", &call->received, "not those that it sends")
       .flag("--all", &call->all, "all messages");
-  app->get_subcommand("guess")->get_option("--sent")->excludes("--received");
+  const auto exclude = [&](const char* command, const char* one, const char* other) {
+    app->get_subcommand(command)->get_option(one)->excludes(other);
+  };
+  exclude("guess", "--sent", "--received");
+  exclude("explain", "--all", "--json");      // which has all bytes anyway
+  exclude("decode", "--partial", "--where");  // which leaves broken messages out
   command("session", "messages in order, and which of them answers which")
       .input()
       .where()
@@ -202,9 +207,6 @@ void refuse_rest(const CLI::App& app, const CLI::App& command) {
     rest.push_back(argument);
   }
   for (const std::string& argument : rest) {
-    if (argument == "--") {
-      continue;
-    }
     if (argument[0] != '-') {
       refuse(command.get_name() + " takes no argument " + named(argument), command.get_name());
     }
@@ -237,7 +239,21 @@ bool is_command(CLI::App* app, const std::string& word) {
   return !app->get_subcommands([&](CLI::App* each) { return each->check_name(word); }).empty();
 }
 
+// What stands behind "--" are files: as "./-x", the library does not take them for options.
+void name_files(std::vector<std::string>* arguments) {
+  const auto mark = std::find(arguments->begin(), arguments->end(), "--");
+  if (mark == arguments->end()) {
+    return;
+  }
+  for (auto file = arguments->erase(mark); file != arguments->end(); ++file) {
+    if (file->size() > 1 && file->front() == '-') {
+      file->insert(0, "./");
+    }
+  }
+}
+
 void parse(CLI::App* app, std::vector<std::string> arguments) {
+  name_files(&arguments);
   // Options may stand before the command that they belong to.
   const auto command = std::find_if(arguments.begin(), arguments.end(),
                                     [&](const auto& word) { return is_command(app, word); });
@@ -292,8 +308,10 @@ Call read_call(int argc, char** argv) {
   } catch (const CLI::ArgumentMismatch& error) {
     const std::string what = error.what();
     const bool has_value = what.find("flag override") != std::string::npos;
+    const size_t missing = what.find(": 1 required ");
     refuse(has_value ? "--" + what.substr(0, what.find(' ')) + " takes no value"
-                     : what.substr(0, what.find(':')) + " is given too often, or not often enough",
+           : missing != std::string::npos ? what.substr(0, missing) + " needs a value"
+                                          : what,
            chosen());
   } catch (const CLI::ParseError& error) {
     refuse(error.what(), chosen());

@@ -95,6 +95,7 @@ class Dump {
 
  private:
   static constexpr size_t kLargest = 8;  // bytes of a number
+  static constexpr char kAnother[] = "another dump begins: only one is read";
 
   bool is_zero() const { return first_.offset.find_first_not_of('0') == std::string_view::npos; }
 
@@ -140,7 +141,9 @@ class Dump {
   void read_row(std::string_view line) {
     const DumpRow row = row_of(line);
     if (row.offset.empty()) {
-      throw Stop{line.data(), "no offset before the bytes, as in the lines above"};
+      throw Stop{line.data(), is_before_another()
+                                  ? kAnother
+                                  : "no offset before the bytes, as in the lines above"};
     }
     take_offset(row);
     if (base_ == 0 && size_ > 1 && row.has_colon && row.gap > 2) {  // as "xxd -e" has the last one
@@ -172,12 +175,23 @@ class Dump {
            bytes_.size() - *count < (is_last && base_ != 0 ? size_ : 1);
   }
 
+  // Whether one of the next lines has the first offset again, as behind the summary of a packet.
+  bool is_before_another() const {
+    constexpr int kMostLines = 3;
+    std::string_view rest = rest_;
+    bool is_there = false;
+    for (int i = 0; i < kMostLines; ++i) {
+      is_there = is_there || row_of(take_line(&rest)).offset == first_.offset;
+    }
+    return is_there;
+  }
+
   void take_offset(const DumpRow& row) {
     const auto end =
         std::remove_if(bases_.begin(), bases_.end(), [&](int base) { return !fits(row, base); });
     if (end == bases_.begin()) {
       throw Stop{row.offset.data(), above(row, bases_.front()) == 0
-                                        ? "another dump begins: only one is read"
+                                        ? kAnother
                                         : "an offset that does not follow from the " +
                                               counted(bytes_.size(), "byte") + " above"};
     }

@@ -7,6 +7,7 @@
 #include <utility>
 #include <vector>
 
+#include "notation.h"
 #include "token.h"
 #include "walk.h"
 
@@ -294,6 +295,10 @@ class JsonLines : public Rows {
       if (!row.piece->is_container()) {
         line["value"] = value_of(*row.piece);
       }
+      if (has_no_text(*row.piece)) {
+        const bool in_hex = form_ == BytesForm::kHex;
+        line["bytes"] = to_notation(row.piece->bytes, in_hex ? Notation::kHex : Notation::kBase64);
+      }
     } else if (row.is_problem) {
       line["type"] = "broken";
     } else {
@@ -306,6 +311,12 @@ class JsonLines : public Rows {
  private:
   static std::string step(const Piece& piece) {
     return piece.is_known ? piece.field->name() : std::to_string(piece.number);
+  }
+
+  // Whether JSON cannot have the text as it is. Of what is of type bytes, the value is no text.
+  static bool has_no_text(const Piece& piece) {
+    const bool is_bytes = piece.is_known && piece.field->type() == FieldDescriptor::TYPE_BYTES;
+    return piece.kind == Piece::kBytes && !is_bytes && !is_utf8(piece.bytes);
   }
 
   std::string path_to(const Piece& piece) const {

@@ -41,9 +41,9 @@ std::string read_source(const Call& call, const std::string& name) {
                ? from_notation(notation == Notation::kHex ? call.hex : call.base64, notation)
                : read_bytes(name, notation);
   } catch (const Misread& misread) {
-    throw Failure{kBroken, std::string("the input is no ") +
-                               (notation == Notation::kHex ? "hex" : "base64") + ": " +
-                               misread.text()};
+    const std::string what = call.files.size() > 1 ? named(name) : "the input";
+    throw Failure{kBroken, what + " is no " + (notation == Notation::kHex ? "hex" : "base64") +
+                               ": " + misread.text()};
   }
 }
 
@@ -101,6 +101,7 @@ class Messages {
     for (const std::string& note : capture.notes) {
       complain(source + note);
     }
+    status_ = std::max(status_, capture.is_broken ? kBroken : kDone);
     std::vector<Arrived> all;
     for (const Stream& stream : capture.streams) {
       const std::string place = source + stream.from + " -> " + stream.to + ", ";

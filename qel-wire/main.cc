@@ -219,11 +219,15 @@ void read_message(const Call& call, google::protobuf::Message* message) {
   }
 }
 
+void refuse_bytes(const Call& call) {
+  if (call.has_bytes()) {
+    throw Failure{kWrongCall, call.command + " takes no bytes in --hex or --base64"};
+  }
+}
+
 int encode(const Call& call) {
   const auto message = qel_wire::new_message(message_of(call.message));
-  if (call.has_bytes()) {
-    throw Failure{kWrongCall, "encode takes a text: --hex and --base64 have no bytes there"};
-  }
+  refuse_bytes(call);
   read_message(call, message.get());
   if (call.notation() == Notation::kRaw) {
     message->SerializeToOstream(&std::cout);
@@ -322,7 +326,8 @@ int session(const Call& call) {
 }
 
 int diff(const Call& call) {
-  if (call.has_bytes() || call.files[0] == call.files[1]) {
+  refuse_bytes(call);
+  if (call.files[0] == call.files[1]) {
     throw Failure{kWrongCall, "diff takes two different files"};
   }
   const std::string message = call.message.empty() ? "auto" : call.message;

@@ -35,8 +35,10 @@ std::string values_of(const CLI::Option& option) {
   if (values == "MESSAGE") {
     return joined(message_names());
   }
+  // What stands for a value is in capitals.
+  const bool is_known = !values.empty() && std::islower(static_cast<unsigned char>(values[0])) != 0;
   std::replace(values.begin(), values.end(), '|', ' ');
-  return has_value(option) && values != option.get_type_name() ? values : "";
+  return is_known ? values : "";
 }
 
 // The words that may be the command's first argument; if there are none, that is a file.
@@ -107,10 +109,12 @@ std::string options_in_bash(const CLI::App& command) {
 std::string bash(const CLI::App& app) {
   std::ostringstream names;
   std::ostringstream cases;
+  std::set<std::string> with_value;
   std::set<std::string> values;
   const auto add_values = [&](const CLI::App& command) {
     for (const CLI::Option* option : options_of(command)) {
-      if (!values_of(*option).empty()) {
+      if (has_value(*option)) {
+        with_value.insert("--" + option->get_lnames().front());
         values.insert("      --" + option->get_lnames().front() + ") choices='" +
                       values_of(*option) + "' ;;\n");
       }
@@ -126,12 +130,15 @@ std::string bash(const CLI::App& app) {
   return R"(# Bash completion of qel-wire, made from its table of commands.
 _qel_wire() {
   local word=${COMP_WORDS[COMP_CWORD]} before=() option='' options='' words='' choices='' i
-  # An option's value comes as "=" and a word.
+  local with_value=' )" +
+         joined({with_value.begin(), with_value.end()}) +
+         R"( '
+  # An option's value comes as "=" and a word, or as a word alone.
   for ((i = 1; i < COMP_CWORD; ++i)); do
     case ${COMP_WORDS[i]} in
       -*) option=${COMP_WORDS[i]} ;;
       =) ((i + 1 == COMP_CWORD)) || { ((++i)) && option=''; } ;;
-      *) before+=("${COMP_WORDS[i]}") option='' ;;
+      *) [[ $with_value == *" $option "* ]] || before+=("${COMP_WORDS[i]}"); option='' ;;
     esac
   done
   case ${before[0]-} in
@@ -140,7 +147,7 @@ _qel_wire() {
   esac
   [[ $word != = ]] || word=''
   COMPREPLY=()
-  if [[ -n $option && (${COMP_WORDS[COMP_CWORD]} == = || ${COMP_WORDS[COMP_CWORD - 1]} == =) ]]; then
+  if [[ $with_value == *" $option "* || ${COMP_WORDS[COMP_CWORD]} == = || ${COMP_WORDS[COMP_CWORD - 1]} == = ]]; then
     case $option in
 )" + std::accumulate(values.begin(), values.end(), std::string()) +
          R"(    esac

@@ -33,7 +33,8 @@ std::string from_base64(std::string_view text) {
         "ABCDEFGHIJKLMNOPQRSTUVWXYZabcdefghijklmnopqrstuvwxyz0123456789+/-_= \t\r\n\f\v");
     throw stray != std::string_view::npos
         ? misread_at(text, stray, "a character that base64 does not have")
-        : misread_at(text, text.size(), "the base64 ends too early, or has '=' within it");
+        : misread_at(text, text.size(),
+                     "the base64 ends too early, has '=' within it, or bits that are no byte");
   }
   bytes.resize(size);
   return bytes;

@@ -453,7 +453,8 @@ Capture read_capture(const std::string& file) {
   for (const auto& [remark, packets] : remarks) {
     capture.notes.push_back(counted(packets, "packet") + std::string(remark));
   }
-  if (status == PCAP_ERROR) {
+  capture.is_broken = status == PCAP_ERROR;
+  if (capture.is_broken) {
     capture.notes.push_back("nothing is read behind packet " + std::to_string(count) + ": " +
                             pcap_geterr(pcap.get()));
   }

@@ -42,7 +42,8 @@ struct Stream {
 
 struct Capture {
   std::vector<Stream> streams;     // by connection; in there first the client's, by their offsets
-  std::vector<std::string> notes;  // what was left out, and whether reading ends early
+  std::vector<std::string> notes;  // what was left out, and why reading ends early
+  bool is_broken = false;          // whether it does
 };
 
 // Whether the bytes begin as a file of pcap or pcapng does.

@@ -3,7 +3,10 @@
 #include <strings.h>
 
 #include <algorithm>
+#include <functional>
 #include <optional>
+#include <unordered_map>
+#include <utility>
 
 #include "failure.h"
 #include "merged.h"
@@ -170,34 +173,30 @@ std::optional<int> compare(const Piece& piece, const std::string& text) {
 
 // ---- Differences
 
-// The places of a message's fields and their values, in their order: what is shown, and the bytes
-// of a text that is not. Other hidden fields are left out.
+// A value as it is shown, and the bytes of a text that is not.
+using Value = std::pair<std::string, std::string_view>;
+
+// Calls take(place, value) for each field of a message, but for what is left out because it is
+// hidden.
 class Values : public Paths {
  public:
-  using Value = std::pair<std::string, std::string_view>;
+  using Take = std::function<void(const std::string& place, const Value& value)>;
 
-  Values(std::string_view bytes, const Descriptor& type, bool show_token)
-      : list{{"message", {type.name(), ""}}}, bytes_(bytes) {
-    walk_merged(bytes, type, show_token ? Hidden() : Hidden(bytes, type), this);
-    by_place = {list.begin(), list.end()};
-  }
-
-  std::vector<std::pair<std::string, Value>> list;
-  std::map<std::string, Value> by_place;
+  Values(std::string_view bytes, Take take) : bytes_(bytes), take_(std::move(take)) {}
 
  private:
   void field(const std::string& /*path*/, const std::string& place, const Piece& piece) override {
     if (!piece.is_container()) {
       const size_t hidden = piece.is_hidden ? piece.end - piece.value_offset : 0;
-      list.push_back(
-          {place,
-           {value_in_text(piece, BytesForm::kUsual), bytes_.substr(piece.value_offset, hidden)}});
+      take_(place,
+            {value_in_text(piece, BytesForm::kUsual), bytes_.substr(piece.value_offset, hidden)});
     }
   }
 
-  void nothing_in(const std::string& place) override { list.push_back({place, {"{}", ""}}); }
+  void nothing_in(const std::string& place) override { take_(place, {"{}", ""}); }
 
   std::string_view bytes_;
+  Take take_;
 };
 
 }  // namespace
@@ -262,7 +261,8 @@ void Condition::parse(const std::string& text) {
     return text.compare(end, std::string_view(sign.first).size(), sign.first) == 0;
   });
   const bool has_sign = end < text.size();
-  if (path_.empty() || (has_sign && (is_absent || found == std::end(kSigns)))) {
+  if (path_.find_first_not_of(' ') == std::string::npos ||
+      (has_sign && (is_absent || found == std::end(kSigns)))) {
     throw Failure{kWrongCall, "a condition is PATH, !PATH or PATH=VALUE, not '" + text + "'"};
   }
   if (has_sign) {
@@ -292,8 +292,10 @@ Condition::Condition(const std::string& text, const Descriptor* type) {
       members = member_names(*field->enum_type());
     }
   }
-  throw Failure{kWrongCall, "'" + path_ + "' has no value such as '" + value_ + "'" +
-                                did_you_mean(value_, members)};
+  throw Failure{kWrongCall, sign_ == Sign::kHasWithin
+                                ? "'" + path_ + "' is no text, which '~' looks into"
+                                : "'" + path_ + "' has no value such as '" + value_ + "'" +
+                                      did_you_mean(value_, members)};
 }
 
 bool Condition::holds(std::string_view bytes, const Descriptor& type, const Hidden& hidden) const {
@@ -305,28 +307,39 @@ bool Condition::holds(std::string_view bytes, const Descriptor& type, const Hidd
 bool diff(std::string_view first, const Descriptor& first_type, std::string_view second,
           const Descriptor& second_type, bool show_token, const Colours& colours,
           std::ostream* out) {
-  const Values before(first, first_type, show_token);
-  const Values after(second, second_type, show_token);
-  bool is_different = false;
-  const auto write = [&](char sign, const std::string& colour, const auto& field) {
-    is_different = true;
-    *out << colour << sign << ' ' << field.first << ": " << field.second.first << colours.end
-         << '\n';
+  const auto for_each_value = [&](std::string_view bytes, const Descriptor& type,
+                                  const Values::Take& take) {
+    take("message", {type.name(), ""});
+    Values values(bytes, take);
+    walk_merged(bytes, type, show_token ? Hidden() : Hidden(bytes, type), &values);
   };
-  for (const auto& field : before.list) {
-    const auto other = after.by_place.find(field.first);
-    if (other == after.by_place.end()) {
-      write('-', colours.wrong, field);
-    } else if (other->second != field.second) {
-      write('-', colours.wrong, field);
-      write('+', colours.value, *other);
+  bool is_different = false;
+  const auto write = [&](char sign, const std::string& place, const Value& value) {
+    is_different = true;
+    *out << (sign == '-' ? colours.wrong : colours.value) << sign << ' ' << place << ": "
+         << value.first << colours.end << '\n';
+  };
+  std::unordered_map<std::string, Value> others;  // of the second that the first has not had yet
+  for_each_value(second, second_type, [&](const std::string& place, const Value& value) {
+    others.emplace(place, value);
+  });
+  for_each_value(first, first_type, [&](const std::string& place, const Value& value) {
+    const auto other = others.find(place);
+    if (other == others.end()) {
+      write('-', place, value);
+      return;
     }
-  }
-  for (const auto& field : after.list) {
-    if (before.by_place.count(field.first) == 0) {
-      write('+', colours.value, field);
+    if (other->second != value) {
+      write('-', place, value);
+      write('+', place, other->second);
     }
-  }
+    others.erase(other);
+  });
+  for_each_value(second, second_type, [&](const std::string& place, const Value& value) {
+    if (others.count(place) > 0) {
+      write('+', place, value);
+    }
+  });
   return is_different;
 }
 

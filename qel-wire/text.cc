@@ -182,7 +182,7 @@ std::string utc(int64_t milliseconds) {
 }
 
 bool is_plausible_time(int64_t milliseconds) {
-  return milliseconds > 946684800000 && milliseconds < 4102444800000;
+  return milliseconds >= 946684800000 && milliseconds < 4102444800000;
 }
 
 Colours::Colours(bool on) {

@@ -98,10 +98,9 @@ void Level::note(Piece* piece) {
   if ((seen_ & bit) != 0 && !piece->field->is_repeated()) {
     piece->earlier = offsets_[index];
   }
-  piece->is_late = piece->field->number() < highest_;
+  piece->is_late = piece->number < highest_;
   seen_ |= bit;
   offsets_[index] = static_cast<uint32_t>(piece->offset);
-  highest_ = std::max(highest_, piece->field->number());
 }
 
 bool Reader::fail(const Level& level, const Piece& piece, size_t offset,
@@ -185,6 +184,7 @@ bool Reader::field(Level* level, uint64_t tag, Piece* piece) {
       level->note(piece);
     }
   }
+  level->highest_ = std::max(level->highest_, piece->number);
   switch (wire_type) {
     case WireFormatLite::WIRETYPE_VARINT:
       return number(*level, "the number of ", piece);

@@ -35,7 +35,7 @@ struct Piece {
   // Whether the wire type is the field's. Where it is not, or there is no such field, the runtime
   // keeps the piece as an unknown field.
   bool is_known = false;
-  // Whether a known field with a higher number came before it, which no encoder writes.
+  // Whether a field with a higher number came before this known one, which no encoder writes.
   bool is_late = false;
   // Of a known field that is not repeated and was there before: the offset where. The runtime keeps
   // the later value; embedded messages are merged.
@@ -118,7 +118,7 @@ class Level {
   // The known fields that were read.
   uint64_t seen_ = 0;                 // a bit each, by its index
   std::array<uint32_t, 64> offsets_;  // where it was last, if its bit is set
-  int highest_ = 0;                   // number
+  uint32_t highest_ = 0;              // number of all that were read
 };
 
 class Reader {

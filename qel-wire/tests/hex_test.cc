@@ -518,7 +518,7 @@ const std::vector<Form> kMistakes = {
     {"end_lost", "00000000  08 07 60 2a  |..`*|\n00000005\n",
      "2:1: an offset that does not follow from the 4 bytes above"},
     {"second_packet", "\t0x0000:  0807 602a\n12:00 IP\n\t0x0000:  0807\n",
-     "2:1: no offset before the bytes, as in the lines above"},
+     "2:1: another dump begins: only one is read"},
     {"second_dump", "00000000: 0807\n\n00000000: 0807\n",
      "3:1: another dump begins: only one is read"},
     {"one_row_of_a_part", "0010   08 07\n",

@@ -520,6 +520,7 @@ TEST(Capture, ThatBreaksOff_IsReadUpToThere) {
   const std::string file = pcap(kExchange);
   for (const size_t missing : {1U, 40U, 41U, 55U}) {  // in the last packet, and before it
     qel_wire::Capture capture = read_capture(file.substr(0, file.size() - missing));
+    EXPECT_TRUE(capture.is_broken);
     ASSERT_EQ(capture.notes.size(), 1U);
     EXPECT_EQ(capture.notes[0].rfind("nothing is read behind packet 8: truncated", 0), 0U);
     capture.notes.clear();

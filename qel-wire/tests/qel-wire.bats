@@ -97,12 +97,25 @@ requestId: 7" ]
   [[ $stderr == *', of a connection that was reset' ]]
 }
 
-@test "a message does not answer one of its own end" {
-  capture chat.pcap <<'end'
-> ChatRequest requestId: 7
-> ChatReply requestId: 7
+@test "a message does not answer one of its own end, of another connection, or with another requestId" {
+  capture own.pcap <<<$'> ChatRequest requestId: 7\n> ChatReply requestId: 7'
+  capture other.pcap <<<$'> ChatRequest requestId: 7\n< ChatReply requestId: 8'
+  capture one.pcap <<<'> ChatRequest requestId: 7'
+  capture two.pcap <<<'< ChatReply requestId: 7'
+  for files in own.pcap other.pcap 'one.pcap two.pcap'; do
+    # shellcheck disable=SC2086
+    qel-wire session --frames=example $files 2>/dev/null | grep 'no answer to 1, ChatRequest'
+  done
+}
+
+@test "an empty message has its own place and time" {
+  capture chat.pcap <<<$'> ClientEcho\n< ClientEchoReply\n> ClientEcho requestId: 1'
+  qel-wire session --frames=example chat.pcap 2>/dev/null | grep -oE '0[0-9]\.000.*' | head -n 3 >listed
+  diff listed - <<'end'
+00.000 UTC  received  ClientEcho, 0 bytes
+01.000 UTC  sent      ClientEchoReply, 0 bytes
+02.000 UTC  received  ClientEcho, 2 bytes, requestId 1
 end
-  qel-wire session --frames=example chat.pcap 2>/dev/null | grep 'no answer to 1, ChatRequest'
 }
 
 @test "its page has every option" {
@@ -208,11 +221,14 @@ completed() {
 @test "Bash goes on behind values" {
   [ "$(completed --color = never exp)" = explain ]
   [ "$(completed explain --hex = 0807 ChatR)" = 'ChatRequest ChatReply' ]
+  [ "$(completed explain --frames u16 ChatR)" = 'ChatRequest ChatReply' ]
 }
 
 @test "Bash completes values" {
   [ "$(completed --color =)" = 'always never auto' ]
   [ "$(completed decode --frames = u3)" = 'u32 u32le' ]
+  [ "$(completed decode --frames u3)" = 'u32 u32le' ]
+  [ "$(completed decode --bytes =)" = hex ]
   [ "$(completed decode --hex = a)" = '' ]
 }
 

@@ -60,6 +60,14 @@ TEST(Walk, OfMoreThan64MiB_IsBroken) {
   EXPECT_EQ(problem->reason, "more than 64 MiB, which no call takes");
 }
 
+// The reader notes in 64 bits which fields it has seen.
+TEST(Schema, EveryMessage_HasAtMost64Fields) {
+  const auto& file = qel_wire::schema_file();
+  for (int i = 0; i < file.message_type_count(); ++i) {
+    EXPECT_LE(file.message_type(i)->field_count(), 64) << file.message_type(i)->name();
+  }
+}
+
 // Padded or not, of both alphabets, broken into lines.
 TEST(Base64, OfEveryKind_IsRead) {
   for (const char* text : {"+/8BAg==", "+/8BAg", "-_8BAg==", "-_8BAg", "+/8B\nAg==\n"}) {
