@@ -163,20 +163,14 @@ class Table : public Rows {
     size_t at = 0;
     do {
       const size_t in_row = std::min(shown - at, kBytesInRow);
-      std::string line;
-      for (size_t byte = row.offset + at; byte < row.offset + at + in_row; ++byte) {
-        line += ' ';
-        if (hidden_.at(byte)) {
-          line += "**";
-        } else {
-          append_hex(bytes_[byte], &line);
-        }
-      }
+      out_ << colours_.quiet << offset_of(row.offset + at) << colours_.end << ' '
+           << bytes_in_row(row.offset + at, in_row);
       if (at == 0) {
         const size_t indent = 2 * static_cast<size_t>(row.depth);
-        line += std::string(3 * (kBytesInRow - in_row) + 2 + indent, ' ') + meaning_of(row);
+        out_ << std::string(3 * (kBytesInRow - in_row) + 2 + indent, ' ');
+        write_meaning(row);
       }
-      out_ << colours_.quiet << offset_of(row.offset + at) << colours_.end << ' ' << line << '\n';
+      out_ << '\n';
       at += in_row;
     } while (at < shown);
     if (shown < size) {
@@ -185,70 +179,89 @@ class Table : public Rows {
   }
 
  private:
-  std::string meaning_of(const Row& row) const {
+  std::string bytes_in_row(size_t offset, size_t size) const {
+    std::string text;
+    for (size_t at = offset; at < offset + size; ++at) {
+      text += ' ';
+      if (hidden_.at(at)) {
+        text += "**";
+      } else {
+        append_hex(bytes_[at], &text);
+      }
+    }
+    return text;
+  }
+
+  void write_meaning(const Row& row) {
     if (row.is_problem) {
-      return colours_.wrong + row.meaning + colours_.end;
+      out_ << colours_.wrong << row.meaning << colours_.end;
+      return;
     }
-    std::string doubts;
-    for (const std::string& doubt : row.doubts) {
-      doubts += (doubts.empty() ? "" : "; ") + doubt;
+    out_ << row.meaning;
+    if (row.piece != nullptr) {
+      write_name(*row.piece);
+      out_ << type_of(*row.piece);
+      write_value(*row.piece);
     }
-    return (row.piece != nullptr ? name_of(*row.piece) + type_of(*row.piece) + value_of(*row.piece)
-                                 : row.meaning) +
-           (doubts.empty() ? "" : "  " + colours_.doubt + "! " + doubts + colours_.end);
+    for (size_t i = 0; i < row.doubts.size(); ++i) {
+      out_ << (i == 0 ? "  " + colours_.doubt + "! " : "; ") << row.doubts[i];
+    }
+    out_ << (row.doubts.empty() ? "" : colours_.end);
   }
 
-  std::string name_of(const Piece& piece) const {
-    const std::string name = piece.field != nullptr ? piece.field->name() : "?";
-    return piece.is_element()
-               ? ""
-               : std::to_string(piece.number) + " " + colours_.name + name + colours_.end + " ";
+  void write_name(const Piece& piece) {
+    if (!piece.is_element()) {
+      out_ << piece.number << ' ' << colours_.name
+           << (piece.field != nullptr ? piece.field->name() : "?") << colours_.end << ' ';
+    }
   }
 
-  std::string coloured(const std::string& value) const {
-    return " = " + colours_.value + value + colours_.end;
-  }
-
-  std::string value_of(const Piece& piece) const {
+  void write_value(const Piece& piece) {
     switch (piece.kind) {
       case Piece::kVarint:
-        return coloured(number_of(piece)) + time_beside(piece);
       case Piece::kFixed64:
       case Piece::kFixed32:
-        return coloured(value_in_text(piece, options_.bytes_form));
+        write_number(piece);
+        return;
       case Piece::kBytes:
-        return text_of(piece);
+        write_text(piece);
+        return;
       case Piece::kGroup:
-        return "";
+        return;
       default:
-        return (piece.kind == Piece::kPacked ? ", packed, " : ", ") +
-               counted(piece.end - piece.value_offset, "byte");
+        out_ << (piece.kind == Piece::kPacked ? ", packed" : "");
+        write_size(piece);
     }
   }
 
-  std::string number_of(const Piece& piece) const {
-    const std::string value = value_in_text(piece, options_.bytes_form);
-    const bool has_name =
-        piece.is_known && piece.field->enum_type() != nullptr && !piece.is_no_member();
-    return has_name ? value + " (" + std::to_string(piece.low_32_bits()) + ")" : value;
-  }
-
-  std::string time_beside(const Piece& piece) const {
+  void write_number(const Piece& piece) {
+    out_ << " = " << colours_.value << value_in_text(piece, options_.bytes_form);
+    if (piece.is_known && piece.field->enum_type() != nullptr && !piece.is_no_member()) {
+      out_ << " (" << piece.low_32_bits() << ')';
+    }
+    out_ << colours_.end;
     const std::string time = time_of(piece);
-    return time.empty() ? "" : "  " + colours_.quiet + "(" + time + ")" + colours_.end;
+    if (!time.empty()) {
+      out_ << "  " << colours_.quiet << '(' << time << ')' << colours_.end;
+    }
   }
 
-  std::string text_of(const Piece& piece) const {
-    const std::string size = ", " + counted(piece.end - piece.value_offset, "byte");
+  void write_text(const Piece& piece) {
     if (piece.is_hidden) {
-      return " = " + std::string(piece.bytes) + size;
+      out_ << " = " << piece.bytes;
+    } else {
+      const size_t shown = options_.show_all ? piece.bytes.size() : kMostShown;
+      Piece beginning = piece;
+      beginning.bytes = piece.bytes.substr(0, whole_characters(piece.bytes, shown));
+      out_ << " = " << colours_.value;
+      write_in_text(beginning, options_.bytes_form, &out_);
+      out_ << (piece.bytes.size() > shown ? "..." : "") << colours_.end;
     }
-    const size_t shown = options_.show_all ? piece.bytes.size() : kMostShown;
-    Piece beginning = piece;
-    beginning.bytes = piece.bytes.substr(0, whole_characters(piece.bytes, shown));
-    return coloured(value_in_text(beginning, options_.bytes_form) +
-                    (piece.bytes.size() > shown ? "..." : "")) +
-           size;
+    write_size(piece);
+  }
+
+  void write_size(const Piece& piece) {
+    out_ << ", " << counted(piece.end - piece.value_offset, "byte");
   }
 
   // Not in the middle of a character.
@@ -329,10 +342,11 @@ class JsonLines : public Rows {
   }
 
   nlohmann::json value_of(const Piece& piece) const {
-    if (piece.is_known) {
-      return nlohmann::json::parse(value_in_json(piece, form_));
+    if (piece.kind == Piece::kBytes) {
+      return text_in_json(piece, form_);
     }
-    return piece.kind == Piece::kBytes ? std::string(piece.bytes) : value_in_text(piece, form_);
+    return piece.is_known ? nlohmann::json::parse(number_in_json(piece))
+                          : nlohmann::json(value_in_text(piece, form_));
   }
 
   const std::string& type_;

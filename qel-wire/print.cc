@@ -3,6 +3,7 @@
 #include <cstdio>
 #include <nlohmann/json.hpp>
 #include <sstream>
+#include <utility>
 #include <vector>
 
 #include "merged.h"
@@ -105,7 +106,8 @@ class JsonPrinter : public Visitor {
         const bool is_text =
             piece.kind == Piece::kBytes && piece.field->type() == FieldDescriptor::TYPE_STRING;
         lost_.replaced += is_text && !is_utf8(piece.bytes) ? 1 : 0;
-        out_ << value_in_json(piece, form_);
+        out_ << (piece.kind == Piece::kBytes ? quoted(text_in_json(piece, form_))
+                                             : number_in_json(piece));
       }
     }
   }
@@ -125,6 +127,13 @@ class JsonPrinter : public Visitor {
   }
 
  private:
+  // Characters outside ASCII are escaped, as most printers of JSON do; what is no UTF-8 is
+  // replaced.
+  static std::string quoted(std::string text) {
+    return nlohmann::json(std::move(text))
+        .dump(-1, ' ', true, nlohmann::json::error_handler_t::replace);
+  }
+
   void begin_value(const FieldDescriptor& field) {
     const FieldDescriptor*& last = objects_.back();
     if (last == &field) {  // the next of a list
@@ -200,18 +209,18 @@ std::string value_in_text(const Piece& piece, BytesForm form) {
   return text.str();
 }
 
-std::string value_in_json(const Piece& piece, BytesForm form) {
-  if (piece.kind != Piece::kBytes) {
-    const auto type = piece.field->type();
-    const bool is_text = type == FieldDescriptor::TYPE_INT64 || type == FieldDescriptor::TYPE_ENUM;
-    return is_text ? '"' + known_number(piece) + '"' : known_number(piece);
-  }
-  const bool is_bytes = piece.field->type() == FieldDescriptor::TYPE_BYTES && !piece.is_hidden;
-  const Notation notation = form == BytesForm::kHex ? Notation::kHex : Notation::kBase64;
-  // Characters outside ASCII are escaped, as most printers of JSON do; what is no UTF-8 is
-  // replaced.
-  return nlohmann::json(is_bytes ? to_notation(piece.bytes, notation) : std::string(piece.bytes))
-      .dump(-1, ' ', true, nlohmann::json::error_handler_t::replace);
+std::string number_in_json(const Piece& piece) {
+  const auto type = piece.field->type();
+  const bool is_text = type == FieldDescriptor::TYPE_INT64 || type == FieldDescriptor::TYPE_ENUM;
+  return is_text ? '"' + known_number(piece) + '"' : known_number(piece);
+}
+
+std::string text_in_json(const Piece& piece, BytesForm form) {
+  const bool is_bytes =
+      piece.is_known && piece.field->type() == FieldDescriptor::TYPE_BYTES && !piece.is_hidden;
+  return is_bytes ? to_notation(piece.bytes,
+                                form == BytesForm::kHex ? Notation::kHex : Notation::kBase64)
+                  : std::string(piece.bytes);
 }
 
 std::string time_of(const Piece& piece) {

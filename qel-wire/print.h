@@ -37,8 +37,10 @@ NotInJson print_json(std::string_view bytes, const google::protobuf::Descriptor&
 // A number or a text as the text form has it.
 void write_in_text(const Piece& piece, BytesForm form, std::ostream* out);
 std::string value_in_text(const Piece& piece, BytesForm form);
-// The same as JSON has it: a known field's value.
-std::string value_in_json(const Piece& piece, BytesForm form);
+// The same as JSON has it: a known field's number, and what stands between the quotes of a text
+// before anything is escaped.
+std::string number_in_json(const Piece& piece);
+std::string text_in_json(const Piece& piece, BytesForm form);
 // "2023-11-14 22:13:20.000 UTC" of a number that is a time, otherwise nothing.
 std::string time_of(const Piece& piece);
 
