@@ -56,7 +56,7 @@ class Notes : public Visitor {
 std::optional<Problem> check(std::string_view bytes, const google::protobuf::Descriptor& type,
                              const Hidden& hidden, std::vector<std::string>* notes) {
   Notes visitor(hidden);
-  const auto problem = walk(bytes, type, &visitor);
+  std::optional<Problem> problem = walk(bytes, type, &visitor);
   visitor.add_to(notes);
   return problem;
 }

@@ -352,7 +352,7 @@ int diff(const Call& call) {
                                    std::to_string(problem->offset) + ": " + problem->reason};
       }
       for (const std::string& note : notes) {
-        qel_wire::complain(file + ": " + note);
+        qel_wire::complain(std::string(file).append(": ").append(note));
       }
       sides.push_back({std::string(found.bytes), &type});
       return kDone;
