@@ -239,7 +239,7 @@ bool is_command(CLI::App* app, const std::string& word) {
   return !app->get_subcommands([&](CLI::App* each) { return each->check_name(word); }).empty();
 }
 
-// What stands behind "--" are files: as "./-x", the library does not take them for options.
+// Words behind "--" are files: written "./-x", the library takes them for no options.
 void name_files(std::vector<std::string>* arguments) {
   const auto mark = std::find(arguments->begin(), arguments->end(), "--");
   if (mark == arguments->end()) {
@@ -307,11 +307,12 @@ Call read_call(int argc, char** argv) {
     return call;
   } catch (const CLI::ArgumentMismatch& error) {
     const std::string what = error.what();
-    const bool has_value = what.find("flag override") != std::string::npos;
-    const size_t missing = what.find(": 1 required ");
-    refuse(has_value ? "--" + what.substr(0, what.find(' ')) + " takes no value"
-           : missing != std::string::npos ? what.substr(0, missing) + " needs a value"
-                                          : what,
+    const auto says = [&](const char* words) { return what.find(words) != std::string::npos; };
+    const std::string name = what.substr(0, what.find(':'));
+    refuse(says("flag override") ? "--" + what.substr(0, what.find(' ')) + " takes no value"
+           : says("At Most")     ? name + " is given too often"
+           : says("At least")    ? name + " is not given often enough"
+                                 : name + " needs a value",
            chosen());
   } catch (const CLI::ParseError& error) {
     refuse(error.what(), chosen());

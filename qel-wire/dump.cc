@@ -274,7 +274,8 @@ class Dump {
     const bool may_be_reversed = beside == visible(reversed);
     if (beside == shown) {
       // Both "xxd -g4" and "xxd -e" print such groups.
-      const bool may_be_open = base_ == 0 && (size_ == 4 || size_ == 8) && !is_order_shown_;
+      const bool may_be_open =
+          base_ == 0 && size_ > 2 && (size_ & (size_ - 1)) == 0 && !is_order_shown_;
       is_order_shown_ = is_order_shown_ || !may_be_reversed;
       is_order_open_ = may_be_open && may_be_reversed;
       return;

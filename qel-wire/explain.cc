@@ -375,16 +375,19 @@ class Explanation : public Visitor {
              false, doubts_of(shown)});
     }
     if (piece.is_container()) {
+      containers_left_out_.push_back(is_left_out);
       rows_.begin(piece, is_left_out);
     }
   }
 
   void end(const Piece& piece) override {
     rows_.end();
+    const bool is_left_out = containers_left_out_.back();
+    containers_left_out_.pop_back();
     if (piece.kind != Piece::kGroup) {  // others have no bytes at their end
       return;
     }
-    if (hidden_.hides_end(piece)) {
+    if (is_left_out || hidden_.hides_end(piece)) {
       leave_out(piece.end_tag, piece.end, piece.depth);
     } else {
       write({piece.end_tag,
@@ -438,6 +441,7 @@ class Explanation : public Visitor {
   const Hidden& hidden_;
   Rows& rows_;
   Row left_out_;
+  std::vector<bool> containers_left_out_;  // around the next piece, whether their beginnings are
 };
 
 }  // namespace

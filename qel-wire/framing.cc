@@ -127,12 +127,21 @@ void cut_run(std::string_view stream, const TakeFrame& take) {
 }  // namespace
 
 size_t first_frame(std::string_view stream, const std::string& frames) {
-  size_t at = 0;
-  while (frames == "example" && at < stream.size() &&
-         schema_file().FindMessageTypeByName(example(stream.substr(at)).name) == nullptr) {
-    ++at;
+  if (frames != "example") {
+    return 0;
   }
-  return at;
+  const Head first = example(stream);
+  if (!first.name.empty() && problem_of_head(first, stream.size()).empty()) {
+    return 0;  // whatever its name
+  }
+  for (size_t at = 1; at + 1 < stream.size(); ++at) {
+    const std::string_view name = stream.substr(at + 1, static_cast<unsigned char>(stream[at]));
+    if (!name.empty() && std::isupper(static_cast<unsigned char>(name.front())) != 0 &&
+        schema_file().FindMessageTypeByName(std::string(name)) != nullptr) {
+      return at;
+    }
+  }
+  return 0;
 }
 
 std::string cut(std::string_view stream, const std::string& frames, const TakeFrame& take,

@@ -22,7 +22,7 @@ struct Frame {
 using TakeFrame = std::function<void(const Frame& frame)>;
 
 // Where the first frame begins in a stream that may begin within a message, if its framing has the
-// names of messages, by which frames are found; the stream's size if there is none.
+// names of messages, by which frames are found; otherwise 0.
 size_t first_frame(std::string_view stream, const std::string& frames);
 
 // Lets take have each message, from the offset on. Split takes messages that follow each other with

@@ -79,11 +79,9 @@ struct Schema {
 // What the bytes have of a field.
 struct Field {
   size_t count = 0;  // how often it was there
-  size_t odd = 0;    // how often no encoder writes it so
-  size_t first = 0;  // when it was there first
+  size_t odd = 0;    // how often no encoder writes it so, wherever it stands
   Fitting fitting;
-  std::vector<size_t> counts;  // of all fields, when it was there first
-  bool is_broken = false;      // no message that has it reads on
+  bool is_broken = false;  // no message that has it reads on
 };
 
 bool takes(const FieldDescriptor& field, Piece::Kind kind) {
@@ -127,29 +125,29 @@ class Race {
   void take(const Piece& piece) {
     ++count_;
     odd_ += piece.is_odd() ? 1 : 0;
+    const bool is_late = piece.number < highest_;
+    highest_ = std::max(highest_, piece.number);
     if (piece.number >= schema_.by_number.size()) {
       return;
     }
     for (const size_t index : schema_.by_number[piece.number]) {
       if (!fields_[index].is_broken && takes(*schema_.fields[index], piece.kind)) {
-        take(piece, index);
+        take(piece, is_late, index);
       }
     }
   }
 
-  void take(const Piece& piece, size_t index) {
+  void take(const Piece& piece, bool is_late, size_t index) {
     Field& field = fields_[index];
-    if (field.count == 0) {
-      field.first = count_;
-      for (const Field& other : fields_) {
-        field.counts.push_back(other.count);
-      }
-    }
-    ++field.count;
-    field.odd += piece.is_odd() ? 1 : 0;
     Piece known = piece;
     known.field = schema_.fields[index];
     known.is_known = true;
+    known.is_late = is_late;
+    if (field.count > 0 && !known.field->is_repeated()) {
+      known.earlier = 0;  // or anywhere
+    }
+    ++field.count;
+    field.odd += piece.is_odd() ? 1 : 0;
     if (piece.kind == Piece::kBytes && known.field->cpp_type() != FieldDescriptor::CPPTYPE_STRING) {
       known.kind = known.field->message_type() != nullptr ? Piece::kMessage : Piece::kPacked;
     }
@@ -211,29 +209,13 @@ class Race {
       }
       all.known += field.fitting.known;
       all.unknown += field.fitting.unknown;
-      all.doubtful += field.fitting.doubtful + out_of_place(of, index);
+      all.doubtful += field.fitting.doubtful;
       unknown -= field.count;
       odd -= field.odd;
     }
     fit.known = all.known;
     fit.unknown = all.unknown + unknown;
     fit.doubtful = all.doubtful + odd;
-  }
-
-  // How often the field was there again, though it is not repeated, or behind one with a higher
-  // number.
-  size_t out_of_place(const Schema::Message& message, size_t index) const {
-    const FieldDescriptor& field = *schema_.fields[index];
-    const Field* first_behind = nullptr;
-    for (const size_t other : message.fields) {
-      if (schema_.fields[other]->number() > field.number() && fields_[other].count > 0 &&
-          (first_behind == nullptr || fields_[other].first < first_behind->first)) {
-        first_behind = &fields_[other];
-      }
-    }
-    const size_t count = fields_[index].count;
-    const size_t before = first_behind == nullptr ? count : first_behind->counts[index];
-    return field.is_repeated() ? count - before : count - (before == 0 ? 0 : 1);
   }
 
   const Schema& schema_;
@@ -243,6 +225,7 @@ class Race {
   std::map<size_t, Tail> tails_;  // by the field's index
   size_t count_ = 0;              // of fields in the bytes
   size_t odd_ = 0;
+  uint32_t highest_ = 0;  // number
 };
 
 auto quality(const Fit& fit) {

@@ -325,50 +325,51 @@ int session(const Call& call) {
   return status;
 }
 
+// The message of the call's file.
+qel_wire::Side side_of(const qel_wire::Found& found, const Call& call) {
+  const std::string& file = call.files.front();
+  const Descriptor& type = is_auto(call.message)
+                               ? *qel_wire::guess(found.bytes).front().types.front()
+                               : message_of(call.message);
+  qel_wire::Side side{std::string(found.bytes), &type, {}};
+  if (!call.show_token) {
+    side.hidden = qel_wire::Hidden(side.bytes, type);
+  }
+  std::vector<std::string> notes;
+  if (const auto problem = qel_wire::check(side.bytes, type, side.hidden, &notes)) {
+    throw Failure{kBroken, qel_wire::named(file) + " is broken at offset " +
+                               std::to_string(problem->offset) + ": " + problem->reason};
+  }
+  const std::string place = file + ": ";
+  for (const std::string& note : notes) {
+    qel_wire::complain(place + note);
+  }
+  return side;
+}
+
 int diff(const Call& call) {
   refuse_bytes(call);
   if (call.files[0] == call.files[1]) {
     throw Failure{kWrongCall, "diff takes two different files"};
   }
-  const std::string message = call.message.empty() ? "auto" : call.message;
-  struct Side {
-    std::string bytes;
-    const Descriptor* type;
-  };
-  std::vector<Side> sides;
+  Call one = call;
+  one.message = call.message.empty() ? "auto" : call.message;
+  std::vector<qel_wire::Side> sides;
   for (size_t i = 0; i < call.files.size(); ++i) {
-    const std::string& file = call.files[i];
-    Call one = call;
-    one.files = {file};
+    one.files = {call.files[i]};
     qel_wire::for_each_message(one, [&](const qel_wire::Found& found) {
-      const Descriptor& type = is_auto(message)
-                                   ? *qel_wire::guess(found.bytes).front().types.front()
-                                   : message_of(message);
-      const auto hidden =
-          call.show_token ? qel_wire::Hidden() : qel_wire::Hidden(found.bytes, type);
-      std::vector<std::string> notes;
-      if (const auto problem = qel_wire::check(found.bytes, type, hidden, &notes)) {
-        throw Failure{kBroken, qel_wire::named(file) + " is broken at offset " +
-                                   std::to_string(problem->offset) + ": " + problem->reason};
-      }
-      for (const std::string& note : notes) {
-        qel_wire::complain(std::string(file).append(": ").append(note));
-      }
-      sides.push_back({std::string(found.bytes), &type});
+      sides.push_back(side_of(found, one));
       return kDone;
     });
     if (sides.size() != i + 1) {
       throw Failure{kWrongCall, "diff takes one message of each file"};
     }
   }
-  if (is_auto(message)) {
+  if (is_auto(one.message)) {
     std::cout << "# " << sides[0].type->name() << ", " << sides[1].type->name()
               << ", the best guesses\n";
   }
-  return qel_wire::diff(sides[0].bytes, *sides[0].type, sides[1].bytes, *sides[1].type,
-                        call.show_token, colours_of(call), &std::cout)
-             ? kBroken
-             : kDone;
+  return qel_wire::diff(sides[0], sides[1], colours_of(call), &std::cout) ? kBroken : kDone;
 }
 
 int schema(const Call& call) {

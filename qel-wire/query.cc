@@ -27,7 +27,7 @@ using google::protobuf::FieldDescriptor;
 class Paths : public Visitor {
  public:
   void begin(const Piece& piece) final {
-    const size_t index = levels_.back().counts[piece.number]++;
+    const size_t index = levels_.back().counts[{piece.number, piece.is_known}]++;
     const std::string name = piece.is_known ? piece.field->name() : std::to_string(piece.number);
     const bool is_counted = index > 0 || (piece.is_known && piece.field->is_repeated());
     const std::string dot = levels_.size() > 1 ? "." : "";
@@ -59,7 +59,7 @@ class Paths : public Visitor {
   struct Level {
     std::string path;
     std::string place;
-    std::map<uint32_t, size_t> counts;  // of fields, by their numbers
+    std::map<std::pair<uint32_t, bool>, size_t> counts;  // by number, and whether it is known
     bool is_empty = true;
   };
 
@@ -108,12 +108,15 @@ std::vector<const FieldDescriptor*> fields_of(const Descriptor* type, const std:
   return fields;
 }
 
-// Where the first step of the path begins that is the number of an unknown field. If there is none,
-// where one would begin behind the path.
+// Where the first step of the path begins that is the number of an unknown field; what is behind it
+// has numbers alone. If there is none, where one would begin behind the path.
 size_t begin_of_unknown(const std::string& path) {
   size_t begin = 0;
   while (begin <= path.size() && !is_decimal(path[begin])) {
     begin = std::min(path.find('.', begin), path.size()) + 1;
+  }
+  if (begin < path.size() && path.find_first_not_of("0123456789.", begin) != std::string::npos) {
+    throw Failure{kWrongCall, "'" + path + "': unknown fields have numbers, and no names"};
   }
   return begin;
 }
@@ -173,30 +176,40 @@ std::optional<int> compare(const Piece& piece, const std::string& text) {
 
 // ---- Differences
 
-// A value as it is shown, and the bytes of a text that is not.
-using Value = std::pair<std::string, std::string_view>;
+struct Value {
+  std::string text;
+  bool is_hidden = false;    // and so not shown
+  bool is_left_out = false;  // together with its place
+};
 
-// Calls take(place, value) for each field of a message, but for what is left out because it is
-// hidden.
+// Calls take(place, value) for each field of a message.
 class Values : public Paths {
  public:
   using Take = std::function<void(const std::string& place, const Value& value)>;
 
-  Values(std::string_view bytes, Take take) : bytes_(bytes), take_(std::move(take)) {}
+  Values(const Hidden& hidden, Take take) : hidden_(hidden), take_(std::move(take)) {}
 
  private:
   void field(const std::string& /*path*/, const std::string& place, const Piece& piece) override {
+    if (group_left_out_.has_value() && piece.depth <= *group_left_out_) {
+      group_left_out_.reset();  // it is over
+    }
+    const bool is_hidden = piece.kind != Piece::kMessage && hidden_.hides(piece);
     if (!piece.is_container()) {
-      const size_t hidden = piece.is_hidden ? piece.end - piece.value_offset : 0;
-      take_(place,
-            {value_in_text(piece, BytesForm::kUsual), bytes_.substr(piece.value_offset, hidden)});
+      take_(place, {value_in_text(piece, BytesForm::kUsual), is_hidden,
+                    group_left_out_.has_value() || (is_hidden && piece.kind != Piece::kBytes)});
+    } else if (is_hidden && !group_left_out_.has_value()) {
+      group_left_out_ = piece.depth;
     }
   }
 
-  void nothing_in(const std::string& place) override { take_(place, {"{}", ""}); }
+  void nothing_in(const std::string& place) override {
+    take_(place, {"{}", false, group_left_out_.has_value()});
+  }
 
-  std::string_view bytes_;
+  const Hidden& hidden_;
   Take take_;
+  std::optional<int> group_left_out_;  // the depth of the one around the last piece, or it is that
 };
 
 }  // namespace
@@ -276,8 +289,13 @@ Condition::Condition(const std::string& text, const Descriptor* type) {
   const size_t unknown = begin_of_unknown(path_);
   const auto fields = unknown > 0 ? fields_of(type, path_.substr(0, unknown - 1))
                                   : std::vector<const FieldDescriptor*>();
-  if (unknown <= path_.size()) {
-    return;  // of an unknown field, about which nothing is known
+  if (unknown <= path_.size()) {  // nothing is known of it, but of what it lies in
+    if (!fields.empty() && std::all_of(fields.begin(), fields.end(), [](const auto* field) {
+          return field->message_type() == nullptr;
+        })) {
+      throw Failure{kWrongCall, "'" + path_.substr(0, unknown - 1) + "' has no fields"};
+    }
+    return;
   }
   if (sign_ == Sign::kIsThere || sign_ == Sign::kIsAbsent) {
     return;
@@ -289,7 +307,8 @@ Condition::Condition(const std::string& text, const Descriptor* type) {
       return;
     }
     if (field->enum_type() != nullptr) {
-      members = member_names(*field->enum_type());
+      const std::vector<std::string> names = member_names(*field->enum_type());
+      members.insert(members.end(), names.begin(), names.end());
     }
   }
   throw Failure{kWrongCall, sign_ == Sign::kHasWithin
@@ -304,38 +323,37 @@ bool Condition::holds(std::string_view bytes, const Descriptor& type, const Hidd
   return search.found() != (sign_ == Sign::kIsAbsent);
 }
 
-bool diff(std::string_view first, const Descriptor& first_type, std::string_view second,
-          const Descriptor& second_type, bool show_token, const Colours& colours,
-          std::ostream* out) {
-  const auto for_each_value = [&](std::string_view bytes, const Descriptor& type,
-                                  const Values::Take& take) {
-    take("message", {type.name(), ""});
-    Values values(bytes, take);
-    walk_merged(bytes, type, show_token ? Hidden() : Hidden(bytes, type), &values);
+bool diff(const Side& first, const Side& second, const Colours& colours, std::ostream* out) {
+  const auto for_each_value = [](const Side& side, const Values::Take& take) {
+    take("message", {side.type->name()});
+    Values values(side.hidden, take);
+    walk_merged(side.bytes, *side.type, Hidden(), &values);
   };
   bool is_different = false;
   const auto write = [&](char sign, const std::string& place, const Value& value) {
     is_different = true;
-    *out << (sign == '-' ? colours.wrong : colours.value) << sign << ' ' << place << ": "
-         << value.first << colours.end << '\n';
+    if (!value.is_left_out) {
+      *out << (sign == '-' ? colours.wrong : colours.value) << sign << ' ' << place << ": "
+           << (value.is_hidden ? '"' + std::string(kNotShown) + '"' : value.text) << colours.end
+           << '\n';
+    }
   };
   std::unordered_map<std::string, Value> others;  // of the second that the first has not had yet
-  for_each_value(second, second_type, [&](const std::string& place, const Value& value) {
-    others.emplace(place, value);
-  });
-  for_each_value(first, first_type, [&](const std::string& place, const Value& value) {
+  for_each_value(
+      second, [&](const std::string& place, const Value& value) { others.emplace(place, value); });
+  for_each_value(first, [&](const std::string& place, const Value& value) {
     const auto other = others.find(place);
     if (other == others.end()) {
       write('-', place, value);
       return;
     }
-    if (other->second != value) {
+    if (other->second.text != value.text) {
       write('-', place, value);
       write('+', place, other->second);
     }
     others.erase(other);
   });
-  for_each_value(second, second_type, [&](const std::string& place, const Value& value) {
+  for_each_value(second, [&](const std::string& place, const Value& value) {
     if (others.count(place) > 0) {
       write('+', place, value);
     }

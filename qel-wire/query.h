@@ -55,11 +55,17 @@ class Condition {
   std::string value_;
 };
 
+// A message, and what of it is not shown.
+struct Side {
+  std::string bytes;
+  const google::protobuf::Descriptor* type;
+  Hidden hidden;
+};
+
 // Writes a line for each field that one message has, or that has another value there: '-' and that
-// of the first, '+' and that of the second. False if there is none.
-bool diff(std::string_view first, const google::protobuf::Descriptor& first_type,
-          std::string_view second, const google::protobuf::Descriptor& second_type, bool show_token,
-          const Colours& colours, std::ostream* out);
+// of the first, '+' and that of the second. Of what is hidden, texts are not shown, and numbers and
+// groups have no line. False if there is no difference, hidden or not.
+bool diff(const Side& first, const Side& second, const Colours& colours, std::ostream* out);
 
 }  // namespace qel_wire
 

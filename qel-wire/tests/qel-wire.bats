@@ -88,6 +88,15 @@ end
 requestId: 7" ]
 }
 
+@test "a frame of an unknown message, and bytes that are none, are not left out" {
+  printf '> %s\n' "$(frame NewMessage 0807)" "$(frame ClientEcho 0807)" | packets named.pcap
+  run -1 --separate-stderr qel-wire decode auto --frames=example named.pcap
+  [[ $output == *requestId* && $stderr == *'its frame has a name that no message has' ]]
+  printf '> 0a436c69\n' | packets cut.pcap
+  run -1 --separate-stderr qel-wire decode auto --frames=example cut.pcap
+  [[ $stderr == *'the frame at offset 0 cannot be read'* ]]
+}
+
 @test "a connection that was reset is noted" {
   printf '> %s\n' "$(frame ClientEcho 0807)" 00 | packets chat.pcapng
   editcap -F pcap chat.pcapng chat.pcap

@@ -235,8 +235,12 @@ std::string group_tags_of(const std::string& line) {
   std::string tags;
   int number = 0;
   for (size_t i = 0; i < line.size(); ++i) {
+    if (line[i] == '[') {  // an index
+      i = std::min(line.find(']', i), line.size());
+      continue;
+    }
     const bool is_digit = std::isdigit(static_cast<unsigned char>(line[i])) != 0;
-    if (!is_digit && (line[i] == '.' || line.substr(i, 2) == " {")) {
+    if (!is_digit && (line[i] == '.' || line.substr(i, 2) == " {" || line.substr(i, 4) == " end")) {
       tags += static_cast<char>(number << 3 | kStartOfGroup);
     }
     number = is_digit ? number % 100 * 10 + line[i] - '0' : 0;
@@ -280,7 +284,9 @@ TEST(Told, OfEachNotation_IsSeen) {
 
 TEST(Told, OfGroups_IsSeen) {
   for (const char* output :
-       {"- 12.8.7.15.1: 1\n", "\"path\":\"12.8.7.15.1\"", "12 {\n  8 {\n    7 {\n      15 {\n"}) {
+       {"- 12.8.7.15.1: 1\n", "- 12[1].8.7.15[0].1: 1\n", "\"path\":\"12.8.7.15.1\"",
+        "12 {\n  8 {\n    7 {\n      15 {\n",
+        "12 end of group\n8 end of group\n7 end of group\n15 end of group\n"}) {
     EXPECT_EQ(told(output, "cC;{"), "cC;{") << output;
   }
 }
@@ -316,7 +322,10 @@ std::vector<std::string> outputs(const Descriptor& type, const std::string& byte
   }
   std::ostringstream differences;
   if (!qel_wire::problem_of(bytes, type).has_value()) {
-    qel_wire::diff(bytes, type, "", type, false, qel_wire::Colours(false), &differences);
+    const qel_wire::Side side{bytes, &type, qel_wire::Hidden(bytes, type)};
+    const qel_wire::Side nothing{"", &type, {}};
+    qel_wire::diff(side, nothing, qel_wire::Colours(false), &differences);
+    qel_wire::diff(nothing, side, qel_wire::Colours(false), &differences);
   }
   texts.push_back(differences.str());
   return texts;
