@@ -64,7 +64,7 @@ std::optional<Problem> check(std::string_view bytes, const google::protobuf::Des
 Decoded decode(std::string_view bytes, const google::protobuf::Descriptor& type,
                const DecodeOptions& options, std::ostream* out) {
   Decoded result;
-  const Hidden hidden = options.show_token ? Hidden() : Hidden(bytes, type);
+  const Hidden hidden(bytes, type, options.show_token);
   result.problem = check(bytes, type, hidden, &result.notes);
   if (result.problem.has_value()) {
     if (!options.is_partial) {

@@ -99,6 +99,8 @@ class Dump {
 
   bool is_zero() const { return first_.offset.find_first_not_of('0') == std::string_view::npos; }
 
+  bool is_power_of_two() const { return (size_ & (size_ - 1)) == 0; }
+
   // Such offsets are of od or hexdump; only od's may be octal or decimal.
   bool has_seven_digits() const { return !first_.has_colon && first_.offset.size() == 7; }
 
@@ -121,7 +123,7 @@ class Dump {
   void check_numbers() const {
     const bool is_whole = digits_ % (base_ == 8 ? 3 : 2) == 0 && digits_ > 0 && size_ <= kLargest;
     const bool is_decimal = has_seven_digits() && first_.gap > 1 && size_ == 1;
-    if (is_decimal || (base_ != 0 && (!is_whole || (size_ & (size_ - 1)) != 0))) {
+    if (is_decimal || (base_ != 0 && (!is_whole || !is_power_of_two()))) {
       throw Stop{first_.groups.data(), "no bytes in hex or octal: use od -tx1 or hexdump -C"};
     }
     if (base_ != 0 && size_ > 1 && !has_seven_digits() && first_.offset.size() != 6) {
@@ -274,8 +276,7 @@ class Dump {
     const bool may_be_reversed = beside == visible(reversed);
     if (beside == shown) {
       // Both "xxd -g4" and "xxd -e" print such groups.
-      const bool may_be_open =
-          base_ == 0 && size_ > 2 && (size_ & (size_ - 1)) == 0 && !is_order_shown_;
+      const bool may_be_open = base_ == 0 && size_ > 2 && is_power_of_two() && !is_order_shown_;
       is_order_shown_ = is_order_shown_ || !may_be_reversed;
       is_order_open_ = may_be_open && may_be_reversed;
       return;

@@ -494,9 +494,7 @@ class JsonParser : public nlohmann::json_sax<nlohmann::json> {
 
   Reason set_bytes(Message* message, const std::string& value) {
     try {
-      return set_text(
-          message, field(),
-          from_notation(value, form_ == BytesForm::kHex ? Notation::kHex : Notation::kBase64));
+      return set_text(message, field(), from_notation(value, notation_in_json(form_)));
     } catch (const Misread& misread) {
       return misread.reason;
     }

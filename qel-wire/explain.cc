@@ -7,7 +7,6 @@
 #include <utility>
 #include <vector>
 
-#include "notation.h"
 #include "token.h"
 #include "walk.h"
 
@@ -309,8 +308,7 @@ class JsonLines : public Rows {
         line["value"] = value_of(*row.piece);
       }
       if (has_no_text(*row.piece)) {
-        const bool in_hex = form_ == BytesForm::kHex;
-        line["bytes"] = to_notation(row.piece->bytes, in_hex ? Notation::kHex : Notation::kBase64);
+        line["bytes"] = to_notation(row.piece->bytes, notation_in_json(form_));
       }
     } else if (row.is_problem) {
       line["type"] = "broken";
@@ -328,8 +326,7 @@ class JsonLines : public Rows {
 
   // Whether JSON cannot have the text as it is. Of what is of type bytes, the value is no text.
   static bool has_no_text(const Piece& piece) {
-    const bool is_bytes = piece.is_known && piece.field->type() == FieldDescriptor::TYPE_BYTES;
-    return piece.kind == Piece::kBytes && !is_bytes && !is_utf8(piece.bytes);
+    return piece.kind == Piece::kBytes && !piece.is_of_bytes() && !is_utf8(piece.bytes);
   }
 
   std::string path_to(const Piece& piece) const {
@@ -368,8 +365,7 @@ class Explanation : public Visitor {
     } else {
       Piece shown = piece;
       if (hidden_.hides(piece)) {
-        shown.is_hidden = true;
-        shown.bytes = kNotShown;
+        hide_text(&shown);
       }
       write({piece.offset, end, shown.is_hidden ? piece.value_offset : end, piece.depth, &shown, "",
              false, doubts_of(shown)});
@@ -448,7 +444,7 @@ class Explanation : public Visitor {
 
 bool explain(std::string_view bytes, const google::protobuf::Descriptor& type,
              const ExplainOptions& options, std::ostream* out) {
-  const Hidden hidden = options.show_token ? Hidden() : Hidden(bytes, type);
+  const Hidden hidden(bytes, type, options.show_token);
   Table table(bytes, hidden, options, out);
   JsonLines lines(type.name(), options, out);
   Explanation explanation(hidden, options.as_json ? static_cast<Rows*>(&lines) : &table);

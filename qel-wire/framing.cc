@@ -1,5 +1,7 @@
 #include "framing.h"
 
+#include <google/protobuf/io/coded_stream.h>
+
 #include <algorithm>
 #include <cctype>
 
@@ -28,16 +30,15 @@ Head number_of(std::string_view bytes, size_t size, bool is_little_endian) {
 }
 
 Head varint(std::string_view bytes) {
-  Head head;
-  for (const char byte : bytes.substr(0, 10)) {
-    head.length |= static_cast<size_t>(static_cast<unsigned char>(byte) & 0x7fU) << 7 * head.size++;
-    if ((static_cast<unsigned char>(byte) & 0x80U) == 0) {
-      return head;
-    }
+  google::protobuf::io::CodedInputStream input(
+      reinterpret_cast<const google::protobuf::uint8*>(bytes.data()),
+      static_cast<int>(bytes.size()));
+  google::protobuf::uint64 length = 0;
+  if (input.ReadVarint64(&length)) {
+    return {static_cast<size_t>(input.CurrentPosition()), length, "", ""};
   }
-  head.problem = bytes.size() >= 10 ? "a length has more than 10 bytes" : "";
-  ++head.size;  // it goes on
-  return head;
+  // It goes on behind the bytes, or too far.
+  return {bytes.size() + 1, 0, "", bytes.size() >= 10 ? "a length has more than 10 bytes" : ""};
 }
 
 // A byte says whether the message is compressed.

@@ -95,6 +95,10 @@ class Messages {
     Arrival arrival;  // of its last byte
   };
 
+  static std::string place_of(const Stream& stream, const std::string& source) {
+    return source + stream.from + " -> " + stream.to + ", ";
+  }
+
   // In the order in which they were complete.
   void of_capture(const std::string& file, const std::string& source) {
     const Capture capture = read_capture(file);
@@ -104,7 +108,7 @@ class Messages {
     status_ = std::max(status_, capture.is_broken ? kBroken : kDone);
     std::vector<Arrived> all;
     for (const Stream& stream : capture.streams) {
-      const std::string place = source + stream.from + " -> " + stream.to + ", ";
+      const std::string place = place_of(stream, source);
       for (const std::string& note : stream.notes) {
         complain(place + note);
       }
@@ -123,7 +127,7 @@ class Messages {
       found.connection = connections_ + stream.connection;
       found.time =
           std::chrono::duration_cast<std::chrono::milliseconds>(arrived.arrival.time).count();
-      take(stream.bytes, arrived.frame, source + stream.from + " -> " + stream.to + ", ", found);
+      take(stream.bytes, arrived.frame, place_of(stream, source), found);
     }
     connections_ += capture.streams.empty() ? 0 : capture.streams.back().connection;
   }

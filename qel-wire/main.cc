@@ -84,8 +84,7 @@ class Conditions {
       complain_about(found, "broken, and so left out");
       return kBroken;
     }
-    const qel_wire::Hidden hidden =
-        shows_token_ ? qel_wire::Hidden() : qel_wire::Hidden(found.bytes, type);
+    const qel_wire::Hidden hidden(found.bytes, type, shows_token_);
     if (std::all_of(conditions_.begin(), conditions_.end(), [&](const auto& condition) {
           return condition.holds(found.bytes, type, hidden);
         })) {
@@ -332,9 +331,7 @@ qel_wire::Side side_of(const qel_wire::Found& found, const Call& call) {
                                ? *qel_wire::guess(found.bytes).front().types.front()
                                : message_of(call.message);
   qel_wire::Side side{std::string(found.bytes), &type, {}};
-  if (!call.show_token) {
-    side.hidden = qel_wire::Hidden(side.bytes, type);
-  }
+  side.hidden = qel_wire::Hidden(side.bytes, type, call.show_token);
   std::vector<std::string> notes;
   if (const auto problem = qel_wire::check(side.bytes, type, side.hidden, &notes)) {
     throw Failure{kBroken, qel_wire::named(file) + " is broken at offset " +

@@ -195,8 +195,7 @@ class Merging {
       if (piece->kind != Piece::kBytes) {
         return;
       }
-      piece->is_hidden = true;
-      piece->bytes = kNotShown;
+      hide_text(piece);
     }
     visitor_.begin(*piece);
   }

@@ -7,7 +7,6 @@
 #include <vector>
 
 #include "merged.h"
-#include "notation.h"
 #include "schema.h"
 
 namespace qel_wire {
@@ -188,15 +187,18 @@ class JsonPrinter : public Visitor {
 
 }  // namespace
 
+Notation notation_in_json(BytesForm form) {
+  return form == BytesForm::kHex ? Notation::kHex : Notation::kBase64;
+}
+
 void write_in_text(const Piece& piece, BytesForm form, std::ostream* out) {
   if (piece.kind != Piece::kBytes) {
     *out << number_in_text(piece);
     return;
   }
   // Not taken apart: a text that is no message looks like one often enough.
-  const bool is_bytes = piece.is_known && piece.field->type() == FieldDescriptor::TYPE_BYTES;
   const bool in_hex_form =
-      form == BytesForm::kHex && !piece.is_hidden && (is_bytes || !is_utf8(piece.bytes));
+      form == BytesForm::kHex && !piece.is_hidden && (piece.is_of_bytes() || !is_utf8(piece.bytes));
   in_hex_form ? write_hex_escapes(piece.bytes, out) : write_in_quotes(piece.bytes, out);
 }
 
@@ -216,11 +218,8 @@ std::string number_in_json(const Piece& piece) {
 }
 
 std::string text_in_json(const Piece& piece, BytesForm form) {
-  const bool is_bytes =
-      piece.is_known && piece.field->type() == FieldDescriptor::TYPE_BYTES && !piece.is_hidden;
-  return is_bytes ? to_notation(piece.bytes,
-                                form == BytesForm::kHex ? Notation::kHex : Notation::kBase64)
-                  : std::string(piece.bytes);
+  return piece.is_of_bytes() && !piece.is_hidden ? to_notation(piece.bytes, notation_in_json(form))
+                                                 : std::string(piece.bytes);
 }
 
 std::string time_of(const Piece& piece) {

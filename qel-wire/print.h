@@ -8,6 +8,7 @@
 #include <string>
 #include <string_view>
 
+#include "notation.h"
 #include "text.h"
 #include "token.h"
 #include "walk.h"
@@ -17,6 +18,8 @@ namespace qel_wire {
 // How a value of type bytes is written, and a text that is no UTF-8: with octal escapes in the text
 // form and in base64 in JSON, or in hex in both.
 enum class BytesForm { kUsual, kHex };
+// The form's notation in JSON.
+Notation notation_in_json(BytesForm form);
 
 // The text form of Protocol Buffers, with the time beside numbers that are times. Unknown fields
 // stand behind the others, by their numbers: decimal for a varint, 0x and 8 or 16 digits for a

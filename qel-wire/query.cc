@@ -10,7 +10,6 @@
 
 #include "failure.h"
 #include "merged.h"
-#include "notation.h"
 #include "print.h"
 #include "scan.h"
 #include "schema.h"
@@ -147,12 +146,6 @@ bool is_text(const FieldDescriptor& field) {
   return field.cpp_type() == FieldDescriptor::CPPTYPE_STRING;
 }
 
-std::string text_of(const Piece& piece) {
-  const bool is_bytes = piece.is_known && piece.field->type() == FieldDescriptor::TYPE_BYTES;
-  return is_bytes && !piece.is_hidden ? to_notation(piece.bytes, Notation::kBase64)
-                                      : std::string(piece.bytes);
-}
-
 int64_t number_of(const Piece& piece) {
   if (!piece.is_known || piece.field->type() == FieldDescriptor::TYPE_INT64) {
     return static_cast<int64_t>(piece.value);
@@ -164,7 +157,7 @@ int64_t number_of(const Piece& piece) {
 // Less than 0, 0, or more, as the value is less than the text, equal to it, or more.
 std::optional<int> compare(const Piece& piece, const std::string& text) {
   if (piece.kind == Piece::kBytes) {
-    return text_of(piece).compare(text);
+    return text_in_json(piece, BytesForm::kUsual).compare(text);
   }
   const auto number = piece.is_known ? number_for(*piece.field, text) : unknown_number_in(text);
   if (piece.is_container() || !number.has_value()) {
@@ -233,7 +226,7 @@ class Condition::Search : public Paths {
     }
     if (sign == Sign::kHasWithin) {
       return piece.kind == Piece::kBytes &&
-             text_of(piece).find(condition_.value_) != std::string::npos;
+             text_in_json(piece, BytesForm::kUsual).find(condition_.value_) != std::string::npos;
     }
     const std::optional<int> order = compare(piece, condition_.value_);
     return order.has_value() && fits(sign, *order);

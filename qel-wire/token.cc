@@ -177,7 +177,10 @@ class Search : public Visitor {
 
 }  // namespace
 
-Hidden::Hidden(std::string_view bytes, const Descriptor& type) {
+Hidden::Hidden(std::string_view bytes, const Descriptor& type, bool show_token) {
+  if (show_token) {
+    return;
+  }
   Search search(bytes, type);
   const bool is_whole = !walk(bytes, type, &search).has_value();
   hidden_ = std::move(search).found(is_whole);

@@ -15,6 +15,12 @@ namespace qel_wire {
 // In place of what is hidden.
 inline constexpr char kNotShown[] = "(not shown)";
 
+// Makes the piece say that its text is hidden.
+inline void hide_text(Piece* piece) {
+  piece->is_hidden = true;
+  piece->bytes = kNotShown;
+}
+
 // Which bytes of the input are not shown, because they may be the access token's.
 //
 // A capture may be read as another message than it is, begin or end anywhere, or be damaged, so a
@@ -24,7 +30,8 @@ inline constexpr char kNotShown[] = "(not shown)";
 class Hidden {
  public:
   Hidden() = default;  // nothing
-  Hidden(std::string_view bytes, const google::protobuf::Descriptor& type);
+  // Nothing, too, if the token is to be shown.
+  Hidden(std::string_view bytes, const google::protobuf::Descriptor& type, bool show_token = false);
 
   bool hides_any() const { return !hidden_.empty(); }
   bool at(size_t offset) const { return !hidden_.empty() && hidden_[offset]; }

@@ -74,6 +74,10 @@ struct Piece {
   bool is_element() const { return offset == value_offset; }
   // Of a number: what the runtime keeps for an int32 or an enumeration.
   int32_t low_32_bits() const { return static_cast<int32_t>(static_cast<uint32_t>(value)); }
+  // Of kBytes: whether the field's type is bytes, rather than a text.
+  bool is_of_bytes() const {
+    return is_known && field->type() == google::protobuf::FieldDescriptor::TYPE_BYTES;
+  }
   // Whether a known number or text is none that its field has: more than 32 bits, outside its
   // enumeration, neither 0 nor 1, no UTF-8.
   bool is_doubtful() const;

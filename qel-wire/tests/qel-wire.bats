@@ -2,6 +2,7 @@
 # The program as it is called, and the page that describes it. SOURCE is the repository, BUILT the
 # folder of the program.
 bats_require_minimum_version 1.5.0
+load frames
 
 setup() {
   export LC_ALL=C
@@ -31,22 +32,13 @@ agree_on() {
   /usr/bin/python3 "$tests/reference.py" "$1" "$SOURCE" "$CONTRACT" 2>errors || { cat errors && false; }
 }
 
-# frame NAME HEX: the message in a frame of the example, as hex.
-frame() { printf '%02x%s%08x%s' ${#1} "$(printf %s "$1" | od -An -v -tx1 | tr -d ' \n')" $((${#2} / 2)) "$2"; }
-
-# packets FILE [PORTS]: makes a capture of lines with a direction and bytes, a second for each.
-packets() {
-  awk '{ printf "2026-11-23T10:00:%02dZ %s\n", NR - 1, $0 }' >"$1.txt"
-  TZ=UTC text2pcap -q -r '^(?<time>\S+) (?<dir>[<>]) (?<data>[0-9a-f]+)$' -t ISO \
-    -4 10.0.0.2,10.0.0.1 -T "${2:-9000,40000}" "$1.txt" "$1"
-}
-
-# capture FILE [PORTS]: the same of lines with a direction, the name of a message and its text form.
+# capture FILE [PORTS]: makes a capture of lines with a direction, the name of a message and its text
+# form.
 capture() {
   local way name text
   while read -r way name text; do
     printf '%s %s\n' "$way" "$(frame "$name" "$(qel-wire encode "$name" --hex <<<"$text")")"
-  done | packets "$@"
+  done | packets "$1" "${2:-9000,40000}"
 }
 
 # holds SESSIONS: repeated, they are the same. Of what differs, the session's title is shown.
@@ -80,7 +72,7 @@ end
 }
 
 @test "where a stream may begin within a message, the first frame is looked for" {
-  printf '> %s\n' 0a436c69 "$(frame ClientEcho 0807)" | packets chat.pcap
+  printf '> %s\n' 0a436c69 "$(frame ClientEcho 0807)" | packets chat.pcap 9000,40000
   run -0 --separate-stderr qel-wire decode auto --frames=example chat.pcap
   # shellcheck disable=SC2154
   [[ $stderr == *', without 4 bytes before the first frame' ]]
@@ -89,16 +81,16 @@ requestId: 7" ]
 }
 
 @test "a frame of an unknown message, and bytes that are none, are not left out" {
-  printf '> %s\n' "$(frame NewMessage 0807)" "$(frame ClientEcho 0807)" | packets named.pcap
+  printf '> %s\n' "$(frame NewMessage 0807)" "$(frame ClientEcho 0807)" | packets named.pcap 9000,40000
   run -1 --separate-stderr qel-wire decode auto --frames=example named.pcap
   [[ $output == *requestId* && $stderr == *'its frame has a name that no message has' ]]
-  printf '> 0a436c69\n' | packets cut.pcap
+  printf '> 0a436c69\n' | packets cut.pcap 9000,40000
   run -1 --separate-stderr qel-wire decode auto --frames=example cut.pcap
   [[ $stderr == *'the frame at offset 0 cannot be read'* ]]
 }
 
 @test "a connection that was reset is noted" {
-  printf '> %s\n' "$(frame ClientEcho 0807)" 00 | packets chat.pcapng
+  printf '> %s\n' "$(frame ClientEcho 0807)" 00 | packets chat.pcapng 9000,40000
   editcap -F pcap chat.pcapng chat.pcap
   # The flags of the last packet, which has 60 bytes: behind 14 of Ethernet, 20 of IP and 13 of TCP.
   printf '\x04' | dd of=chat.pcap bs=1 conv=notrunc seek=$(($(stat -c %s chat.pcap) - 60 + 47))

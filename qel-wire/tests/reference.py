@@ -264,14 +264,14 @@ def wrong_examples():
 
 # ---- Memory
 
-def takes_little(option, limit):
-    """Whether decode never has so many times the input's memory, besides what it takes for nothing: for
+def takes_little(limit, *arguments):
+    """Whether the command never has so many times the input's memory, besides what it takes for nothing: for
     small fields, and for a text of which each byte is escaped."""
-    size = 16 << 20
+    size = 1 << 20
     def most(data):
         probe = ("import resource, subprocess, sys; subprocess.run(sys.argv[1:], stdin=sys.stdin, check=True, "
                  "stdout=subprocess.DEVNULL); print(resource.getrusage(resource.RUSAGE_CHILDREN).ru_maxrss)")
-        return 1024 * int(run(sys.executable, "-c", probe, "qel-wire", "decode", "ChatReply", option, data=data))
+        return 1024 * int(run(sys.executable, "-c", probe, "qel-wire", *arguments, data=data))
     fields = [each * (size // len(each)) for each in (b"\x08\x07", b"\x6a\x02\x08\x01", b"\x60\x07\x58\x07")]
     text = b"\x12" + varint(size) + b"\x01" * size
     return all(most(data) - most(b"") < limit * size for data in [*fields, b"\x6a" + varint(len(text)) + text])
@@ -286,7 +286,9 @@ elif check == "hex":
 elif check == "frames":
     different = list(disagreements_on_frames())
 elif check == "memory":
-    different = [option for option, limit in (("--color=never", 2), ("--json", 15)) if not takes_little(option, limit)]
+    commands = [(2, "decode", "ChatReply"), (15, "decode", "ChatReply", "--json"), (2, "guess"), (2, "session"),
+                (2, "explain", "ChatReply", "--all"), (15, "explain", "ChatReply", "--json")]
+    different = [command for command in commands if not takes_little(*command)]
 else:
     different = [message.DESCRIPTOR.name for message in messages if not agrees(schema.fill(message))]
 print(*different, sep="\n")

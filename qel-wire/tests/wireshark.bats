@@ -2,6 +2,7 @@
 # The plug-in for Wireshark, installed and used as its page says. SOURCE is the repository, EXAMPLES
 # the folder of the demo's programs. What the demo prints is what Wireshark has to show.
 bats_require_minimum_version 1.5.0
+load frames
 
 # A program on the way records the demo's connection: to capture it takes privileges.
 setup_file() {
@@ -18,11 +19,7 @@ setup_file() {
 setup() { cd "$HOME" || exit; }
 
 # capture FILE [PORT]: makes one of a connection's pieces on standard input, a packet of each line.
-capture() {
-  cat >"$1.txt" # text2pcap reads no pipe
-  text2pcap -q -r '^(?<dir>[<>]) (?<data>[0-9a-f]+)$' -4 10.0.0.2,10.0.0.1 -T "45000,${2:-40000}" \
-    "$1.txt" "$1"
-}
+capture() { packets "$1" "45000,${2:-40000}"; }
 
 # shark FILE OPTION...: tshark, without what it says to root. It fails if the plug-in does, which
 # stands on standard error at first, and later in a field of the packet.
@@ -54,11 +51,6 @@ whole() {
     diff <(told_by_demo "$way") <(told_by_shark "$way")
   done
 }
-
-hex() { od -An -v -tx1 | tr -d ' \n'; }
-
-# frame NAME MESSAGE: the frame with that message, both as hex.
-frame() { printf '%02x%s%08x%s' ${#1} "$(printf %s "$1" | hex)" $((${#2} / 2)) "$2"; }
 
 @test "each message is shown with its fields, as the demo has them" { whole chat.pcap; }
 
