@@ -38,7 +38,8 @@ cleanup() {
 }
 trap cleanup EXIT
 
-"${emulator[@]}" "$programs/front_end" "${front_end_options[@]}" --port-file "$scratch/port" &
+"${emulator[@]}" "$programs/front_end" --scenario "${BASH_SOURCE[0]%/*}/day.scenario" \
+  "${front_end_options[@]}" --port-file "$scratch/port" &
 front_end=$!
 while [ ! -e "$scratch/port" ]; do
   if ! kill -0 "$front_end" 2>/dev/null; then

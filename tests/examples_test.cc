@@ -241,7 +241,7 @@ TEST(PluginSessionAlone, WhenThePortIsMissingOrNone_PrintsItsUsage) {
 // ---- The front end against a plug-in that misbehaves
 
 Fields auth() {
-  return Fields().number(1, 1).number(2, 2).number(3, 3).text(5, "app").text(
+  return Fields().number(1, 1).number(2, 5001).number(3, 77).text(5, "app").text(
       6, "example-access-token");
 }
 
@@ -251,7 +251,8 @@ class FrontEnd : public ::testing::Test {
     std::string folder = testing::TempDir() + "front-end-XXXXXX";
     ASSERT_NE(mkdtemp(folder.data()), nullptr);
     const std::string port_file = folder + "/port";
-    program_ = std::make_unique<Program>(QEL_FRONT_END " --port-file " + port_file + kTimeout);
+    program_ = std::make_unique<Program>(QEL_FRONT_END " --scenario " QEL_DAY " --port-file " +
+                                         port_file + kTimeout);
     for (int tries = 0; tries < 200 && access(port_file.c_str(), R_OK) != 0; ++tries) {
       usleep(50000);
     }
@@ -287,35 +288,47 @@ struct PluginMistake {
 };
 
 const PluginMistake kPluginMistakes[] = {
-    {"NoMessage", false, "NoSuchMessage", Fields(), "no such message: NoSuchMessage"},
+    {"NoMessage", false, "NoSuchMessage", Fields(),
+     "Message 1 of the plug-in has a name that the schema does not have: NoSuchMessage."},
     {"BrokenMessage", false, "ChannelAuthRequest", kBroken,
-     "not a valid message: ChannelAuthRequest"},
+     "Message 1 of the plug-in, a ChannelAuthRequest, cannot be read: its bytes are broken, or "
+     "those of another message."},
     {"UnknownField", false, "ChannelAuthRequest", auth().number(1000, 1),
-     "unknown fields in: ChannelAuthRequest"},
+     "Message 1 of the plug-in, a ChannelAuthRequest, is wrong: it has fields or values that the "
+     "schema does not have."},
     {"Imei", false, "ChannelAuthRequest", auth().text(4, "1"),
-     "an authentication with IMEI or proxy options"},
-    {"WrongToken", false, "ChannelAuthRequest", auth().text(6, "wrong"), "wrong access token"},
+     "Message 1 of the plug-in, a ChannelAuthRequest, is wrong: IMEI should not be there."},
+    {"WrongToken", false, "ChannelAuthRequest", auth().text(6, "wrong"),
+     "Message 1 of the plug-in, a ChannelAuthRequest, is wrong: it has another access token than "
+     "the service."},
     {"RequestBeforeAuthentication", false, "CurrentTimeRequest", Fields().number(11, 1),
-     "a message before the authentication: CurrentTimeRequest"},
+     "Message 1 of the plug-in, a CurrentTimeRequest, is wrong: it comes before the "
+     "authentication."},
     {"RequestIdAgain", true, "CurrentTimeRequest", Fields().number(11, 1),
-     "a request id that is not above the one before"},
+     "Message 2 of the plug-in, a CurrentTimeRequest, is wrong: its requestId 1 is not above the "
+     "one before, which was 1."},
     {"ChatMessageWithoutLifetime", true, "ChatRequest",
      Fields().number(11, 2).number(12, 42).message(13,
                                                    Fields().number(1, 3).number(2, 0).text(3, "x")),
-     "a chat message that lacks a field"},
+     "Message 2 of the plug-in, a ChatRequest, is wrong: chatMessageParams[0].msgTtl is missing."},
     {"SendersIds", true, "CurrentTimeRequest", Fields().number(1, 5001).number(11, 2),
-     "ids of the sender in: CurrentTimeRequest"},
-    {"AnotherChatroom", true, "IsTyping", Fields().number(11, 2).number(12, 43),
-     "a typing status of another chatroom"},
+     "Message 2 of the plug-in, a CurrentTimeRequest, is wrong: it has ids of the sender, which "
+     "the connection has already."},
+    {"AnotherChatroom", true, "IsTyping", Fields().number(11, 2).number(12, 43).text(13, "typing"),
+     "Message 2 of the plug-in, an IsTyping, is wrong: there is no chatroom 43, or the user has "
+     "left it."},
     {"TitleAndLifetime", true, "ChangeChatroomMetaRequest",
      Fields().number(11, 2).number(12, 42).text(13, "x").number(16, 1),
-     "a change that is not of one property"},
+     "Message 2 of the plug-in, a ChangeChatroomMetaRequest, is wrong: it should change the title "
+     "or the lifetime, one of them."},
     {"TextOfAReadMessage", true, "ReadMessageRequest",
      Fields().number(11, 2).number(12, 42).message(
          13, Fields().number(1, 1).number(2, 0).number(3, 6001).number(5, 1).text(6, "x")),
-     "a read receipt with more than the message's name"},
+     "Message 2 of the plug-in, a ReadMessageRequest, is wrong: inboxEntry.chatMsg should not be "
+     "there."},
     {"MessageOfTheService", true, "ChatReply", Fields(),
-     "this front end does not take a ChatReply"},
+     "Message 2 of the plug-in, a ChatReply, is wrong: it answers nothing: no such message with "
+     "the requestId 0 was sent."},
 };
 
 class FrontEndWithMistake : public FrontEnd, public ::testing::WithParamInterface<PluginMistake> {};
@@ -341,12 +354,14 @@ TEST_F(FrontEnd, WhenTheProbeIsAnsweredWithAnotherId_Fails) {
   send_message(connection_, "CurrentTimeRequest", Fields().number(11, 2));
   ASSERT_EQ(receive_message(connection_), "ClientEcho");
   send_message(connection_, "ClientEchoReply", Fields().number(1, 5));
-  expect_failure("an answer to another echo probe");
+  expect_failure(
+      "Message 3 of the plug-in, a ClientEchoReply, is wrong: it answers nothing: no such message "
+      "with the requestId 5 was sent.");
 }
 
 TEST_F(FrontEnd, WhenTheSessionEndsTooEarly_Fails) {
   authenticate();
-  expect_failure("the plug-in never sent a message CurrentTimeRequest");
+  expect_failure("Line 6 expects a CurrentTimeRequest, which never came.");
 }
 
 TEST_F(FrontEnd, WhenTheConnectionBreaksWithinAFrame_Fails) {

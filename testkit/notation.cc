@@ -1,0 +1,434 @@
+#include "notation.h"
+
+#include <google/protobuf/descriptor.h>
+#include <google/protobuf/io/coded_stream.h>
+#include <google/protobuf/text_format.h>
+#include <google/protobuf/unknown_field_set.h>
+#include <google/protobuf/wire_format.h>
+
+#include <algorithm>
+#include <limits>
+
+namespace testkit {
+namespace {
+
+using google::protobuf::Descriptor;
+using google::protobuf::DescriptorPool;
+using google::protobuf::FieldDescriptor;
+using google::protobuf::Message;
+using google::protobuf::MessageFactory;
+using google::protobuf::Reflection;
+using google::protobuf::TextFormat;
+using google::protobuf::UnknownField;
+using google::protobuf::UnknownFieldSet;
+using google::protobuf::io::Tokenizer;
+
+constexpr int kDeepest = 50;
+
+bool is_filled(const Message& message, const FieldDescriptor& field) {
+  const Reflection& fields = *message.GetReflection();
+  return field.is_repeated() ? fields.FieldSize(message, &field) > 0
+                             : fields.HasField(message, &field);
+}
+
+std::string bytes_of(const UnknownFieldSet& fields) {
+  std::string bytes;
+  {
+    google::protobuf::io::StringOutputStream output(&bytes);
+    google::protobuf::io::CodedOutputStream stream(&output);
+    google::protobuf::internal::WireFormat::SerializeUnknownFields(fields, &stream);
+  }  // which write the rest
+  return bytes;
+}
+
+// ---- Parsing
+
+// Why the last value was refused.
+class LastError : public google::protobuf::io::ErrorCollector {
+ public:
+  void AddError(int /*line*/, int /*column*/, const std::string& reason) override {
+    reason_ = reason;
+  }
+  const std::string& reason() const { return reason_; }
+
+ private:
+  std::string reason_;
+};
+
+class PatternParser {
+ public:
+  PatternParser(Tokens* tokens, Pattern* pattern) : tokens_(*tokens), pattern_(*pattern) {}
+
+  // Up to the closing brace.
+  void fields(Message* message) {
+    if (++depth_ > kDeepest) {
+      tokens_.fail("too many messages in each other");
+    }
+    tokens_.expect("{");
+    while (!tokens_.take("}")) {
+      if (tokens_.take("!")) {
+        pattern_.absent.emplace(message, &field_of(*message));
+      } else if (tokens_.is_at(Tokenizer::TYPE_INTEGER)) {
+        unknown(message->GetReflection()->MutableUnknownFields(message));
+      } else {
+        known(message);
+      }
+      if (!tokens_.take(",")) {
+        tokens_.take(";");
+      }
+    }
+    --depth_;
+  }
+
+ private:
+  const FieldDescriptor& field_of(const Message& message) {
+    const Descriptor& type = *message.GetDescriptor();
+    const Place place = tokens_.place();
+    const std::string name = tokens_.name("expected the name of a field");
+    const FieldDescriptor* field = type.FindFieldByName(name);
+    if (field == nullptr) {
+      throw Misread{place, type.name() + " has no field '" + name + "'"};
+    }
+    return *field;
+  }
+
+  void known(Message* message) {
+    const Place place = tokens_.place();
+    const FieldDescriptor& field = field_of(*message);
+    const bool has_colon = tokens_.take(":");
+    if (!has_colon && !tokens_.is_at("{")) {
+      pattern_.present.emplace(message, &field);
+      return;
+    }
+    if (!field.is_repeated() && is_filled(*message, field)) {
+      throw Misread{place, "the field '" + field.name() + "' is there twice"};
+    }
+    if (!field.is_repeated() || !tokens_.take("[")) {
+      value(message, field);
+      return;
+    }
+    while (!tokens_.take("]")) {
+      value(message, field);
+      tokens_.take(",");
+    }
+  }
+
+  void value(Message* message, const FieldDescriptor& field) {
+    const Reflection& fields = *message->GetReflection();
+    if (field.message_type() != nullptr) {
+      this->fields(field.is_repeated() ? fields.AddMessage(message, &field)
+                                       : fields.MutableMessage(message, &field));
+      return;
+    }
+    const Place place = tokens_.place();
+    const std::string sign = tokens_.take("-") ? "-" : "";
+    if (field.enum_type() != nullptr && tokens_.is_at(Tokenizer::TYPE_INTEGER)) {
+      const int number = tokens_.number("expected a number");
+      set_member(message, field, sign.empty() ? number : -number);
+      return;
+    }
+    std::string text = sign;
+    do {
+      text += tokens_.take() + " ";
+    } while (sign.empty() && text[0] == '"' && tokens_.is_at(Tokenizer::TYPE_STRING));
+    LastError error;
+    TextFormat::Parser parser;
+    parser.RecordErrorsTo(&error);
+    if (!parser.ParseFieldValueFromString(text, &field, message)) {
+      throw Misread{place,
+                    "this is no value of the field '" + field.name() + "': " + error.reason()};
+    }
+  }
+
+  static void set_member(Message* message, const FieldDescriptor& field, int number) {
+    const Reflection& fields = *message->GetReflection();
+    const auto* member = field.enum_type()->FindValueByNumber(number);
+    if (member == nullptr) {
+      fields.MutableUnknownFields(message)->AddVarint(field.number(),
+                                                      static_cast<uint64_t>(int64_t{number}));
+    } else if (field.is_repeated()) {
+      fields.AddEnum(message, &field, member);
+    } else {
+      fields.SetEnum(message, &field, member);
+    }
+  }
+
+  void unknown(UnknownFieldSet* fields) {
+    const Place place = tokens_.place();
+    const int field = tokens_.number("expected the number of a field");
+    if (field < 1) {
+      throw Misread{place, "fields have numbers from 1"};
+    }
+    if (!tokens_.take(":")) {
+      UnknownFieldSet inner;
+      tokens_.expect("{");
+      while (!tokens_.take("}")) {
+        unknown(&inner);
+        tokens_.take(",");
+      }
+      fields->AddLengthDelimited(field, bytes_of(inner));
+    } else if (tokens_.is_at(Tokenizer::TYPE_STRING)) {
+      Tokenizer::ParseString(tokens_.take(), fields->AddLengthDelimited(field));
+    } else {
+      google::protobuf::uint64 value = 0;
+      const bool is_negative = tokens_.take("-");
+      if (!tokens_.is_at(Tokenizer::TYPE_INTEGER) ||
+          !Tokenizer::ParseInteger(tokens_.take(), std::numeric_limits<uint64_t>::max(), &value)) {
+        throw Misread{place, "the value of the field " + std::to_string(field) +
+                                 " is no number, no text and no message"};
+      }
+      fields->AddVarint(field, is_negative ? 0 - value : value);
+    }
+  }
+
+  Tokens& tokens_;
+  Pattern& pattern_;
+  int depth_ = 0;
+};
+
+// ---- Comparing
+
+// The access token is a credential and is not shown.
+std::string shown(const Message& message, const FieldDescriptor& field, int index) {
+  if (field.name() == "accessToken") {
+    return "(not shown)";
+  }
+  constexpr size_t kMost = 100;  // bytes of a value, which may be a long text
+  TextFormat::Printer printer;
+  printer.SetUseUtf8StringEscaping(true);
+  printer.SetSingleLineMode(true);
+  std::string text;
+  printer.PrintFieldValueToString(message, &field, index, &text);
+  if (text.size() > kMost) {
+    size_t end = kMost;
+    while ((static_cast<unsigned char>(text[end]) & 0xc0U) == 0x80) {
+      --end;
+    }
+    text = text.substr(0, end) + "...";
+  }
+  return text;
+}
+
+class Comparison {
+ public:
+  Comparison(const Pattern& pattern, bool is_whole, const std::set<std::string>& ignored)
+      : pattern_(pattern), is_whole_(is_whole), ignored_(ignored) {}
+
+  void compare(const Message& wanted, const Message& came, const std::string& path) {
+    const Descriptor& type = *wanted.GetDescriptor();
+    for (int i = 0; i < type.field_count(); ++i) {
+      if (ignored_.count(type.field(i)->name()) == 0) {
+        compare_field(wanted, came, *type.field(i), path + type.field(i)->name());
+      }
+    }
+    compare_unknown(wanted.GetReflection()->GetUnknownFields(wanted),
+                    came.GetReflection()->GetUnknownFields(came), type, path);
+  }
+
+  std::vector<std::string> found;
+
+ private:
+  void compare_field(const Message& wanted, const Message& came, const FieldDescriptor& field,
+                     const std::string& name) {
+    const bool is_there = is_filled(came, field);
+    const bool is_wanted = is_filled(wanted, field);
+    if (is_there && (pattern_.absent.count({&wanted, &field}) > 0 || (is_whole_ && !is_wanted))) {
+      found.push_back(name + " should not be there");
+    } else if (!is_there && pattern_.present.count({&wanted, &field}) > 0) {
+      found.push_back(name + " is missing");
+    } else if (is_wanted && field.is_repeated()) {
+      compare_list(wanted, came, field, name);
+    } else if (is_wanted && !is_there) {
+      found.push_back(
+          name + " is missing" +
+          (field.message_type() != nullptr ? "" : ", which should be " + shown(wanted, field, -1)));
+    } else if (is_wanted) {
+      compare_value(wanted, came, field, -1, name);
+    }
+  }
+
+  void compare_list(const Message& wanted, const Message& came, const FieldDescriptor& field,
+                    const std::string& name) {
+    const int wanted_count = wanted.GetReflection()->FieldSize(wanted, &field);
+    const int count = came.GetReflection()->FieldSize(came, &field);
+    if (count != wanted_count) {
+      found.push_back(name + " has " + std::to_string(count) + " elements instead of " +
+                      std::to_string(wanted_count));
+    }
+    for (int i = 0; i < std::min(count, wanted_count); ++i) {
+      compare_value(wanted, came, field, i, name + "[" + std::to_string(i) + "]");
+    }
+  }
+
+  void compare_value(const Message& wanted, const Message& came, const FieldDescriptor& field,
+                     int index, const std::string& name) {
+    if (field.message_type() != nullptr) {
+      compare(message_in(wanted, field, index), message_in(came, field, index), name + ".");
+      return;
+    }
+    std::string wanted_value;
+    std::string value;
+    TextFormat::PrintFieldValueToString(wanted, &field, index, &wanted_value);
+    TextFormat::PrintFieldValueToString(came, &field, index, &value);
+    if (value != wanted_value) {
+      found.push_back(name + " is " + shown(came, field, index) + " instead of " +
+                      shown(wanted, field, index));
+    }
+  }
+
+  static const Message& message_in(const Message& message, const FieldDescriptor& field,
+                                   int index) {
+    const Reflection& fields = *message.GetReflection();
+    return index < 0 ? fields.GetMessage(message, &field)
+                     : fields.GetRepeatedMessage(message, &field, index);
+  }
+
+  // Each alone, as bytes.
+  static std::set<std::pair<int, std::string>> each(const UnknownFieldSet& fields) {
+    std::set<std::pair<int, std::string>> result;
+    for (int i = 0; i < fields.field_count(); ++i) {
+      UnknownFieldSet one;
+      one.AddField(fields.field(i));
+      result.emplace(fields.field(i).number(), bytes_of(one));
+    }
+    return result;
+  }
+
+  void compare_unknown(const UnknownFieldSet& wanted, const UnknownFieldSet& came,
+                       const Descriptor& type, const std::string& path) {
+    const auto all_wanted = each(wanted);
+    const auto all = each(came);
+    for (const auto& field : all_wanted) {
+      if (all.count(field) == 0) {
+        found.push_back(path + unknown_name(type, field.first) + " is not the expected one");
+      }
+    }
+    for (const auto& field : all) {
+      if (is_whole_ && all_wanted.count(field) == 0) {
+        found.push_back(path + unknown_name(type, field.first) + " should not be there");
+      }
+    }
+  }
+
+  static std::string unknown_name(const Descriptor& type, int number) {
+    const FieldDescriptor* field = type.FindFieldByNumber(number);
+    return field != nullptr ? field->name() : "the unknown field " + std::to_string(number);
+  }
+
+  const Pattern& pattern_;
+  bool is_whole_;
+  const std::set<std::string>& ignored_;
+};
+
+// Removes what the pattern replaces or does not want, as far as merging would leave it.
+void make_room(const Pattern& pattern, const Message& given, Message* message) {
+  const Descriptor& type = *given.GetDescriptor();
+  const Reflection& fields = *message->GetReflection();
+  for (int i = 0; i < type.field_count(); ++i) {
+    const FieldDescriptor& field = *type.field(i);
+    const bool is_given = is_filled(given, field);
+    if (pattern.absent.count({&given, &field}) > 0 || (is_given && field.is_repeated())) {
+      fields.ClearField(message, &field);
+    } else if (is_given && field.message_type() != nullptr) {
+      make_room(pattern, fields.GetMessage(given, &field), fields.MutableMessage(message, &field));
+    }
+  }
+}
+
+}  // namespace
+
+const Descriptor* message_type(const std::string& name) {
+  const Descriptor* type = DescriptorPool::generated_pool()->FindMessageTypeByName(name);
+  return type != nullptr && type->file()->package().empty() ? type : nullptr;
+}
+
+std::unique_ptr<Message> new_message(const Descriptor& type) {
+  return std::unique_ptr<Message>(MessageFactory::generated_factory()->GetPrototype(&type)->New());
+}
+
+// ---- Tokens
+
+Tokens::Tokens(const std::string& text)
+    : input_(text.data(), static_cast<int>(text.size())), tokens_(&input_, this) {
+  tokens_.set_comment_style(Tokenizer::SH_COMMENT_STYLE);
+  tokens_.set_require_space_after_number(false);  // "5s"
+  tokens_.Next();
+}
+
+std::string Tokens::take() {
+  const std::string text = token().text;
+  tokens_.Next();
+  return text;
+}
+
+bool Tokens::take(const std::string& text) {
+  const bool is_there = is_at(text);
+  if (is_there) {
+    tokens_.Next();
+  }
+  return is_there;
+}
+
+void Tokens::expect(const std::string& text) {
+  if (!take(text)) {
+    fail("expected '" + text + "'");
+  }
+}
+
+std::string Tokens::name(const char* what) {
+  if (!is_at(Tokenizer::TYPE_IDENTIFIER)) {
+    fail(what);
+  }
+  return take();
+}
+
+int Tokens::number(const char* what) {
+  google::protobuf::uint64 value = 0;
+  if (!is_at(Tokenizer::TYPE_INTEGER) ||
+      !Tokenizer::ParseInteger(token().text, std::numeric_limits<int>::max(), &value)) {
+    fail(what);
+  }
+  tokens_.Next();
+  return static_cast<int>(value);
+}
+
+void Tokens::fail(const std::string& reason) {
+  const std::string found = is_at_end()                     ? "the text ends"
+                            : is_at(Tokenizer::TYPE_STRING) ? "here is a text"
+                                                            : "here is '" + token().text + "'";
+  throw Misread{place(), reason + ", but " + found};
+}
+
+void Tokens::AddError(int line, int column, const std::string& reason) {
+  throw Misread{{line + 1, column + 1}, reason};
+}
+
+// ---- Patterns
+
+Pattern parse_pattern(const Descriptor& type, Tokens* tokens) {
+  Pattern pattern;
+  pattern.fields = new_message(type);
+  PatternParser(tokens, &pattern).fields(pattern.fields.get());
+  return pattern;
+}
+
+Pattern pattern_of(const Message& message) {
+  Pattern pattern;
+  pattern.fields.reset(message.New());
+  pattern.fields->CopyFrom(message);
+  return pattern;
+}
+
+std::vector<std::string> differences(const Pattern& pattern, const Message& message, bool is_whole,
+                                     const std::set<std::string>& ignored) {
+  Comparison comparison(pattern, is_whole, ignored);
+  comparison.compare(*pattern.fields, message, "");
+  return comparison.found;
+}
+
+void put(const Pattern& pattern, Message* message) {
+  make_room(pattern, *pattern.fields, message);
+  message->MergeFrom(*pattern.fields);
+}
+
+}  // namespace testkit

@@ -1,0 +1,117 @@
+// The C functions. No exception leaves them.
+#include <exception>
+#include <memory>
+#include <new>
+#include <optional>
+#include <set>
+#include <sstream>
+#include <string>
+#include <utility>
+
+#include "kit.h"
+#include "qel-testkit.h"
+#include "session.h"
+
+struct qel_testkit {
+  std::optional<testkit::Kit> kit;  // none if there is nothing that it could play
+  std::string failure;              // why
+  testkit::Delivery delivery;       // the last
+};
+
+namespace {
+
+// Returns null without memory.
+template <typename Make>
+qel_testkit_t* make_kit(const Make& make) {
+  try {
+    auto result = std::make_unique<qel_testkit>();
+    try {
+      make(result.get());
+    } catch (const testkit::Misread& misread) {
+      result->failure = "The scenario cannot be read: line " + std::to_string(misread.place.line) +
+                        ", column " + std::to_string(misread.place.column) + ": " + misread.reason +
+                        ".\n";
+    } catch (const testkit::Unreadable& unreadable) {
+      result->failure = "The session cannot be replayed: " + unreadable.reason + ".\n";
+    }
+    return result.release();
+  } catch (const std::exception&) {
+    return nullptr;
+  }
+}
+
+// What fails leaves a kit that plays nothing more.
+template <typename Use>
+void use(qel_testkit_t* kit, const Use& use) {
+  try {
+    if (kit->kit.has_value()) {
+      use(&*kit->kit);
+    }
+  } catch (const std::exception&) {
+    kit->kit.reset();
+    kit->failure = "Out of memory.\n";  // in the string itself
+  }
+}
+
+}  // namespace
+
+qel_testkit_t* qel_testkit_new(const char* scenario) {
+  return make_kit([scenario](qel_testkit_t* result) {
+    result->kit.emplace(std::string(scenario != nullptr ? scenario : ""));
+  });
+}
+
+qel_testkit_t* qel_testkit_new_replay(const unsigned char* session, size_t size,
+                                      const char* ignored) {
+  return make_kit([session, size, ignored](qel_testkit_t* result) {
+    std::set<std::string> names;
+    std::istringstream words(ignored != nullptr ? ignored : "");
+    for (std::string word; words >> word;) {
+      names.insert(word);
+    }
+    const std::string_view bytes(reinterpret_cast<const char*>(session), size);
+    result->kit.emplace(testkit::read_session(bytes), std::move(names));
+  });
+}
+
+void qel_testkit_release(qel_testkit_t* kit) {
+  delete kit;
+}
+
+void qel_testkit_sent(qel_testkit_t* kit, const char* message, const unsigned char* data,
+                      int size) {
+  use(kit, [message, data, size](testkit::Kit* player) {
+    const bool is_empty = data == nullptr || size <= 0;
+    player->sent(message, is_empty ? std::string()
+                                   : std::string(reinterpret_cast<const char*>(data),
+                                                 static_cast<size_t>(size)));
+  });
+}
+
+bool qel_testkit_next(qel_testkit_t* kit, qel_testkit_delivery_t* delivery) {
+  *delivery = {nullptr, nullptr, 0, -1};
+  use(kit, [kit, delivery](testkit::Kit* player) {
+    if (auto next = player->next()) {
+      kit->delivery = std::move(*next);
+      *delivery = {kit->delivery.name.c_str(),
+                   reinterpret_cast<const unsigned char*>(kit->delivery.bytes.data()),
+                   static_cast<int>(kit->delivery.bytes.size()), 0};
+    } else {
+      delivery->after_ms = player->next_after();
+    }
+  });
+  return delivery->message != nullptr;
+}
+
+void qel_testkit_wait(qel_testkit_t* kit, int64_t milliseconds) {
+  use(kit, [milliseconds](testkit::Kit* player) { player->wait(milliseconds); });
+}
+
+bool qel_testkit_end(qel_testkit_t* kit) {
+  use(kit, [](testkit::Kit* player) { player->end(); });
+  return *qel_testkit_report(kit) == '\0';
+}
+
+const char* qel_testkit_report(const qel_testkit_t* kit) {
+  return kit->kit.has_value() ? kit->kit->report().c_str() : kit->failure.c_str();
+}
