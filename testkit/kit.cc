@@ -83,7 +83,7 @@ Kit::Kit(std::vector<Statement> session, std::set<std::string> ignored)
 void Kit::complain(const std::string& sentence) {
   ++complaints_;
   if (complaints_ < kMostComplaints) {
-    report_ += sentence + "\n";
+    report_ += sentence.empty() ? "" : sentence + "\n";
   } else if (complaints_ == kMostComplaints) {
     report_ += "There is more, and nothing is delivered any longer.\n";
     line_.clear();
@@ -106,15 +106,13 @@ void Kit::check_rules(const Message& message) {
   }
   for (Rule& rule : rules_) {
     const Statement& statement = *rule.statement;
-    if (statement.type != message.GetDescriptor()) {
+    const bool is_over = statement.within >= 0 && now_ - rule.since > statement.within;
+    if (statement.type != message.GetDescriptor() || is_over) {
       continue;
     }
     const auto found = differences(statement.pattern, message);
     if (statement.kind == Statement::kAtMost) {
-      if (found.empty() && ++rule.count > statement.most) {
-        complain_of(message, "is one too many",
-                    {statement.where + " allows " + std::to_string(statement.most)});
-      }
+      count(message, found.empty(), &rule);
     } else if (statement.where.empty()) {
       wrong.insert(wrong.end(), found.begin(), found.end());
     } else {
@@ -122,6 +120,17 @@ void Kit::check_rules(const Message& message) {
     }
   }
   complain_of(message, "is wrong", wrong);
+}
+
+// Of many that are too many, the first is enough.
+void Kit::count(const Message& message, bool is_counted, Rule* rule) {
+  rule->count += is_counted ? 1 : 0;
+  if (is_counted && rule->count == rule->statement->most + 1) {
+    complain_of(message, "is one too many",
+                {rule->statement->where + " allows " + std::to_string(rule->statement->most)});
+  } else if (is_counted && rule->count > rule->statement->most) {
+    complain("");
+  }
 }
 
 // ---- What the plug-in sends
@@ -200,7 +209,7 @@ void Kit::play() {
         break;
       case Statement::kAtMost:
       case Statement::kAlways:
-        rules_.push_back({statement, 0});
+        rules_.push_back({statement, now_, 0});
         break;
       case Statement::kStrict:
         is_strict_ = true;
@@ -311,6 +320,8 @@ std::optional<Delivery> Kit::next() {
   line_.pop_front();
   if (service_.has_value() && delivery.message != nullptr) {
     service_->note_delivery(*delivery.message);
+  } else if (service_.has_value()) {
+    service_->note_broken_delivery(delivery.name);
   }
   return delivery;
 }
@@ -347,11 +358,14 @@ void Kit::end() {
              ", which never came.");
   }
   if (held_back_.has_value()) {
-    complain("A " + held_back_->name + " was to be swapped with the next message, but none came.");
+    complain(with_capital(with_article(held_back_->name)) +
+             " was to be swapped with the next message, but none came.");
   }
   for (const Delivery& delivery : line_) {
-    complain("A " + delivery.name + " was not taken: it was due " +
-             std::to_string(delivery.due - now_) + " ms later.");
+    if (delivery.due > now_) {
+      complain(with_capital(with_article(delivery.name)) + " was due " +
+               std::to_string(delivery.due - now_) + " ms later, but the test was over.");
+    }
   }
   if (service_.has_value()) {
     for (const std::string& sentence : service_->unanswered()) {

@@ -45,18 +45,19 @@ class Kit {
   // A statement that holds from now on.
   struct Rule {
     const Statement* statement;
+    int64_t since;
     int count;
   };
 
+  // An empty sentence counts only.
   void complain(const std::string& sentence);
   void complain_of(const google::protobuf::Message& message, const std::string& what,
                    const std::vector<std::string>& reasons);
   void play();
   void meet(const google::protobuf::Message& message, Messages said);
+  void count(const google::protobuf::Message& message, bool is_counted, Rule* rule);
   void check_rules(const google::protobuf::Message& message);
   const Statement* expected() const;
-  std::vector<std::string> compare(const Statement& statement,
-                                   const google::protobuf::Message& message) const;
   void answer(const Statement& statement);
   void push(const Statement& statement);
   void deliver(const google::protobuf::Message& message, const Faults& faults);

@@ -35,9 +35,7 @@ class Parser {
     if (word == "expect") {
       result.kind = Statement::kExpect;
       message(&result);
-      if (tokens_.take("within")) {
-        result.within = time();
-      }
+      within(&result);
       if (!is_reply(*result.type)) {
         request_ = scenario_.statements.size();
       }
@@ -54,9 +52,13 @@ class Parser {
       result.kind = Statement::kAtMost;
       result.most = tokens_.number("expected how many");
       message(&result);
+      within(&result);
     } else if (word == "never" || word == "always") {
       result.kind = word == "never" ? Statement::kAtMost : Statement::kAlways;
       message(&result);
+      if (word == "never") {
+        within(&result);
+      }
     } else if (word == "strict") {
       result.kind = Statement::kStrict;
     } else {
@@ -144,6 +146,12 @@ class Parser {
       return false;
     }
     return true;
+  }
+
+  void within(Statement* result) {
+    if (tokens_.take("within")) {
+      result->within = time();
+    }
   }
 
   // In milliseconds.

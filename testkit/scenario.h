@@ -34,9 +34,10 @@ struct Statement {
   Pattern pattern;  // without fields, or of the type
   Faults faults;
 
-  // Of an expectation.
-  bool has_answer = false;  // whether an answer comes behind it, rather than the service's at once
-  int64_t within = -1;      // milliseconds, if it is not negative
+  // Of an expectation: whether an answer comes behind it, rather than the service's at once.
+  bool has_answer = false;
+  // Of an expectation, and of kAtMost: for how many milliseconds, or negative if for ever.
+  int64_t within = -1;
   // Of a session that is replayed: the message must be the same, and what is delivered has these
   // bytes.
   bool is_replayed = false;

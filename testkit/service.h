@@ -7,6 +7,7 @@
 #include <cstdint>
 #include <map>
 #include <memory>
+#include <set>
 #include <string>
 #include <utility>
 #include <vector>
@@ -31,6 +32,8 @@ class Service {
   void number(google::protobuf::Message* push);
   // The plug-in gets the message now. If it is a push, it has to be answered.
   void note_delivery(const google::protobuf::Message& message);
+  // The plug-in gets broken bytes as a message of that name, whose answer may be any.
+  void note_broken_delivery(const std::string& name) { broken_.insert(name); }
   // The pushes that were not answered.
   std::vector<std::string> unanswered() const;
 
@@ -78,6 +81,7 @@ class Service {
     bool is_answered = false;
   };
   std::map<std::pair<std::string, int64_t>, Push> pushes_;
+  std::set<std::string> broken_;
   std::vector<std::string> complaints_;
 };
 

@@ -30,7 +30,7 @@ qel_testkit_t* make_kit(const Make& make) {
     } catch (const testkit::Misread& misread) {
       result->failure = "The scenario cannot be read: line " + std::to_string(misread.place.line) +
                         ", column " + std::to_string(misread.place.column) + ": " + misread.reason +
-                        ".\n";
+                        (misread.reason.back() == '.' ? "\n" : ".\n");
     } catch (const testkit::Unreadable& unreadable) {
       result->failure = "The session cannot be replayed: " + unreadable.reason + ".\n";
     }
