@@ -232,9 +232,12 @@ class Comparison {
                      const std::string& name) {
     const bool is_there = is_filled(came, field);
     const bool is_wanted = is_filled(wanted, field);
-    if (is_there && (pattern_.absent.count({&wanted, &field}) > 0 || (is_whole_ && !is_wanted))) {
+    const bool is_any = pattern_.present.count({&wanted, &field}) > 0;
+    const bool is_unwanted =
+        pattern_.absent.count({&wanted, &field}) > 0 || (is_whole_ && !is_wanted && !is_any);
+    if (is_there && is_unwanted) {
       found.push_back(name + " should not be there");
-    } else if (!is_there && pattern_.present.count({&wanted, &field}) > 0) {
+    } else if (!is_there && is_any) {
       found.push_back(name + " is missing");
     } else if (is_wanted && field.is_repeated()) {
       compare_list(wanted, came, field, name);
