@@ -117,6 +117,9 @@ int port_of(int listener) {
 }
 
 void serve_one(int listener, int timeout_seconds, qel_testkit_t* kit, const Show& show) {
+  if (*qel_testkit_report(kit) != '\0') {
+    return;  // there is nothing that it could play
+  }
   const Connection connection(accept_one(listener, timeout_seconds));
   const int socket = connection.socket();
   const int64_t timeout = int64_t{timeout_seconds} * 1000;

@@ -1,0 +1,108 @@
+#!/usr/bin/env bats
+# The program qel-testkit. SOURCE is the repository, BUILT the folder of the program, EXAMPLES that of
+# the demo's programs.
+bats_require_minimum_version 1.5.0
+BATS_PRINT_OUTPUT_ON_FAILURE=1
+export LC_ALL=C DLOG_STANDIN_PRIORITY=S
+
+setup() { cd "$BATS_TEST_TMPDIR" || exit; }
+
+testkit() { "$BUILT/qel-testkit" "$@"; }
+
+# serve OPTION...: lets the demo's plug-in talk to the program. Its report goes to the file report,
+# what the plug-in says to the file said.
+serve() {
+  local served=0 line port
+  coproc TESTKIT { exec "$BUILT/qel-testkit" --listen 0 --timeout 5 "$@" 2>report 3>&-; }
+  local pid=$TESTKIT_PID
+  read -r line <&"${TESTKIT[0]}"
+  port=${line##*:}
+  "$EXAMPLES/plugin_session" "$port" --timeout 2 "${plugin_options[@]}" >said 2>&1 || true
+  wait "$pid" || served=$?
+  return "$served"
+}
+
+# A session file of the demo.
+record_demo() {
+  RECORD=record "$SOURCE/examples/run_demo.sh" "$EXAMPLES" \
+    --emulator "$SOURCE/qel-wire/tests/relay.py" >demo
+  "$SOURCE/testkit/tests/session_file.py" record session
+}
+
+@test "lines: what is due comes first, and then when there is more" {
+  echo 'world { isSignedIn: true } push ClientEcho { requestId: 5 }' >scenario
+  run --separate-stderr -0 testkit --scenario scenario <<<'ClientEchoReply 0805'
+  diff - <(printf '%s\n' 'ClientEcho 0805' 'next never' 'next never') <<<"$output"
+}
+
+@test "lines: time passes as the test says" {
+  printf '%s\n' 'world { isSignedIn: true }' 'expect CurrentTimeRequest' \
+    'answer CurrentTimeReply after 5s' >scenario
+  run --separate-stderr -0 testkit --scenario scenario <<'TXT'
+CurrentTimeRequest 5807
+wait 4999
+wait 1
+TXT
+  diff - <(printf '%s\n' 'next never' 'next 5000' 'next 1' 'CurrentTimeReply 5807' 'next never') \
+    <<<"$output"
+}
+
+@test "lines: the report goes to standard error, and the status is 1" {
+  echo 'world { isSignedIn: true } push ClientEcho' >scenario
+  run --separate-stderr -1 testkit --scenario scenario <<'TXT'
+ClientEchoReply 0805
+TXT
+  [[ $stderr == *'Message 1 of the plug-in, a ClientEchoReply, is wrong: it answers nothing'* ]]
+}
+
+@test "lines that mean nothing end it with status 2" {
+  for line in 'ChatRequest 0' 'ChatRequest xx' 'wait long' 'wait -1' 'wait' 'ChatRequest 08 07' ''; do
+    run -2 testkit <<<"$line"
+  done
+}
+
+@test "wrong calls end it with status 2" {
+  for options in '--scenario' '--unknown x' '--listen x' '--scenario a --replay b' \
+    '--scenario none' '--timeout 0'; do
+    # shellcheck disable=SC2086 # several words
+    run -2 testkit $options </dev/null
+  done
+}
+
+@test "a text that is no scenario ends it with status 1, also before anybody connects" {
+  echo 'expekt' >scenario
+  run -1 testkit --scenario scenario --listen 0 </dev/null
+  [[ $output == *'The scenario cannot be read: line 1, column 1: '* ]]
+}
+
+@test "TCP: the demo's plug-in goes through the demo's scenario" {
+  serve --scenario "$SOURCE/examples/day.scenario"
+  grep -x 'plug-in: session complete' said
+}
+
+@test "TCP: what went wrong is reported" {
+  plugin_options=(--access-token wrong-token)
+  run -1 serve --scenario "$SOURCE/examples/day.scenario"
+  grep 'it has another access token than the service' report
+  ! grep wrong-token report
+}
+
+@test "TCP: a late answer comes" {
+  sed '/^expect ChannelAuthRequest/a answer after 200ms' "$SOURCE/examples/day.scenario" >scenario
+  serve --scenario scenario
+  grep -x 'plug-in: session complete' said
+}
+
+@test "the demo's session, replayed, gives equal outputs" {
+  record_demo
+  serve --replay session
+  diff <(grep '^plug-in: ' demo) said
+}
+
+@test "a plug-in that says something else than in the recorded session is found" {
+  record_demo
+  "$SOURCE/testkit/tests/session_file.py" <(sed 's/4c756e6368206f6e20467269646179/4c756e6368206f6e204d6f6e646179/' record) session
+  run -1 serve --replay session
+  grep 'ChangeChatroomMetaRequest, is not what record [0-9]* expects: title is "Lunch on Friday" instead of "Lunch on Monday"' report
+  serve --replay session --ignore title
+}
