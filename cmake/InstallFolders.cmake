@@ -17,6 +17,7 @@ set(_folders
   "${CMAKE_INSTALL_LIBDIR}/pkgconfig"
   "${CMAKE_INSTALL_LIBDIR}/cmake/${PROJECT_NAME}"
   "${CMAKE_INSTALL_DATADIR}/${PROJECT_NAME}"
+  "${CMAKE_INSTALL_DATADIR}/${PROJECT_NAME}/scenarios"
   "${CMAKE_INSTALL_DATADIR}/bash-completion/completions"
   "${CMAKE_INSTALL_DATADIR}/fish/vendor_completions.d"
   "${CMAKE_INSTALL_DATADIR}/wireshark/protobuf"

@@ -43,6 +43,24 @@ foreach(_name ${PROJECT_NAME} ${PROJECT_NAME}-classes)
   install(FILES "${_made}/${_name}.pc" DESTINATION "${_pkgconfig}" COMPONENT development)
 endforeach()
 
+# The test kit is for workstations.
+if(TARGET qel-testkit)
+  install(TARGETS qel-message-testkit qel-message-testlog qel-testkit
+    LIBRARY COMPONENT testkit
+    ARCHIVE COMPONENT testkit
+    RUNTIME COMPONENT testkit)
+  install(FILES testkit/qel-testkit.h testkit/qel-testlog.h
+    DESTINATION "${_headers}" COMPONENT testkit)
+  install(DIRECTORY testkit/scenarios DESTINATION "${CMAKE_INSTALL_DATADIR}/${PROJECT_NAME}"
+    COMPONENT testkit)
+  install(FILES testkit/service.scenario testkit/world.proto
+    DESTINATION "${CMAKE_INSTALL_DATADIR}/${PROJECT_NAME}" COMPONENT testkit)
+  foreach(_name qel-message-testkit qel-message-testlog)
+    configure_file("packaging/${_name}.pc.in" "${_made}/${_name}.pc" @ONLY)
+    install(FILES "${_made}/${_name}.pc" DESTINATION "${_pkgconfig}" COMPONENT testkit)
+  endforeach()
+endif()
+
 # Not made by install(EXPORT): such a target would also name the runtime and the log service, with
 # which users of the library do not link.
 configure_package_config_file(packaging/${PROJECT_NAME}-config.cmake.in
@@ -59,9 +77,15 @@ install(
 # library, which finds them in its own folder. A device has both.
 if(TARGET dlog-standin)
   set_target_properties(qel-message-protosvc PROPERTIES INSTALL_RPATH "$ORIGIN")
-  if(TARGET qel-wire)
-    set_target_properties(qel-wire PROPERTIES INSTALL_RPATH "$ORIGIN/../${CMAKE_INSTALL_LIBDIR}")
+  if(TARGET qel-message-testkit)
+    set_target_properties(qel-message-testkit PROPERTIES INSTALL_RPATH "$ORIGIN")
   endif()
+  foreach(_program qel-wire qel-testkit)
+    if(TARGET ${_program})
+      set_target_properties(${_program} PROPERTIES
+        INSTALL_RPATH "$ORIGIN/../${CMAKE_INSTALL_LIBDIR}")
+    endif()
+  endforeach()
   install(TARGETS dlog-standin LIBRARY COMPONENT workstation)
   cmake_path(GET QEL_PROTOBUF_LIBRARY PARENT_PATH _folder)
   file(GLOB _runtime "${_folder}/libprotobuf.so.9*") # an SDK may keep it elsewhere
@@ -72,13 +96,13 @@ if(TARGET dlog-standin)
 endif()
 
 # The example's sources, without what builds them in this tree.
-file(GLOB _example examples/*.c examples/*.h examples/*.cc)
+file(GLOB _example examples/*.c examples/*.h examples/*.cc examples/*.scenario)
 install(FILES ${_example} DESTINATION "${CMAKE_INSTALL_DATADIR}/doc/${PROJECT_NAME}/examples"
   COMPONENT documentation)
 
 # Builds what is installed.
 add_custom_target(packaged DEPENDS qel-message-protosvc contract)
-foreach(_target qel-wire qel-wire-says docs)
+foreach(_target qel-wire qel-wire-says qel-message-testkit qel-message-testlog qel-testkit docs)
   if(TARGET ${_target})
     add_dependencies(packaged ${_target})
   endif()

@@ -3,15 +3,20 @@
  * @brief A chat service for tests of plug-ins: a test hands it what the plug-in sends, and takes
  * what the plug-in is to receive.
  *
- * The test carries the messages. It opens no connection, starts no thread, prints nothing, reads no
- * file and looks at no clock: its time is what the test says. A kit is used by one thread at a
- * time; several kits know nothing of each other. docs/testing.md shows how to use it, and has the
- * language of scenarios.
+ * The test carries the messages. The kit opens no connection, starts no thread, prints nothing,
+ * reads no file and looks at no clock: its time is what the test says. A kit is used by one thread
+ * at a time; several kits know nothing of each other. docs/testing.md shows how to use it, and has
+ * the language of scenarios.
  *
- * A test with one call after the other, without a clock:
- * @code
- * while (qel_testkit_is_waiting(kit, &delivery)) ...
- * @endcode
+ * A test lets the plug-in begin, then repeats until nothing comes any more:
+ *
+ *     if (qel_testkit_next(kit, &delivery)) {
+ *       ... the plug-in receives it, and what it sends goes to qel_testkit_sent() ...
+ *     } else if (delivery.after_ms > 0) {
+ *       qel_testkit_wait(kit, delivery.after_ms); ... and so much time passes for the plug-in ...
+ *     } else {
+ *       break;
+ *     }
  */
 #ifndef QEL_TESTKIT_H
 #define QEL_TESTKIT_H
