@@ -184,3 +184,61 @@ leaks_alone_are_reported() {
 
 @test "LeakSanitizer reports leaks alone" { leaks_alone_are_reported leak; }
 @test "AddressSanitizer reports leaks alone" { leaks_alone_are_reported address; }
+
+# The kit, and what it needs of the rest.
+install_testkit() {
+  for component in runtime workstation development testkit; do
+    cmake --install "$BUILD" --prefix "$PWD/tree" --component "$component"
+  done
+  flags_of "$PWD/tree" "$1"
+  flags+=(-std=c99 -pedantic -Wall -Wextra -Werror -Wl,-rpath,"$PWD/tree/$LIBDIR")
+}
+
+# block N: of docs/testing.md, what stands in its N-th block.
+block() { awk -v n="$1" '/^```/ {on = !on; i += on; next} on && i == n' "$SOURCE/docs/testing.md"; }
+
+@test "the first test of docs/testing.md is good, and finds the mistake that the page makes" {
+  install_testkit qel-message-testkit
+  block 1 >first.c
+  "$CC" first.c "${flags[@]}" -o first
+  prints good tree ./first
+  sed 's/echo\.requestId/1/' first.c >second.c
+  "$CC" second.c "${flags[@]}" -o second
+  DLOG_STANDIN_PRIORITY=S run -1 ./second
+  diff <(block 3) - <<<"$output"
+}
+
+@test "a test of a plug-in needs a C compiler, and nothing of Protocol Buffers" {
+  install_testkit qel-message-testkit
+  block 1 >first.c
+  "$CC" -H first.c "${flags[@]}" -o first 2>&1 | sed -n 's/^\.\.* //p' | xargs -d '\n' realpath |
+    grep -v '^/usr/' | sed 's/.*\///' |
+    diff - <(printf '%s\n' qel-message.h qel-message-serialize.h qel-testkit.h)
+  "$NM" -D --defined-only "tree/$LIBDIR/libqel-message-testkit.so" | sed 's/.* //' | sort |
+    diff - <(grep -oE '\<qel_testkit_[a-z_]+\(' "$SOURCE/testkit/qel-testkit.h" | tr -d '(' | sort -u)
+}
+
+@test "log lines are collected by what is installed" {
+  install_testkit qel-message-testlog
+  cat >log.c <<'TXT'
+#include <stdio.h>
+#include "qel-message.h"
+#include "qel-testlog.h"
+int main(void) {
+  QEL_SCOPED(client_echo, echo);
+  const unsigned char broken[] = {8};
+  printf("%d ", qel_client_echo_read(&echo, broken, 1) == QEL_OK);
+  printf("%s\n", qel_testlog_count("client_echo_deserialize") > 0 ? "collected" : "not collected");
+  qel_testlog_clear();
+  return 0;
+}
+TXT
+  "$CC" log.c "${flags[@]}" -o log
+  prints '0 collected' tree ./log
+}
+
+@test "the scenarios and the program are installed" {
+  install_testkit qel-message-testkit
+  diff <(ls "$SOURCE/testkit/scenarios") <(ls tree/share/qel-message-protosvc/scenarios)
+  tree/bin/qel-testkit --scenario tree/share/qel-message-protosvc/service.scenario </dev/null
+}
