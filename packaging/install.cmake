@@ -102,7 +102,10 @@ install(FILES ${_example} DESTINATION "${CMAKE_INSTALL_DATADIR}/doc/${PROJECT_NA
 
 # Builds what is installed.
 add_custom_target(packaged DEPENDS qel-message-protosvc contract)
-foreach(_target qel-wire qel-wire-says qel-message-testkit qel-message-testlog qel-testkit docs)
+if(TARGET qel-testkit)
+  add_dependencies(packaged qel-testkit qel-message-testlog)
+endif()
+foreach(_target qel-wire qel-wire-says docs)
   if(TARGET ${_target})
     add_dependencies(packaged ${_target})
   endif()

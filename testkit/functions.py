@@ -1,5 +1,5 @@
 #!/usr/bin/python3
-"""functions.py CONTRACT.json: the message of each function of the C interface, as rows of a C++ map."""
+"""functions.py CONTRACT.json: the functions of the C interface, each with its message, for C++."""
 
 import json
 import sys

@@ -19,7 +19,6 @@ using google::protobuf::Message;
 using google::protobuf::MessageFactory;
 using google::protobuf::Reflection;
 using google::protobuf::TextFormat;
-using google::protobuf::UnknownField;
 using google::protobuf::UnknownFieldSet;
 using google::protobuf::io::Tokenizer;
 
@@ -359,7 +358,7 @@ Tokens::Tokens(const std::string& text)
 }
 
 std::string Tokens::take() {
-  const std::string text = token().text;
+  std::string text = token().text;
   tokens_.Next();
   return text;
 }

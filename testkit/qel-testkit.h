@@ -8,6 +8,9 @@
  * at a time; several kits know nothing of each other. docs/testing.md shows how to use it, and has
  * the language of scenarios.
  *
+ * Pointers may be NULL only where that is said. Without memory for a call, the kit does nothing
+ * from then on, and reports that.
+ *
  * A test lets the plug-in begin, then repeats until nothing comes any more:
  *
  *     if (qel_testkit_next(kit, &delivery)) {
@@ -35,10 +38,10 @@ typedef struct qel_testkit qel_testkit_t;
 /** What the plug-in is to receive. */
 typedef struct qel_testkit_delivery {
   const char* message;       /**< which message it is, for example "ChatReply", or NULL */
-  const unsigned char* data; /**< its bytes; valid until the next call with the kit */
+  const unsigned char* data; /**< its bytes; like the name, valid until the next is taken */
   int size;                  /**< how many */
-  int64_t after_ms;          /**< 0 with a message; otherwise after how many milliseconds the next
-                                  one comes, or -1 if none does before the plug-in sends something */
+  int64_t after_ms;          /**< 0 with a message; otherwise after how many milliseconds one comes,
+                                  or -1 if none does before the plug-in sends something */
 } qel_testkit_delivery_t;
 
 /**

@@ -15,16 +15,16 @@ extern "C" {
 #endif
 
 /**
- * How many lines have the text in them. A line begins with the letter of its priority, V, D, I, W, E
- * or F, and its tag, for example "E MESSAGE_PLUGIN: msgType is out of range(0~6)". A line for which
- * there was no memory is missing.
+ * How many lines have the text in them. A line begins with the letter of its priority, V, D, I, W,
+ * E or F, and its tag, for example "E MESSAGE_PLUGIN: msgType is out of range(0~6)". A line for
+ * which there was no memory is missing.
  *
  * @param text  what to look for; NULL for every line
  */
 int qel_testlog_count(const char* text);
 
 /**
- * The first line that has the text in it, without a line break at its end.
+ * The first line that has the text in it, up to its first line break.
  *
  * @param text  what to look for; NULL for every line
  * @return a text that is valid until qel_testlog_clear(), or NULL if there is none

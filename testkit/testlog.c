@@ -1,5 +1,6 @@
 #include <pthread.h>
 #include <stdarg.h>
+#include <stdbool.h>
 #include <stdio.h>
 #include <stdlib.h>
 #include <string.h>
@@ -9,6 +10,8 @@
 /* The platform's function. */
 int __dlog_print(int log_id, int priority, const char* tag, const char* format, ...)
     __attribute__((format(printf, 4, 5)));
+
+enum { LINE_LENGTH = 4096 }; /* what is longer is cut off, as on the device */
 
 typedef struct line {
   struct line* next;
@@ -21,36 +24,32 @@ static line_t** end = &first;
 
 static char letter_of(int priority) {
   static const char letters[] = "??VDIWEFS";
-  return priority < 0 || priority >= (int)sizeof letters - 1 ? '?' : letters[priority];
+  const bool is_known = priority >= 0 && priority < (int)sizeof letters - 1;
+  return letters[is_known ? priority : 0];
 }
 
 int __dlog_print(int log_id, int priority, const char* tag, const char* format, ...) {
   const size_t head = strlen("E ") + strlen(tag) + strlen(": ");
+  char text[LINE_LENGTH] = "";
   va_list arguments;
   line_t* line;
-  int length;
 
   (void)log_id;
   va_start(arguments, format);
-  length = vsnprintf(NULL, 0, format, arguments);
+  vsnprintf(text, sizeof text, format, arguments);
   va_end(arguments);
-  line = length < 0 ? NULL : malloc(sizeof *line + head + (size_t)length + 1);
+  text[strcspn(text, "\n")] = '\0';
+  line = malloc(sizeof *line + head + strlen(text) + 1);
   if (line == NULL) {
     return -1;
   }
   line->next = NULL;
-  snprintf(line->text, head + 1, "%c %s: ", letter_of(priority), tag);
-  va_start(arguments, format);
-  vsnprintf(line->text + head, (size_t)length + 1, format, arguments);
-  va_end(arguments);
-  if (length > 0 && line->text[head + (size_t)length - 1] == '\n') {
-    line->text[head + (size_t)length - 1] = '\0';
-  }
+  snprintf(line->text, head + strlen(text) + 1, "%c %s: %s", letter_of(priority), tag, text);
   pthread_mutex_lock(&lock);
   *end = line;
   end = &line->next;
   pthread_mutex_unlock(&lock);
-  return length;
+  return (int)strlen(text);
 }
 
 /* The first one from there on, or NULL. */

@@ -191,7 +191,7 @@ install_testkit() {
     cmake --install "$BUILD" --prefix "$PWD/tree" --component "$component"
   done
   flags_of "$PWD/tree" "$1"
-  flags+=(-std=c99 -pedantic -Wall -Wextra -Werror -Wl,-rpath,"$PWD/tree/$LIBDIR")
+  flags+=(-std=c99 -pedantic -Wall -Wextra -Werror "-Wl,-rpath,$PWD/tree/$LIBDIR")
 }
 
 # block N: of docs/testing.md, what stands in its N-th block.

@@ -1,6 +1,7 @@
 #!/usr/bin/env bats
 # The program qel-testkit. SOURCE is the repository, BUILT the folder of the program, EXAMPLES that of
 # the demo's programs.
+# shellcheck disable=SC2034,SC2154 # variables of bats
 bats_require_minimum_version 1.5.0
 BATS_PRINT_OUTPUT_ON_FAILURE=1
 export LC_ALL=C DLOG_STANDIN_PRIORITY=S
@@ -84,7 +85,7 @@ TXT
   plugin_options=(--access-token wrong-token)
   run -1 serve --scenario "$SOURCE/examples/day.scenario"
   grep 'it has another access token than the service' report
-  ! grep wrong-token report
+  run ! grep wrong-token report
 }
 
 @test "TCP: a late answer comes" {
