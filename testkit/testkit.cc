@@ -1,4 +1,6 @@
 // The C functions. No exception leaves them.
+#include <google/protobuf/stubs/common.h>
+
 #include <exception>
 #include <memory>
 #include <new>
@@ -23,6 +25,7 @@ namespace {
 // Returns null without memory.
 template <typename Make>
 qel_testkit_t* make_kit(const Make& make) {
+  const google::protobuf::LogSilencer silence;
   try {
     auto result = std::make_unique<qel_testkit>();
     try {
@@ -43,6 +46,7 @@ qel_testkit_t* make_kit(const Make& make) {
 // What fails leaves a kit that plays nothing more.
 template <typename Use>
 void use(qel_testkit_t* kit, const Use& use) {
+  const google::protobuf::LogSilencer silence;  // of texts that are no UTF-8
   try {
     if (kit->kit.has_value()) {
       use(&*kit->kit);

@@ -563,6 +563,15 @@ TEST_F(TestKit, AfterTheEnd_NothingCountsAnyMore) {
   EXPECT_EQ(end(), "");
 }
 
+TEST_F(TestKit, TextThatIsNoUtf8_IsNotPrintedAbout) {
+  testing::internal::CaptureStderr();
+  start_signed_in("expect IsTyping answer");
+  send_bytes("IsTyping", "\x58\x01\x60\x2a\x6a\x01\xff");
+  received_bytes();
+  end();
+  EXPECT_EQ(testing::internal::GetCapturedStderr(), "");
+}
+
 TEST(TestKitAlone, ReleaseOfNothing_DoesNothing) {
   qel_testkit_release(nullptr);
 }
