@@ -60,9 +60,6 @@ class PatternParser {
 
   // Up to the closing brace.
   void fields(Message* message) {
-    if (++depth_ > kDeepest) {
-      tokens_.fail("too many messages in each other");
-    }
     tokens_.expect("{");
     while (!tokens_.take("}")) {
       if (tokens_.take("!")) {
@@ -76,7 +73,6 @@ class PatternParser {
         tokens_.take(";");
       }
     }
-    --depth_;
   }
 
  private:
@@ -160,11 +156,15 @@ class PatternParser {
     }
     if (!tokens_.take(":")) {
       UnknownFieldSet inner;
+      if (++depth_ > kDeepest) {
+        tokens_.fail("too many messages in each other");
+      }
       tokens_.expect("{");
       while (!tokens_.take("}")) {
         unknown(&inner);
         tokens_.take(",");
       }
+      --depth_;
       fields->AddLengthDelimited(field, bytes_of(inner));
     } else if (tokens_.is_at(Tokenizer::TYPE_STRING)) {
       Tokenizer::ParseString(tokens_.take(), fields->AddLengthDelimited(field));
@@ -182,7 +182,7 @@ class PatternParser {
 
   Tokens& tokens_;
   Pattern& pattern_;
-  int depth_ = 0;
+  int depth_ = 0;  // of unknown fields: those of the schema end by themselves
 };
 
 // ---- Comparing

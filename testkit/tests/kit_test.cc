@@ -545,6 +545,15 @@ TEST_P(NoScenario, IsReportedWithItsPlace) {
 INSTANTIATE_TEST_SUITE_P(Each, NoScenario, ::testing::ValuesIn(kMisread),
                          [](const auto& row) { return row.param.name; });
 
+TEST_F(TestKit, ScenarioOfManyMessagesInEachOther_IsRefused) {
+  std::string scenario = "push ClientEcho { ";
+  for (int i = 0; i < 100000; ++i) {
+    scenario += "9 { ";
+  }
+  start(scenario.c_str());
+  EXPECT_NE(report().find("too many messages in each other"), std::string::npos);
+}
+
 TEST_F(TestKit, KitWithoutAScenario_DoesNothing) {
   start("?");
   send("ClientEchoReply", "requestId: 5");

@@ -76,10 +76,10 @@ const Mistake kMistakes[] = {
      "Message 5 of the plug-in, a ForwardOnlineMessageReply, is wrong: it answers nothing: no such "
      "message with the requestId 700002 was sent."},
     {BUG_SENDER_OF_BEFORE, "receipts",
-     "Message 8 of the plug-in, a ReadMessageRequest, is not what line 15 expects: "
+     "Message 8 of the plug-in, a ReadMessageRequest, is not what line 17 expects: "
      "inboxEntry.sender is 6001 instead of 0."},
     {BUG_PAGE_KEY_LOST, "unread",
-     "Message 7 of the plug-in, a ForwardUnreadMessageReply, is not what line 10 expects: "
+     "Message 7 of the plug-in, a ForwardUnreadMessageReply, is not what line 13 expects: "
      "nextPaginationKey is missing, which should be \"the second page\"."},
     {BUG_PAGES_WITHOUT_END, "endless-pages",
      "Message 57 of the plug-in, a ForwardUnreadMessageReply, is one too many: line 6 allows 50."},
