@@ -49,7 +49,8 @@ void take_over(const char* name, const Message& request, const Pattern& pattern,
 // A masked token stands for any.
 void forget_masked_token(Pattern* pattern) {
   auto* auth = dynamic_cast<ChannelAuthRequest*>(pattern->fields.get());
-  if (auth != nullptr && auth->accesstoken().find_first_not_of('*') == std::string::npos) {
+  if (auth != nullptr && auth->has_accesstoken() &&
+      auth->accesstoken().find_first_not_of('*') == std::string::npos) {
     auth->clear_accesstoken();
     pattern->present.emplace(auth, auth->GetDescriptor()->FindFieldByName("accessToken"));
   }
@@ -143,9 +144,7 @@ void Kit::sent(const std::string& name, const std::string& bytes) {
   const auto* type = message_type(name);
   if (type == nullptr) {
     complain("Message " + std::to_string(messages_) +
-             " of the plug-in has a name that the schema "
-             "does not have: " +
-             name + ".");
+             " of the plug-in has a name that the schema does not have: " + name + ".");
     return;
   }
   const std::unique_ptr<Message> message = new_message(*type);

@@ -146,6 +146,14 @@ TEST_F(Replay, MaskedToken_StandsForAny) {
   EXPECT_EQ(end(), "");
 }
 
+TEST_F(Replay, MissingToken_IsExpectedToBeMissing) {
+  SessionFile file;
+  file.record(kSent, "ChannelAuthRequest", "\x08\x01");
+  start(file);
+  send("ChannelAuthRequest", "\x08\x01");
+  EXPECT_EQ(end(), "");
+}
+
 TEST_F(Replay, FunctionsOfTheInterface_AreTheirMessages) {
   SessionFile file;
   file.record(kReceived, "current_time_deserialize", "\x58\x01");
