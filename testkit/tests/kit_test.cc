@@ -141,6 +141,15 @@ TEST_F(TestKit, NewChatroom_CanBeEnteredAndLeft) {
             "the user has left it.\n");
 }
 
+TEST_F(TestKit, Chatroom_IsDescribedAsFarAsIsAskedFor) {
+  start_signed_in("");
+  send("AllowChatRequest", "requestId: 1 chatroomId: 42");
+  EXPECT_EQ(received(),
+            (Lines{"AllowChatReply: requestId: 1 chatroomId: 42 result { code: 0 msg: \"ok\" } "
+                   "lastReadAckTimestamp: 1700000008001 ownerUserId: 5001 "
+                   "lastDeliveryAckTimestamp: 1700000008002 msgTtl: 3600"}));
+}
+
 TEST_F(TestKit, RefusedUsers_AreListedByReason) {
   start_signed_in("");
   send("InviteRequest",
@@ -325,6 +334,37 @@ TEST_F(TestKit, ExpectationThatIsMetTooLate_IsReportedOnce) {
   EXPECT_EQ(end(), "No CurrentTimeRequest came within 2000 ms, as line 1 expects.\n");
 }
 
+TEST_F(TestKit, EachExpectation_HasATimeOfItsOwn) {
+  start_signed_in("expect CurrentTimeRequest within 1s expect CurrentTimeRequest within 1s");
+  qel_testkit_wait(kit_, 1001);
+  qel_testkit_wait(kit_, -1001);
+  send("CurrentTimeRequest", "requestId: 1");
+  qel_testkit_wait(kit_, 1000);
+  EXPECT_EQ(report(), "No CurrentTimeRequest came within 1000 ms, as line 1 expects.\n");
+  qel_testkit_wait(kit_, 1);
+  send("CurrentTimeRequest", "requestId: 2");
+  EXPECT_EQ(end(),
+            "No CurrentTimeRequest came within 1000 ms, as line 1 expects.\n"
+            "No CurrentTimeRequest came within 1000 ms, as line 1 expects.\n");
+}
+
+TEST_F(TestKit, BytesThatAreNoSuchMessage_AreReported) {
+  start_signed_in("");
+  send_bytes("ClientEchoReply", "\x08");
+  EXPECT_EQ(end(),
+            "Message 1 of the plug-in, a ClientEchoReply, cannot be read: its bytes are broken, or "
+            "those of another message.\n");
+}
+
+TEST_F(TestKit, FieldsThatTheSchemaDoesNotHave_AreReported) {
+  start_signed_in("");
+  send_bytes("CurrentTimeRequest", "\x58\x01\x98\x06\x01");
+  EXPECT_EQ(
+      end(),
+      "Message 1 of the plug-in, a CurrentTimeRequest, is wrong: it has fields or values that "
+      "the schema does not have.\n");
+}
+
 TEST_F(TestKit, AtMost_AllowsSoMany) {
   start_signed_in("at most 1 CurrentTimeRequest");
   send("CurrentTimeRequest", "requestId: 1");
@@ -379,6 +419,13 @@ TEST_F(TestKit, Answer_IsTheServicesUnlessTheScenarioHasAnother) {
   start_signed_in(std::string(kClock) + "answer CurrentTimeReply { result { code: 3 } }");
   send("CurrentTimeRequest", "requestId: 5");
   EXPECT_EQ(received(), (Lines{"CurrentTimeReply: requestId: 5 result { code: 3 }"}));
+}
+
+TEST_F(TestKit, AnotherAnswer_HasTheRequestsChatroom) {
+  start_signed_in("expect InviteRequest answer InviteReply answer InviteReply { !chatroomId }");
+  send("InviteRequest", "requestId: 5 chatroomId: 42 invitingMembers: 6007");
+  EXPECT_EQ(received(),
+            (Lines{"InviteReply: requestId: 5 chatroomId: 42", "InviteReply: requestId: 5"}));
 }
 
 TEST_F(TestKit, AnswerWithFields_HasThemInsteadOfTheServices) {
