@@ -103,7 +103,7 @@ install(FILES ${_example} DESTINATION "${CMAKE_INSTALL_DATADIR}/doc/${PROJECT_NA
 # Builds what is installed.
 add_custom_target(packaged DEPENDS qel-message-protosvc contract)
 if(TARGET qel-testkit)
-  add_dependencies(packaged qel-testkit qel-message-testlog)
+  add_dependencies(packaged qel-testkit-says qel-message-testlog)
 endif()
 foreach(_target qel-wire qel-wire-says docs)
   if(TARGET ${_target})

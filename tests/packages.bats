@@ -9,7 +9,7 @@ root=$BATS_FILE_TMPDIR/root # where they are installed
 libraries=$root/usr/$LIBDIR
 native=$(dpkg --print-architecture)
 runtime=("libqel-message-protosvc$FIRST" qel-message-protosvc-workstation)
-installed=("${runtime[@]/%/:$native}" {libqel-message-protosvc-dev,qel-wire}:"$native")
+installed=("${runtime[@]/%/:$native}" {libqel-message-protosvc-dev,qel-message-testkit,qel-wire}:"$native")
 if [ -n "$TOOLCHAIN" ]; then
   runtime=(qel-message-protosvc-emulator)
   installed+=({qel-message-protosvc-emulator,libqel-message-protosvc-dev}:"$ARCHITECTURE")
@@ -128,6 +128,12 @@ compile() {
   run -0 run_installed "$root/usr/bin/qel-wire" --version
   [ "$output" = "qel-wire $VERSION" ]
   zgrep 'broken at offset\|explain' "$root/usr/share/man/man1/qel-wire.1.gz"
+}
+
+@test "the test kit's program plays a scenario of its package" {
+  [ -z "$TOOLCHAIN" ] || skip 'it is for workstations'
+  run_installed "$root/usr/bin/qel-testkit" \
+    --scenario "$root/usr/share/qel-message-protosvc/service.scenario" </dev/null
 }
 
 @test "nothing is left where the packages are removed" {
