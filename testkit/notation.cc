@@ -122,10 +122,11 @@ class PatternParser {
       set_member(message, field, sign.empty() ? number : -number);
       return;
     }
-    std::string text = sign;
-    do {
-      text += tokens_.take() + " ";
-    } while (sign.empty() && text[0] == '"' && tokens_.is_at(Tokenizer::TYPE_STRING));
+    const bool is_text = tokens_.is_at(Tokenizer::TYPE_STRING);
+    std::string text = sign + tokens_.take();
+    while (is_text && tokens_.is_at(Tokenizer::TYPE_STRING)) {  // those that follow belong to it
+      text += " " + tokens_.take();
+    }
     LastError error;
     TextFormat::Parser parser;
     parser.RecordErrorsTo(&error);

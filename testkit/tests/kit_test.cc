@@ -141,6 +141,16 @@ TEST_F(TestKit, NewChatroom_CanBeEnteredAndLeft) {
             "the user has left it.\n");
 }
 
+TEST_F(TestKit, NewChatrooms_HaveIdsOfTheirOwn) {
+  start_signed_in("");
+  for (const char* id : {"1", "2"}) {
+    send("CreateChatroomRequest", std::string("chatType: GROUP receivers: 6001 requestId: ") + id);
+  }
+  const Lines replies = received();
+  EXPECT_NE(replies[0].find("chatroomId: 42"), std::string::npos);
+  EXPECT_NE(replies[1].find("chatroomId: 43"), std::string::npos);
+}
+
 TEST_F(TestKit, Chatroom_IsDescribedAsFarAsIsAskedFor) {
   start_signed_in("");
   send("AllowChatRequest", "requestId: 1 chatroomId: 42");
@@ -426,6 +436,18 @@ TEST_F(TestKit, AnotherAnswer_HasTheRequestsChatroom) {
   send("InviteRequest", "requestId: 5 chatroomId: 42 invitingMembers: 6007");
   EXPECT_EQ(received(),
             (Lines{"InviteReply: requestId: 5 chatroomId: 42", "InviteReply: requestId: 5"}));
+}
+
+TEST_F(TestKit, AnotherAnswerToARequestWithoutAChatroom_HasNone) {
+  start_signed_in(std::string(kClock) + "answer InviteReply");
+  send("CurrentTimeRequest", "requestId: 5");
+  EXPECT_EQ(received(), (Lines{"InviteReply: requestId: 5"}));
+}
+
+TEST_F(TestKit, FieldsOfAScenario_MayHaveSignsBetweenThem) {
+  start_signed_in("push TypingUpdated { requestId: 1, chatroomId: 2; sender: 3 state: 'a' 'b' }");
+  EXPECT_EQ(received(),
+            (Lines{"TypingUpdated: requestId: 1 chatroomId: 2 sender: 3 state: \"ab\""}));
 }
 
 TEST_F(TestKit, AnswerWithFields_HasThemInsteadOfTheServices) {

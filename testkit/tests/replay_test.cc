@@ -222,8 +222,10 @@ TEST_F(Replay, UnknownName_IsSaid) {
 }
 
 TEST_F(Replay, OtherFiles_AreRefused) {
-  start_with("no session");
-  EXPECT_EQ(end(), "The session cannot be replayed: it is no pcapng file.\n");
+  for (const char* bytes : {"", "\n\r\r\n", "no session at all"}) {
+    start_with(bytes);
+    EXPECT_EQ(end(), "The session cannot be replayed: it is no pcapng file.\n") << bytes;
+  }
 }
 
 TEST_F(Replay, EachPrefixAndEachChangedByte_IsReadOrRefused) {
