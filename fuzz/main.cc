@@ -19,6 +19,7 @@ std::vector<Target> all_targets() {
   targets.push_back({"round_trip", check_round_trip});
   targets.push_back({"qel_wire", check_qel_wire});
   targets.push_back({"qel_wire_input", check_qel_wire_input});
+  targets.push_back({"testkit", check_testkit});
   return targets;
 }
 

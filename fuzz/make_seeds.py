@@ -1,5 +1,5 @@
 #!/usr/bin/python3
-"""make_seeds.py CONTRACT.json SCHEMA-FOLDER SEEDS
+"""make_seeds.py CONTRACT.json SCHEMA-FOLDER SCENARIOS SEEDS
 
 Writes the seeds of every fuzz target into SEEDS/TARGET: of a deserializer what its cases of the
 contract receive, of the others each message of the schema with all its fields, alone or as it is found."""
@@ -28,8 +28,24 @@ def capture(data):
     return file
 
 
+def block(kind, body):
+    """A block of pcapng."""
+    body += bytes(-len(body) % 4)
+    length = struct.pack("<I", len(body) + 12)
+    return struct.pack("<I", kind) + length + body + length
+
+
+def session(name, message):
+    """A recorded session with a message that was received, and sent."""
+    file = block(0x0A0D0D0A, struct.pack("<IHHq", 0x1A2B3C4D, 1, 0, -1)) + block(1, struct.pack("<HHI", 147, 0, 0))
+    for number in 1, 2:
+        data = b"qel\1" + struct.pack("<IBBH", number, 3 - number, 1, len(name)) + name.encode() + message
+        file += block(6, struct.pack("<IIIII", 0, 0, 0, len(data), len(data)) + data)
+    return file
+
+
 def main():
-    contract, schema_folder, folder = sys.argv[1:]
+    contract, schema_folder, scenarios, folder = sys.argv[1:]
     contract = json.loads(pathlib.Path(contract).read_text())
 
     def seed(target, name, data):
@@ -44,6 +60,8 @@ def main():
         name = message.DESCRIPTOR.name
         encoded = schema.fill(message).SerializeToString(deterministic=True)
         seed("round_trip", name, bytes([number]) + encoded)  # the first byte chooses the message
+        seed("testkit", name, bytes([number]) + encoded)
+        seed("testkit", f"{name}_session", session(name, encoded))
         seed("qel_wire", name, bytes([number]) + encoded)
         seed("qel_wire", f"{name}_unusual", bytes([number]) + UNUSUAL)
         seed("qel_wire_input", f"{name}_run", encoded * 2)
@@ -56,6 +74,8 @@ def main():
         seed("qel_wire_input", command.replace(" ", ""), dump)
     for number, text in enumerate(('"\\x08\\7`*"', "{0x08, 0x07}", '["08", "0x07"]', "08:07-60", "$1 = {8, 7}")):
         seed("qel_wire_input", f"text_{number}", text.encode())
+    for scenario in pathlib.Path(scenarios).iterdir():  # without the comment that it begins with
+        seed("testkit", scenario.name, scenario.read_bytes().split(b"\n\n", 1)[1])
     for number in range(len(contract["messages"])):  # the first byte chooses the function
         seed("serializers", number, bytes([number]) + bytes(range(1, 200)))
         seed("serializers", f"{number}_ones", bytes([number]) + b"\1\1" * 100)

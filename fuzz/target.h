@@ -21,6 +21,7 @@ void check_serializers(const std::string& bytes);
 void check_round_trip(const std::string& bytes);
 void check_qel_wire(const std::string& bytes);
 void check_qel_wire_input(const std::string& bytes);
+void check_testkit(const std::string& bytes);
 
 // Of the schema's message that a byte of the input chooses, or of the one of that name.
 std::unique_ptr<google::protobuf::Message> new_message(unsigned char choice);

@@ -64,6 +64,7 @@ Kit::Kit(const std::string& scenario) {
     statement.where.clear();
   }
   parse_scenario(scenario, &scenario_);
+  hide(scenario_.world.accesstoken());
   service_.emplace(scenario_.world);
   play();
 }
@@ -84,10 +85,27 @@ Kit::Kit(std::vector<Statement> session, std::set<std::string> ignored)
 void Kit::complain(const std::string& sentence) {
   ++complaints_;
   if (complaints_ < kMostComplaints) {
-    report_ += sentence.empty() ? "" : sentence + "\n";
+    report_ += sentence.empty() ? "" : without_tokens(sentence) + "\n";
   } else if (complaints_ == kMostComplaints) {
     report_ += "There is more, and nothing is delivered any longer.\n";
     line_.clear();
+  }
+}
+
+// Wherever a plug-in sends them.
+std::string Kit::without_tokens(std::string text) const {
+  for (const std::string& token : tokens_) {
+    for (size_t at = 0; (at = text.find(token, at)) != std::string::npos;) {
+      text.replace(at, token.size(), kNotShown);
+    }
+  }
+  return text;
+}
+
+void Kit::hide(const std::string& token) {
+  constexpr size_t kLeast = 8;  // a shorter one may be a part of any sentence
+  if (token.size() >= kLeast) {
+    tokens_.insert(token);
   }
 }
 
@@ -143,14 +161,17 @@ void Kit::sent(const std::string& name, const std::string& bytes) {
   ++messages_;
   const auto* type = message_type(name);
   if (type == nullptr) {
-    complain("Message " + std::to_string(messages_) +
-             " of the plug-in has a name that the schema does not have: " + name + ".");
+    complain("Message " + std::to_string(messages_) + " of the plug-in has a name " +
+             quoted_name(name) + ", which is that of no message.");
     return;
   }
   const std::unique_ptr<Message> message = new_message(*type);
   if (!message->ParseFromString(bytes)) {
     complain_of(*message, "cannot be read", {"its bytes are broken, or those of another message"});
     return;
+  }
+  if (const auto* auth = dynamic_cast<const ChannelAuthRequest*>(message.get())) {
+    hide(auth->accesstoken());
   }
   Messages said;
   if (service_.has_value()) {

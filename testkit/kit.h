@@ -51,6 +51,8 @@ class Kit {
 
   // An empty sentence counts only.
   void complain(const std::string& sentence);
+  std::string without_tokens(std::string text) const;
+  void hide(const std::string& token);
   void complain_of(const google::protobuf::Message& message, const std::string& what,
                    const std::vector<std::string>& reasons);
   void play();
@@ -79,6 +81,7 @@ class Kit {
   Messages said_;
   std::deque<Delivery> line_;          // in the order of their times
   std::optional<Delivery> held_back_;  // until the next one
+  std::set<std::string> tokens_;       // not to be shown
   int messages_ = 0;                   // of the plug-in
   int complaints_ = 0;
   std::string report_;

@@ -7,6 +7,7 @@
 #include <google/protobuf/wire_format.h>
 
 #include <algorithm>
+#include <cctype>
 #include <limits>
 
 namespace testkit {
@@ -188,10 +189,9 @@ class PatternParser {
 
 // ---- Comparing
 
-// The access token is a credential and is not shown.
 std::string shown(const Message& message, const FieldDescriptor& field, int index) {
   if (field.name() == "accessToken") {
-    return "(not shown)";
+    return kNotShown;
   }
   constexpr size_t kMost = 100;  // bytes of a value, which may be a long text
   TextFormat::Printer printer;
@@ -343,6 +343,15 @@ void make_room(const Pattern& pattern, const Message& given, Message* message) {
 const Descriptor* message_type(const std::string& name) {
   const Descriptor* type = DescriptorPool::generated_pool()->FindMessageTypeByName(name);
   return type != nullptr && type->file()->package().empty() ? type : nullptr;
+}
+
+std::string quoted_name(const std::string& name) {
+  constexpr size_t kMost = 63;
+  const bool is_name =
+      name.size() <= kMost && std::all_of(name.begin(), name.end(), [](unsigned char c) {
+        return std::isalnum(c) != 0 || c == '_';
+      });
+  return is_name ? "'" + name + "'" : "of other characters";
 }
 
 std::unique_ptr<Message> new_message(const Descriptor& type) {

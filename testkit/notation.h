@@ -32,6 +32,10 @@ struct Misread {
 
 // Null if the schema has none.
 const google::protobuf::Descriptor* message_type(const std::string& name);
+// What stands for an access token, which is a credential.
+constexpr char kNotShown[] = "(not shown)";
+// A name for a report: in quotes, or what it is instead if it is none, and may be anything.
+std::string quoted_name(const std::string& name);
 // An empty message. The type is one that is linked.
 std::unique_ptr<google::protobuf::Message> new_message(const google::protobuf::Descriptor& type);
 

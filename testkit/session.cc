@@ -119,7 +119,7 @@ const google::protobuf::Descriptor& type_of(const std::string& name, const std::
   const auto* type =
       message_type(function == messages_of_functions().end() ? name : function->second);
   if (type == nullptr) {
-    throw Unreadable{where + " has the name '" + name + "', which is that of no message"};
+    throw Unreadable{where + " has a name " + quoted_name(name) + ", which is that of no message"};
   }
   return *type;
 }

@@ -289,7 +289,7 @@ struct PluginMistake {
 
 const PluginMistake kPluginMistakes[] = {
     {"NoMessage", false, "NoSuchMessage", Fields(),
-     "Message 1 of the plug-in has a name that the schema does not have: NoSuchMessage."},
+     "Message 1 of the plug-in has a name 'NoSuchMessage', which is that of no message."},
     {"BrokenMessage", false, "ChannelAuthRequest", kBroken,
      "Message 1 of the plug-in, a ChannelAuthRequest, cannot be read: its bytes are broken, or "
      "those of another message."},

@@ -315,6 +315,23 @@ TEST_F(TestKit, AccessToken_IsNeverReported) {
   EXPECT_NE(report().find("accessToken is (not shown) instead of (not shown)"), std::string::npos);
 }
 
+TEST_F(TestKit, AccessTokenInAnotherPlace_IsNotReportedEither) {
+  start_signed_in("expect ChangeChatroomMetaRequest { title: 'x' }");
+  send("ChangeChatroomMetaRequest",
+       "requestId: 1 chatroomId: 42 title: 'my example-access-token!'");
+  EXPECT_EQ(end(),
+            "Message 1 of the plug-in, a ChangeChatroomMetaRequest, is not what line 1 expects: "
+            "title is \"my (not shown)!\" instead of \"x\".\n");
+}
+
+TEST_F(TestKit, NameThatMayBeAnything_IsNotShown) {
+  start_signed_in("");
+  send_bytes("\x05my-token\n", "");
+  EXPECT_EQ(end(),
+            "Message 1 of the plug-in has a name of other characters, which is that of no "
+            "message.\n");
+}
+
 TEST_F(TestKit, WhatIsNotExpected_TheServiceAnswers) {
   start_signed_in("expect CurrentTimeRequest");
   send("GetAllReadAckRequest", "requestId: 1");

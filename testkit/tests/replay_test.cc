@@ -217,7 +217,7 @@ TEST_F(Replay, UnknownName_IsSaid) {
   file.record(kReceived, "nothing_deserialize", "");
   start(file);
   EXPECT_EQ(end(),
-            "The session cannot be replayed: record 1 has the name 'nothing_deserialize', which is "
+            "The session cannot be replayed: record 1 has a name 'nothing_deserialize', which is "
             "that of no message.\n");
 }
 
