@@ -147,7 +147,7 @@ TEST_F(TestKit, NewChatrooms_HaveIdsOfTheirOwn) {
     send("CreateChatroomRequest", std::string("chatType: GROUP receivers: 6001 requestId: ") + id);
   }
   const Lines replies = received();
-  EXPECT_NE(replies[0].find("chatroomId: 42"), std::string::npos);
+  EXPECT_NE(replies[0].find("chatroomId: 42 result { code: 0 "), std::string::npos) << replies[0];
   EXPECT_NE(replies[1].find("chatroomId: 43"), std::string::npos);
 }
 
@@ -322,6 +322,14 @@ TEST_F(TestKit, AccessTokenInAnotherPlace_IsNotReportedEither) {
   EXPECT_EQ(end(),
             "Message 1 of the plug-in, a ChangeChatroomMetaRequest, is not what line 1 expects: "
             "title is \"my (not shown)!\" instead of \"x\".\n");
+}
+
+TEST_F(TestKit, AccessTokenOfThePlugin_IsNotReportedEither) {
+  start(nullptr);
+  send("ChannelAuthRequest",
+       "requestId: 1 userId: 1 deviceId: 7 appId: 'a' accessToken: 'another_token'");
+  send_bytes("another_token", "");
+  EXPECT_EQ(end().find("another_token"), std::string::npos);
 }
 
 TEST_F(TestKit, NameThatMayBeAnything_IsNotShown) {
@@ -562,6 +570,14 @@ TEST_F(TestKit, SwappedMessage_ComesBehindTheNext) {
   EXPECT_EQ(received(),
             (Lines{"TypingUpdated: requestId: 700002", "TypingUpdated: requestId: 700001",
                    "TypingUpdated: requestId: 700003"}));
+}
+
+TEST_F(TestKit, SwappedMessage_WaitsForALateNextOne) {
+  start_signed_in("push TypingUpdated swapped with the next push TypingUpdated after 1s");
+  EXPECT_EQ(received(), Lines{});
+  qel_testkit_wait(kit_, 1000);
+  EXPECT_EQ(received(),
+            (Lines{"TypingUpdated: requestId: 700002", "TypingUpdated: requestId: 700001"}));
 }
 
 TEST_F(TestKit, SwappedMessageWithoutANextOne_IsReported) {
