@@ -72,6 +72,15 @@ ALLOCATORS = {"glibc's": {},
                   {"GLIBC_TUNABLES": "glibc.malloc.tcache_count=10000"},
               "jemalloc": {"LD_PRELOAD": "libjemalloc.so.2"}}
 
+# The recorder stands before the library if it is preloaded. Of longer messages, copying takes more.
+RECORDER_NS = 1000
+LONG_CASES = ["chat_request/40000", "message_page/500", "chatroom_entry/500"]
+
+
+def recorder(build):
+    return {"without": {}, "with": {"LD_PRELOAD": str(build.folder / "qel-trace" / "libqel-trace.so"),
+                                    "QEL_TRACE_FILE": str(build.folder / "bench" / "recorded.pcapng")}}
+
 
 def benchmark(program, case="", counter="cpu_time", seconds=0.02, settings=None):
     """The nanoseconds of the program's benchmarks by name: of all, or of those of a case."""
@@ -96,6 +105,9 @@ class Rounds:
 
     def median(self, name):
         return statistics.median(self.values[name])
+
+    def difference(self, name, to):
+        return statistics.median(a - b for a, b in zip(self.values[name], self.values[to]))
 
     def ratio(self, name, to):
         return statistics.median(a / b for a, b in zip(self.values[name], self.values[to]))
@@ -126,6 +138,10 @@ def time_calls(build, rounds):
                 times.add(("at_once", case, int(name.rsplit(":", 1)[1])), time)
         for name, time in benchmark(str(build.folder / "bench" / "time_parts")).items():
             times.add(("part", name), time)
+        for case in measure.CASES:
+            for name, settings in in_turn(list(recorder(build).items()), number):
+                time = benchmark(build.program("time_calls", "ours"), case, settings=settings)[case]
+                times.add(("recorder", name, case), time)
         for allocator, settings in ALLOCATORS.items():
             for case in ALLOCATOR_CASES:
                 time = benchmark(build.program("time_calls", "ours"), case, settings=settings)[case]
@@ -188,6 +204,9 @@ def measure_all(build, arm_builds, rounds):
         "parts": {name[1]: times.median(name) for name in times.values if name[0] == "part"},
         "allocators": {name: {case: times.median(("allocator", name, case)) for case in ALLOCATOR_CASES}
                        for name in ALLOCATORS},
+        "recorder": {case: {"without": times.median(("recorder", "without", case)),
+                            "more": times.difference(("recorder", "with", case), ("recorder", "without", case))}
+                     for case in measure.CASES},
         "loading": {name: {"ns": loading.median(name), "ratio": loading.ratio(name, "plain")}
                     for name in loading.values},
         "size": {each.name: size_of(each, scratch) for each in builds},
@@ -259,6 +278,9 @@ def thresholds(results):
             yield Threshold(
                 f"{CASE_NAMES[case]}: instructions on {PRESETS[preset]} through qel-message.h, ratio",
                 counted["message"] / counted["ours"], measure.HEADER_THRESHOLD, is_ratio=True)
+    for case, times in results["recorder"].items():
+        if case not in LONG_CASES:
+            yield Threshold(f"{CASE_NAMES[case]}: ns that the recorder takes", times["more"], RECORDER_NS)
     for name, threshold in LOADING_RATIOS.items():
         yield Threshold(f"loading {name}, ratio", results["loading"][name]["ratio"], threshold,
                         is_ratio=True)
@@ -342,6 +364,9 @@ def report(results):
     allocators = table(["ns a call, by allocator", *(CASE_NAMES[case] for case in ALLOCATOR_CASES)],
                        [[name, *(number(times[case]) for case in ALLOCATOR_CASES)]
                         for name, times in results["allocators"].items()])
+    recorded = table(["ns a call", "without the recorder", "that it takes"],
+                     [[CASE_NAMES[case], number(times["without"]), number(times["more"])]
+                      for case, times in results["recorder"].items()])
     return f"""# Benchmark
 
 Written by `{results['command']}` on {results['date']}. {about['processor']}; {about['system']};
@@ -357,6 +382,8 @@ numbers are explained in [performance.md](../performance.md).
 {threads}
 
 {allocators}
+
+{recorded}
 
 {parts_table(results)}
 

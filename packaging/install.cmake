@@ -10,6 +10,8 @@ set(_cmake_package "${CMAKE_INSTALL_LIBDIR}/cmake/${PROJECT_NAME}")
 # With the name that has no number: programs on devices may name it so.
 install(TARGETS qel-message-protosvc LIBRARY COMPONENT runtime)
 
+install(TARGETS qel-trace LIBRARY COMPONENT trace)
+
 install(
   FILES proto-lib/qel-message.h proto-lib/qel-message-serialize.h
     "${PROJECT_BINARY_DIR}/proto-lib/msgspec_frontend.pb.h"
@@ -77,7 +79,7 @@ install(FILES ${_example} DESTINATION "${CMAKE_INSTALL_DATADIR}/doc/${PROJECT_NA
   COMPONENT documentation)
 
 # Builds what is installed.
-add_custom_target(packaged DEPENDS qel-message-protosvc contract)
+add_custom_target(packaged DEPENDS qel-message-protosvc contract qel-trace)
 foreach(_target qel-wire qel-wire-says docs)
   if(TARGET ${_target})
     add_dependencies(packaged ${_target})
