@@ -61,15 +61,10 @@ void* library_function(size_t index) {
   return function;
 }
 
-/* The program's own, if it has one. */
 log_function_t library_log(void) {
-  static const char name[] = "__dlog_print";
-  void* address = real_lookup()(RTLD_DEFAULT, name);
-  void* const library = address == NULL ? loaded_library() : NULL;
+  void* const library = loaded_library();
+  void* const address = library != NULL ? real_lookup()(library, "__dlog_print") : NULL;
   log_function_t log = NULL;
-  if (library != NULL) {
-    address = real_lookup()(library, name);
-  }
   memcpy(&log, &address, sizeof log);
   return log;
 }

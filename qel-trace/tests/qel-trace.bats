@@ -74,6 +74,13 @@ hex() { printf %s "$1" | od -An -v -tx1 | tr -d ' \n'; }
   session session.* | grep -q 'received not-ended chat_reply_deserialize'
 }
 
+@test "a call that an exception ends is recorded as ended" {
+  recorded "$PWD/session" "$BUILD/tests/contract_tests" --gtest_brief \
+    --gtest_filter='chat_reply_deserialize/each_new_refused.*'
+  session session | grep -c 'received done'
+  session session | grep 'not-ended' | none
+}
+
 @test "eight threads that call at once have their own results and lines, and all are recorded" {
   recorded "$PWD/session" "$BUILD/tests/contract_threads_tests" --gtest_brief
   session session | awk '{ last = $1; n += 1 } END { exit !(n > 1000 && n <= last) }'
@@ -178,7 +185,7 @@ in_trouble() {
 }
 
 @test "where there is no library, programs find what they found before" {
-  recorded "$PWD/session" "$TESTS/loader"
+  LD_LIBRARY_PATH=${LIBRARY%/*} recorded "$PWD/session" "$TESTS/loader" # nor do they load the library
   recorded "$PWD/session" /bin/true || [ -n "$EMULATOR" ]
   [ ! -e session ]
 }
