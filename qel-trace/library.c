@@ -2,6 +2,7 @@
 #include "library.h"
 
 #include <dlfcn.h>
+#include <errno.h>
 #include <stdio.h>
 #include <stdlib.h>
 #include <string.h>
@@ -19,9 +20,6 @@
 
 typedef void* (*lookup_t)(void* handle, const char* name);
 
-static void* found_functions[TRACED_FUNCTIONS];
-
-/* Names of functions are data to the C library. */
 static lookup_t real_lookup(void) {
   static lookup_t real;
   lookup_t lookup = __atomic_load_n(&real, __ATOMIC_RELAXED);
@@ -38,27 +36,44 @@ static void* loaded_library(void) {
   return dlopen(QEL_TRACED_LIBRARY, RTLD_LAZY | RTLD_NOLOAD);
 }
 
-static void* loaded_function(size_t index) {
-  void* function = __atomic_load_n(&found_functions[index], __ATOMIC_RELAXED);
-  void* const library = function == NULL ? loaded_library() : NULL;
-  if (library != NULL) {
-    function = real_lookup()(library, traced_functions[index].name);
-    __atomic_store_n(&found_functions[index], function, __ATOMIC_RELAXED);
+/* All at once: a look-up waits for threads that are loading something, and is over then for good. In
+   the global scope, others may stand between the library and this one. */
+static void find_functions(void) {
+  const lookup_t lookup = real_lookup();
+  void* const library = loaded_library();
+  for (size_t i = 0; i < traced_function_count; ++i) {
+    traced_function_t* const function = &traced_functions[i];
+    void* behind = __atomic_load_n(&function->behind, __ATOMIC_RELAXED);
+    if (behind == NULL) {
+      behind = lookup(RTLD_NEXT, function->name);
+    }
+    if (behind == NULL && library != NULL) {
+      behind = lookup(library, function->name);
+    }
+    __atomic_store_n(&function->behind, behind, __ATOMIC_RELAXED);
   }
-  return function;
 }
 
-void* library_function(size_t index) {
-  void* function = loaded_function(index);
-  if (function == NULL && dlopen(QEL_TRACED_LIBRARY, RTLD_LAZY) != NULL) {
-    function = loaded_function(index);
+static void* found_behind(traced_function_t* function) {
+  if (__atomic_load_n(&function->behind, __ATOMIC_RELAXED) == NULL) {
+    find_functions();
   }
-  if (function == NULL) {
-    fprintf(stderr, "QEL_TRACE: there is no %s of " QEL_TRACED_LIBRARY ": %s\n",
-            traced_functions[index].name, dlerror());
+  return __atomic_load_n(&function->behind, __ATOMIC_RELAXED);
+}
+
+void* function_behind(traced_function_t* function) {
+  const int error = errno;
+  void* behind = found_behind(function);
+  if (behind == NULL && dlopen(QEL_TRACED_LIBRARY, RTLD_LAZY) != NULL) {
+    behind = found_behind(function);
+  }
+  if (behind == NULL) {
+    fprintf(stderr, "QEL_TRACE: there is no %s of " QEL_TRACED_LIBRARY ": %s\n", function->name,
+            dlerror());
     abort();
   }
-  return function;
+  errno = error;
+  return behind;
 }
 
 log_function_t library_log(void) {
@@ -69,6 +84,8 @@ log_function_t library_log(void) {
   return log;
 }
 
+/* ---- Programs that look functions up */
+
 /* Sanitizers look functions up before any of them may be called, and strcmp is one of theirs. */
 static int is_same(const char* one, const char* other) {
   while (*one != '\0' && *one == *other) {
@@ -78,23 +95,32 @@ static int is_same(const char* one, const char* other) {
   return *one == *other;
 }
 
-/* Programs may look the library's functions up in the library itself, and find these; without the
-   library they find none. What RTLD_NEXT means depends on who calls, so other look-ups are tail
-   calls: they return to the caller. */
+static traced_function_t* function_named(const char* name) {
+  for (size_t i = 0; i < traced_function_count; ++i) {
+    if (is_same(name, traced_functions[i].name)) {
+      return &traced_functions[i];
+    }
+  }
+  return NULL;
+}
+
+/* Who looks a function up in the library itself finds the one here; without the library, none. What
+   RTLD_NEXT means depends on who calls, so other look-ups are tail calls: they return to the
+   caller. */
 void* dlsym(void* restrict handle, const char* restrict name) {
   const lookup_t real = real_lookup();
-  size_t index = 0;
-  while (index < TRACED_FUNCTIONS && !is_same(name, traced_functions[index].name)) {
-    ++index;
-  }
-  if (index == TRACED_FUNCTIONS || handle == RTLD_NEXT) {
+  traced_function_t* const function = function_named(name);
+  if (function == NULL || handle == RTLD_NEXT) {
     return real(handle, name);
   }
   void* const found = real(handle, name);
-  void* const address = traced_functions[index].address;
-  void* const behind = loaded_function(index);
-  if (behind == NULL) {
-    return found == address ? NULL : found;
+  if (found == NULL) {
+    return NULL;
   }
-  return found == behind ? address : found;
+  void* const behind = found_behind(function);
+  if (behind == NULL && found == function->address) {
+    real(RTLD_NEXT, name); /* finds none, and dlerror() says so */
+    return NULL;
+  }
+  return found == behind ? function->address : found;
 }

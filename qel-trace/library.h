@@ -7,21 +7,23 @@
 
 #include <stddef.h>
 
-/* The library's, whatever scope it was loaded into. Ends the process if there is none. */
-void* library_function(size_t index);
+/* A function of calls.c, and the one behind it. */
+typedef struct traced_function {
+  const char* name;
+  void* address;
+  void* behind; /* NULL until it is looked up */
+} traced_function_t;
+
+extern traced_function_t traced_functions[];
+extern const size_t traced_function_count;
+
+/* What comes behind the function, whatever scope it was loaded into. Ends the process if nothing
+   does. */
+void* function_behind(traced_function_t* function);
 
 typedef int (*log_function_t)(int log_id, int priority, const char* tag, const char* format, ...);
 
 /* The log service that the library uses, or NULL. */
 log_function_t library_log(void);
-
-/* The functions of calls.c, in its order. */
-typedef struct traced_function {
-  const char* name;
-  void* address;
-} traced_function_t;
-
-enum { TRACED_FUNCTIONS = 32 };
-extern const traced_function_t traced_functions[TRACED_FUNCTIONS];
 
 #endif

@@ -18,15 +18,15 @@ void trace_sent(const char* function, unsigned char* const* message, const int* 
 /* A deserializer's call. The library writes the requestId whenever it takes the bytes. So it gets
    another place for that, from which the caller's is set behind the call. */
 typedef struct received {
-  int64_t* request_id; /* for the library, NULL if the caller's is NULL */
-  int64_t* of_caller;  /* NULL: nothing is recorded, or nobody can tell whether the bytes are taken */
+  int64_t* request_id; /* for the library */
+  int64_t* of_caller;  /* NULL: nobody can tell whether the bytes are taken */
   int64_t own, unwritten;
   record_place_t place;
 } received_t;
 
-/* Before the call. */
+/* Before the call. A requestId that is NULL, or that is another output too, is left alone. */
 void trace_received(received_t* call, const char* function, const unsigned char* data, int size,
-                    int64_t* request_id);
+                    int64_t* request_id, bool is_shared);
 
 /* Behind it, also if an exception ends it. */
 void trace_received_end(received_t* call);

@@ -17,6 +17,13 @@ enum { SECTION = 0x0a0d0d0a, INTERFACE = 1, PACKET = 6, BLOCK_SIZE = 12 };
 
 enum { PACKET_HEAD = 20, RECORD_HEAD = 12 };
 
+/* What is not used is divided at these places, so that a block of it has both its lengths near the
+   records, which change them: a copy of the file reads both at about the same time. */
+enum { UNUSED_SIZE = 64 << 10 };
+
+/* A secret is searched for by its first bytes, as a search prepares itself for all that it gets. */
+enum { SEARCHED_SIZE = 32 };
+
 static size_t padded(size_t size) {
   return (size + 3) & ~(size_t)3;
 }
@@ -75,22 +82,50 @@ static size_t write_head(unsigned char* begin, size_t half_size, const char* wri
   return (size_t)(finish_block(block, to) - begin);
 }
 
-/* Makes one unused block of all behind the head. */
+/* Where an unused block ends that begins there. */
+static size_t end_of_unused(size_t begin, size_t half_size) {
+  const size_t end = (begin + BLOCK_SIZE + UNUSED_SIZE - 1) / UNUSED_SIZE * UNUSED_SIZE;
+  return end < half_size ? end : half_size;
+}
+
+/* The two ends of an unused block are changed one after the other. But for the moment between them,
+   which two stores take, each half is a row of whole blocks. */
+
+/* Makes unused blocks of all behind the head: at first one, and then, in it, the others. */
 static void empty(recording_t* recording, half_t* half) {
-  const uint32_t size = (uint32_t)(recording->half_size - recording->head_size);
-  unsigned char* const block = half->begin + recording->head_size;
-  publish32(block, UNUSED);
-  publish32(half->begin + recording->half_size - 4, size);
-  publish32(block + 4, size);
+  const size_t size = recording->half_size;
+  const size_t first_end = end_of_unused(recording->head_size, size);
+  unsigned char* const first = half->begin + recording->head_size;
+  size_t begin = first_end;
+  uint32_t last_size = (uint32_t)(size - recording->head_size);
+
+  publish32(first, UNUSED);
+  publish32(half->begin + size - 4, last_size);
+  publish32(first + 4, last_size);
   half->used = recording->head_size;
   half->first_number = recording->last_number + 1;
+
+  if (first_end < size) {
+    put32(half->begin + first_end - 4, (uint32_t)(first_end - recording->head_size));
+  }
+  while (begin < size) {
+    const size_t end = end_of_unused(begin, size);
+    last_size = (uint32_t)(end - begin);
+    put32(put32(half->begin + begin, UNUSED), last_size);
+    if (end < size) {
+      put32(half->begin + end - 4, last_size);
+    }
+    begin = end;
+  }
+  publish32(half->begin + size - 4, last_size);
+  publish32(first + 4, (uint32_t)(first_end - recording->head_size));
 }
 
 /* ---- The file */
 
 static int move_away(const char* file) {
   struct stat status;
-  char old[PATH_MAX];
+  static char old[PATH_MAX]; /* the stack of the thread may be small */
   if (lstat(file, &status) != 0) {
     return errno == ENOENT ? 0 : errno;
   }
@@ -110,7 +145,12 @@ static bool is_within_limit(size_t size) {
 }
 
 static int map_file(int file, size_t size, unsigned char** mapping) {
-  const int error = is_within_limit(size) ? posix_fallocate(file, 0, (off_t)size) : EFBIG;
+  int error = EFBIG;
+  if (is_within_limit(size)) {
+    do {
+      error = posix_fallocate(file, 0, (off_t)size);
+    } while (error == EINTR);
+  }
   if (error != 0) {
     return error;
   }
@@ -140,6 +180,7 @@ int recording_create(recording_t* recording, const char* file, size_t size, cons
     recording->half_size = 0;
     return error;
   }
+  ++recording->file_number;
   recording->last_number = 0;
   recording->current = 0;
   for (int i = 0; i < 2; ++i) {
@@ -153,26 +194,49 @@ int recording_create(recording_t* recording, const char* file, size_t size, cons
 void recording_leave(recording_t* recording) {
   if (recording->half_size > 0) {
     munmap(recording->halves[0].begin, 2 * recording->half_size);
-    memset(recording, 0, sizeof *recording);
+    recording->half_size = 0;
   }
 }
 
 /* ---- Records */
 
-/* The secret is never written, not even for a moment. */
-static void copy_without(secret_t secret, const unsigned char* from, size_t size,
-                         unsigned char* to, size_t room) {
-  size_t done = 0;
-  while (done < size && done < room) {
-    const unsigned char* const found =
-        secret.size > 0 ? memmem(from + done, size - done, secret.bytes, secret.size) : NULL;
-    const size_t end = found != NULL ? (size_t)(found - from) : size;
-    const size_t hidden = found != NULL ? end + secret.size : size;
-    memcpy(to + done, from + done, (end < room ? end : room) - done);
-    if (end < room) {
-      memset(to + end, '*', (hidden < room ? hidden : room) - end);
+/* Where the secret is, or NULL. */
+static const unsigned char* find(secret_t secret, const unsigned char* from, size_t size) {
+  const size_t searched = secret.size < SEARCHED_SIZE ? secret.size : SEARCHED_SIZE;
+  const unsigned char* const end = from + size;
+  const unsigned char* found = from;
+  while ((found = memmem(found, (size_t)(end - found), secret.bytes, searched)) != NULL) {
+    if ((size_t)(end - found) >= secret.size && memcmp(found, secret.bytes, secret.size) == 0) {
+      return found;
     }
-    done = hidden;
+    ++found;
+  }
+  return NULL;
+}
+
+/* Copies as much as there is room for. No secret is written, not even for a moment. */
+static void copy_without_secrets(const record_t* record, unsigned char* to, size_t room) {
+  size_t done = 0;
+  while (done < record->size && done < room) {
+    size_t end = record->size;
+    size_t hidden = 0;
+    for (size_t i = 0; i < record->secret_count; ++i) {
+      const secret_t secret = record->secrets[i];
+      const size_t reach = end < room ? end : room;
+      const size_t rest = record->size - done;
+      const size_t most = reach - done + secret.size;
+      const unsigned char* const found =
+          find(secret, record->data + done, rest < most ? rest : most);
+      if (found != NULL && (size_t)(found - record->data) < end) {
+        end = (size_t)(found - record->data);
+        hidden = secret.size;
+      }
+    }
+    memcpy(to + done, record->data + done, (end < room ? end : room) - done);
+    if (end < room) {
+      memset(to + end, '*', (end + hidden < room ? end + hidden : room) - end);
+    }
+    done = end + hidden;
   }
 }
 
@@ -194,6 +258,13 @@ record_place_t recording_add(recording_t* recording, const record_t* record) {
   ++recording->last_number;
 
   unsigned char* const block = half->begin + half->used;
+  const size_t rest_end = end_of_unused(half->used + block_size, recording->half_size);
+  if (rest_end != end_of_unused(half->used, recording->half_size)) { /* it needs more blocks */
+    const uint32_t room = (uint32_t)(rest_end - half->used);
+    publish32(half->begin + rest_end - 4, room);
+    publish32(block + 4, room);
+  }
+
   unsigned char* to = put32(block + 8, 0);
   to = put32(put32(to, (uint32_t)(record->time >> 32)), (uint32_t)record->time);
   to = put32(put32(to, (uint32_t)captured), (uint32_t)size);
@@ -203,25 +274,27 @@ record_place_t recording_add(recording_t* recording, const record_t* record) {
   place.outcome = to;
   *to++ = (unsigned char)record->outcome;
   to = put(put16(to, (unsigned)name_size), record->function, name_size);
-  copy_without(record->secret, record->data, record->size, to, captured - RECORD_HEAD - name_size);
+  copy_without_secrets(record, to, captured - RECORD_HEAD - name_size);
   memset(to + captured - RECORD_HEAD - name_size, 0, padded(captured) - captured);
   put32(block + block_size - 4, (uint32_t)block_size);
 
-  /* At each moment the half is a row of whole blocks, but for one between two of these lines. */
-  const uint32_t rest = (uint32_t)(recording->half_size - half->used - block_size);
+  const uint32_t rest = (uint32_t)(rest_end - half->used - block_size);
   put32(put32(block + block_size, UNUSED), rest);
-  publish32(half->begin + recording->half_size - 4, rest);
+  publish32(half->begin + rest_end - 4, rest);
   publish32(block + 4, (uint32_t)block_size);
   publish32(block, PACKET);
   half->used += block_size;
 
   place.number = recording->last_number;
   place.half = recording->current;
+  place.file_number = recording->file_number;
   return place;
 }
 
 void recording_end(recording_t* recording, const record_place_t* place, outcome_t outcome) {
-  if (recording->half_size > 0 && place->number >= recording->halves[place->half].first_number) {
+  const bool is_there = recording->half_size > 0 && place->file_number == recording->file_number &&
+                        place->number >= recording->halves[place->half].first_number;
+  if (is_there) {
     *place->outcome = (unsigned char)outcome;
   }
 }

@@ -23,7 +23,7 @@ typedef enum outcome { NOT_ENDED = 0, DONE = 1, REFUSED = 2, UNTOLD = 3 } outcom
 /* Bytes that are not written, but asterisks in their place, wherever they are in a message. */
 typedef struct secret {
   const char* bytes;
-  size_t size; /* 0: there is none */
+  size_t size; /* at least 1 */
 } secret_t;
 
 typedef struct record {
@@ -33,23 +33,25 @@ typedef struct record {
   const char* function;      /* its name */
   const unsigned char* data; /* the message; NULL if there is none */
   size_t size;               /* of it */
-  secret_t secret;
+  const secret_t* secrets;
+  size_t secret_count;
 } record_t;
 
 /* A half of the file, and a section of it. */
 typedef struct half {
   unsigned char* begin;
-  size_t used;           /* the rest of it is one block, which readers skip */
+  size_t used;           /* what is behind it are blocks that readers skip */
   uint32_t first_number; /* that its records have or will have */
 } half_t;
 
-/* Zeroed, it is no recording. */
+/* Begins zeroed, without a file. */
 typedef struct recording {
   half_t halves[2];
   int current;      /* the half that is being filled */
-  size_t half_size; /* 0: no recording */
+  size_t half_size; /* 0: there is no file */
   size_t head_size; /* of what each half begins with */
   uint32_t last_number;
+  unsigned file_number; /* of all files that the process, or a parent of it, has made */
 } recording_t;
 
 /* Where a record is, to add its outcome. Zeroed, there is none. */
@@ -57,6 +59,7 @@ typedef struct record_place {
   unsigned char* outcome;
   uint32_t number;
   int half;
+  unsigned file_number;
 } record_place_t;
 
 /*

@@ -22,19 +22,29 @@ static bool answer_many(const char* calls) {
   return is_done;
 }
 
-/* A login, and the token again in messages of both directions. */
 static bool log_in(const char* token) {
+  QEL_SCOPED(buffer, buffer);
+  return qel_channel_auth_request_write(&buffer, 1, 2, 3, token, token) == QEL_OK;
+}
+
+/* A message of the plug-in and one of the service with the text. */
+static bool say(const char* text) {
   unsigned char reply[256] = {0x12, 0, 0x12, 0};
-  const size_t size = strlen(token);
+  const size_t size = strlen(text);
   QEL_SCOPED(buffer, buffer);
   QEL_SCOPED(reply, read);
   reply[1] = (unsigned char)(size + 2);
   reply[3] = (unsigned char)size;
-  memcpy(reply + 4, token, size);
-  return qel_channel_auth_request_write(&buffer, 1, 2, 3, token, token) == QEL_OK &&
-         qel_chat_request_write(&buffer, 2, 42, 9, QEL_MSG_TYPE_TEXT, token, 0) == QEL_OK &&
+  memcpy(reply + 4, text, size);
+  return qel_chat_request_write(&buffer, 2, 42, 9, QEL_MSG_TYPE_TEXT, text, 0) == QEL_OK &&
          qel_channel_auth_reply_read(&read, reply, (int)size + 4) == QEL_OK &&
-         strcmp(read.resultMsg, token) == 0;
+         strcmp(read.resultMsg, text) == 0;
+}
+
+/* Two users log in, one after the other, and what is said later has the tokens of both. */
+static bool use_tokens(const char* token) {
+  return log_in(token) && log_in("another-secret-token") && log_in("short") && say(token) &&
+         say("another-secret-token") && say("short");
 }
 
 /* Bytes that are taken, that are refused, and of which nobody can tell; and a refused request. */
@@ -46,7 +56,8 @@ static bool end_in_all_ways(const char* ignored) {
   chat_reply_deserialize(bytes, 2, &id, NULL, NULL, NULL, &count, NULL, NULL);
   chat_reply_deserialize(bytes, 1, &id, NULL, NULL, NULL, &count, NULL, NULL);
   chat_reply_deserialize(bytes, 2, NULL, NULL, NULL, NULL, &count, NULL, NULL);
-  return id == 7 && change_chatroom_meta_request_serialize(1, 42, NULL, NULL, NULL, NULL) == -1;
+  read_message_reply_deserialize(bytes, 2, &id, &id, NULL, NULL); /* no chatroom comes last */
+  return id == 0 && change_chatroom_meta_request_serialize(1, 42, NULL, NULL, NULL, NULL) == -1;
 }
 
 static bool answer_around_a_fork(const char* ignored) {
@@ -73,10 +84,87 @@ static bool answer_in_threads_for_ever(const char* ignored) {
   return pause() == 0;
 }
 
+/* Children that call, of a process whose threads call. */
+static bool fork_among_threads(const char* ignored) {
+  static int firsts[] = {1, 2};
+  bool is_done = true;
+  pthread_t thread;
+  (void)ignored;
+  pthread_create(&thread, NULL, answer_for_ever, &firsts[0]);
+  pthread_create(&thread, NULL, answer_for_ever, &firsts[1]);
+  for (int i = 0; i < 50; ++i) {
+    const pid_t child = fork();
+    int status = 1;
+    if (child == 0) {
+      _exit(answer(1) ? 0 : 1);
+    }
+    is_done = waitpid(child, &status, 0) == child && status == 0 && is_done;
+  }
+  return is_done;
+}
+
+static pthread_mutex_t own_lock = PTHREAD_MUTEX_INITIALIZER;
+static void lock_own(void) {
+  pthread_mutex_lock(&own_lock);
+}
+static void unlock_own(void) {
+  pthread_mutex_unlock(&own_lock);
+}
+static void unlock_own_and_answer(void) {
+  pthread_mutex_unlock(&own_lock);
+  answer(1);
+}
+
+static void* answer_locked_for_ever(void* ignored) {
+  bool is_done = true;
+  while (is_done) {
+    lock_own();
+    is_done = answer(1);
+    unlock_own();
+  }
+  return ignored;
+}
+
+/* Of a plug-in that calls with a lock of its own held, which its handlers take. */
+static bool fork_with_handlers(const char* ignored) {
+  bool is_done = answer(1);
+  pthread_t thread;
+  (void)ignored;
+  pthread_atfork(lock_own, unlock_own, unlock_own_and_answer);
+  pthread_create(&thread, NULL, answer_locked_for_ever, NULL);
+  for (int i = 0; i < 50; ++i) {
+    const pid_t child = fork();
+    if (child == 0) {
+      _exit(0);
+    }
+    is_done = waitpid(child, NULL, 0) == child && is_done;
+  }
+  return is_done;
+}
+
+static void* answer_cancelled(void* ignored) {
+  pthread_cancel(pthread_self());
+  answer(1);
+  return ignored;
+}
+
+/* The first call of all is that of a thread which is to end at the next moment that waits. */
+static bool cancel_the_first(const char* ignored) {
+  pthread_t thread;
+  (void)ignored;
+  pthread_create(&thread, NULL, answer_cancelled, NULL);
+  pthread_join(thread, NULL);
+  return answer(2);
+}
+
 static bool keep_errno(const char* ignored) {
   (void)ignored;
   errno = ECHILD;
-  return answer(1) && errno == ECHILD;
+  if (!answer(1) || errno != ECHILD) {
+    return false;
+  }
+  errno = ECHILD;
+  return say("text") && errno == ECHILD;
 }
 
 static const struct {
@@ -84,14 +172,18 @@ static const struct {
   bool (*act)(const char* argument);
 } acts[] = {
     {"many", answer_many},
-    {"login", log_in},
+    {"tokens", use_tokens},
     {"ends", end_in_all_ways},
     {"fork", answer_around_a_fork},
     {"threads", answer_in_threads_for_ever},
+    {"forks", fork_among_threads},
+    {"handlers", fork_with_handlers},
+    {"cancel", cancel_the_first},
     {"errno", keep_errno},
 };
 
 int main(int argc, char** argv) {
+  alarm(60); /* if it hangs */
   for (size_t i = 0; argc > 1 && i < sizeof acts / sizeof acts[0]; ++i) {
     if (strcmp(argv[1], acts[i].name) == 0) {
       return acts[i].act(argv[argc - 1]) ? 0 : 1;

@@ -10,6 +10,7 @@
 #include <iterator>
 #include <map>
 #include <string>
+#include <vector>
 
 extern "C" {
 #include "recording.h"
@@ -71,14 +72,19 @@ class Recording : public ::testing::Test {
   int create(size_t size = LEAST_SIZE) {
     return recording_create(&recording_, file_.c_str(), size, "a test");
   }
-  record_place_t add(const std::string& message, const std::string& secret = "") {
+  record_place_t add(const std::string& message, const std::vector<std::string>& hidden = {}) {
+    std::vector<secret_t> secrets;
+    for (const std::string& secret : hidden) {
+      secrets.push_back({secret.data(), secret.size()});
+    }
     const record_t record = {RECEIVED,
                              NOT_ENDED,
                              1,
                              "name",
                              reinterpret_cast<const unsigned char*>(message.data()),
                              message.size(),
-                             {secret.data(), secret.size()}};
+                             secrets.data(),
+                             secrets.size()};
     return recording_add(&recording_, &record);
   }
 
@@ -130,14 +136,38 @@ TEST_F(Recording, WhenAMessageIsLongerThanAHalf_CutsItAndTellsItsSize) {
   EXPECT_GT(found.message.size(), LEAST_SIZE / 2 - 400);
 }
 
-TEST_F(Recording, OfASecret_WritesAsterisksWhereverItIs) {
+TEST_F(Recording, OfSecrets_WritesAsterisksWhereverTheyAre) {
   ASSERT_EQ(create(), 0);
-  add("secret, a secret and secre", "secret");
+  add("secret, a secret and secre", {"secret"});
   EXPECT_EQ(records_of(file_).at(1).message, "******, a ****** and secre");
-  // Where the message is cut, too, byte by byte.
-  for (size_t size = LEAST_SIZE / 2 - 400; size < LEAST_SIZE / 2; size += 1) {
-    add(std::string(size, 'x') + "secret" + std::string(400, 'x'), "secret");
+  add("one, two, one", {"two", "one"});
+  EXPECT_EQ(records_of(file_).at(2).message, "***, ***, ***");
+}
+
+TEST_F(Recording, OfALongSecret_ComparesAllOfIt) {
+  ASSERT_EQ(create(), 0);
+  const std::string secret(100, 'x');
+  add(std::string(99, 'x') + "!" + secret, {secret});
+  EXPECT_EQ(records_of(file_).at(1).message, std::string(99, 'x') + "!" + std::string(100, '*'));
+}
+
+TEST_F(Recording, OfASecretWhereTheMessageIsCut_WritesNoPart) {
+  ASSERT_EQ(create(), 0);
+  for (size_t size = LEAST_SIZE / 2 - 400; size < LEAST_SIZE / 2; ++size) {
+    add(std::string(size, 'x') + "secret" + std::string(400, 'x'), {"secret"});
     ASSERT_EQ(content_of(file_).find("se", 400), std::string::npos) << size;
+  }
+}
+
+TEST_F(Recording, OfAMessageThatNeedsMoreOfTheUnusedBlocks_StaysARowOfBlocks) {
+  ASSERT_EQ(create(1 << 20), 0);
+  std::map<uint32_t, size_t> added;
+  for (uint32_t number = 1; number <= 100; ++number) {
+    added[number] = number * size_t{48271} % 200000;
+    add(std::string(added[number], 'x'));
+    for (const auto& [found, record] : records_of(file_)) {
+      ASSERT_EQ(record.message.size(), added[found]);
+    }
   }
 }
 
@@ -161,6 +191,16 @@ TEST_F(Recording, WhenACallEndsWhoseRecordHasGone_ChangesNothing) {
   const std::string before = content_of(file_);
   recording_end(&recording_, &place, DONE);
   EXPECT_EQ(content_of(file_), before);
+}
+
+TEST_F(Recording, WhenACallEndsWhoseFileIsAnother_ChangesNothing) {
+  ASSERT_EQ(create(), 0);
+  const record_place_t place = add("1");
+  recording_leave(&recording_);
+  ASSERT_EQ(create(), 0);
+  add("1");
+  recording_end(&recording_, &place, DONE);
+  EXPECT_EQ(records_of(file_).at(1).outcome, NOT_ENDED);
 }
 
 TEST_F(Recording, WhenItsFileIsThere_RenamesIt) {

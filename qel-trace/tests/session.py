@@ -14,11 +14,12 @@ def blocks(data):
     at = 0
     while at < len(data):
         kind, size = struct.unpack_from("<II", data, at)
-        # A process may be killed between its lengths, which the recorder writes at once, one after the other.
-        if kind == UNUSED:
+        end = at + size
+        if size < 12 or end > len(data) or struct.unpack_from("<I", data, end - 4)[0] != size:
+            # A process may be killed between the two stores of an unused block's lengths.
+            if kind != UNUSED:
+                sys.exit(f"no whole block at {at}")
             size = (at // (len(data) // 2) + 1) * (len(data) // 2) - at
-        elif size < 12 or struct.unpack_from("<I", data, at + size - 4)[0] != size:
-            sys.exit(f"no whole block at {at}")
         yield kind, data[at + 8:at + size - 4]
         at += size
 
