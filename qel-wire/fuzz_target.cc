@@ -19,6 +19,7 @@
 #include "misread.h"
 #include "notation.h"
 #include "packets.h"
+#include "pcap_file.h"
 #include "print.h"
 #include "session.h"
 #include "target.h"

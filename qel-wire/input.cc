@@ -15,6 +15,7 @@
 #include "framing.h"
 #include "misread.h"
 #include "packets.h"
+#include "pcap_file.h"
 #include "text.h"
 #include "walk.h"
 
