@@ -107,10 +107,10 @@ Session::Alike* Session::requests_answered_by(const Found& found, const Descript
   return nullptr;
 }
 
-// A message that only one of the ends sends tells more than the ports.
+// A message that only one of the ends sends tells more than the ports. A record knows.
 Use Session::use_of_sender(const Found& found, const Descriptor* type) {
-  if (found.use == Use::kNone) {
-    return Use::kNone;
+  if (found.use == Use::kNone || found.outcome.has_value()) {
+    return found.use;
   }
   if (type != nullptr && use_of(*type) != Use::kNone) {
     if (use_of(*type) == found.use) {
@@ -124,7 +124,7 @@ Use Session::use_of_sender(const Found& found, const Descriptor* type) {
 
 Entry Session::add(const Found& found) {
   Entry entry;
-  entry.number = ++count_;
+  entry.number = last_ = found.number > 0 ? found.number : last_ + 1;
   entry.connection = found.connection;
   entry.end = found.use;
   const Descriptor* type = message_named(found.name);
@@ -143,7 +143,8 @@ Entry Session::add(const Found& found) {
     entry.answers = request->number;
     entry.use = entry.use != Use::kNone ? entry.use : other(request->use);
     requests->pop_back();
-  } else if (reply_to(*type) != nullptr && !problem_of(found.bytes, *type).has_value()) {
+  } else if (reply_to(*type) != nullptr && !found.is_unsent() &&
+             (found.missing > 0 || !problem_of(found.bytes, *type).has_value())) {
     open_[{entry.connection, entry.request_id}][{entry.end, entry.types}].push_back(entry);
   }
   return entry;

@@ -8,7 +8,7 @@ setup() {
   export LC_ALL=C
   unset NO_COLOR
   PATH=$BUILT:$PATH
-  tests=$SOURCE/qel-wire/tests
+  export tests=$SOURCE/qel-wire/tests
   page=$SOURCE/docs/qel-wire.md
   cd "$BATS_TEST_TMPDIR" || exit
 }
@@ -48,6 +48,67 @@ holds() { [ -s "$1" ] && diff -u -F '^### ' <(grep -E '^(###|[$]) ' -A 9999 "$1"
 
 @test "it hides what its sessions hide" { holds "$tests/access_token.txt"; }
 
+@test "it reads session files as their sessions show" { holds "$tests/session_files.txt"; }
+
+# The session of the page grows, until it has turned in a ring for two messages a section.
+@test "a session file is followed while it grows and turns" {
+  local line listed
+  head -n 2 "$tests/session" | "$tests/session_file.py" growing 512
+  exec {listed}< <(exec qel-wire session --follow growing 2>errors)
+  for end in 2 3 4 5; do
+    head -n "$end" "$tests/session" | "$tests/session_file.py" growing 512
+    # It has to come before there is more.
+    while read -r -u "$listed" line && echo "$line" >>followed && [[ $line != "$end "* ]]; do :; done
+  done
+  kill -INT $!
+  cat <&"$listed" >>followed
+  wait $!
+  "$tests/session_file.py" whole <"$tests/session"
+  qel-wire session whole | head -n 5 | sed 's/^ *//' | diff - <(head -n 5 followed)
+  diff <(tail -n +6 followed) - <<<$'no answer to 2, CurrentTimeRequest\nno answer to 4, ReadMessageRequest\nno answer to 5, ClientEcho'
+  diff /dev/null errors
+}
+
+@test "what a session file lost while it was followed is noted, and that it begins anew" {
+  local line listed
+  head -n 1 "$tests/session" | "$tests/session_file.py" growing
+  exec {listed}< <(exec qel-wire session --follow growing 2>&1)
+  read -r -u "$listed" line
+  { echo 'at 4' && echo '< ClientEcho 1 0807'; } | "$tests/session_file.py" growing
+  read -r -u "$listed" line
+  [ "$line" = 'qel-wire: messages 2 to 3 are not in the file' ]
+  read -r -u "$listed" line
+  echo '< ClientEcho 1 0808' | "$tests/session_file.py" growing
+  read -r -u "$listed" line
+  [ "$line" = 'qel-wire: the file was begun anew' ]
+  read -r -u "$listed" line
+  [[ $line == '5 '*', requestId 8, taken' ]]
+  kill -INT $!
+}
+
+# The records behind it wait, as the list is in order.
+@test "a call that is running is listed once it has ended" {
+  local line listed
+  echo '< ClientEcho 1 0807' | "$tests/session_file.py" growing
+  exec {listed}< <(exec qel-wire session --follow growing)
+  read -r -u "$listed" line
+  printf '%s\n' '< ClientEcho 1 0807' '< ClientEcho 0 0808' '< ClientEcho 1 0809' | "$tests/session_file.py" growing
+  read -r -u "$listed" line
+  [[ $line == '2 '*', not ended' ]]
+  read -r -u "$listed" line
+  [[ $line == '3 '*', taken' ]]
+  kill -INT $!
+}
+
+@test "following ends when nobody reads it" {
+  local listed
+  "$tests/session_file.py" growing <"$tests/session"
+  exec {listed}< <(exec timeout 60 qel-wire session --follow growing)
+  read -r -u "$listed"
+  exec {listed}<&-
+  wait $! || [ $? -ne 124 ]
+}
+
 @test "its page shows what happens" {
   capture chat.pcap <<'end'
 > ChatRequest requestId: 7 chatroomId: 42 chatMessageParams { msgId: 1 chatMsg: "hi" }
@@ -58,6 +119,7 @@ holds() { [ -s "$1" ] && diff -u -F '^### ' <(grep -E '^(###|[$]) ' -A 9999 "$1"
 > ClientEchoReply requestId: 700001
 < CurrentTimeReply requestId: 8 result { code: 0 } currentTimeMillis: 1795430406000
 end
+  "$tests/session_file.py" session.pcapng <"$tests/session"
   awk '/^```/ { on = $0 == "```console"; next } on' "$page" >page.txt
   holds page.txt
 }
@@ -83,7 +145,7 @@ requestId: 7" ]
 @test "a frame of an unknown message, and bytes that are none, are not left out" {
   printf '> %s\n' "$(frame NewMessage 0807)" "$(frame ClientEcho 0807)" | packets named.pcap 9000,40000
   run -1 --separate-stderr qel-wire decode auto --frames=example named.pcap
-  [[ $output == *requestId* && $stderr == *'its frame has a name that no message has' ]]
+  [[ $output == *requestId* && $stderr == *'its frame or its record has a name that no message has' ]]
   printf '> 0a436c69\n' | packets cut.pcap 9000,40000
   run -1 --separate-stderr qel-wire decode auto --frames=example cut.pcap
   [[ $stderr == *'the frame at offset 0 cannot be read'* ]]
@@ -220,7 +282,7 @@ completed() {
 }
 
 @test "Bash goes on behind values" {
-  [ "$(completed --color = never exp)" = explain ]
+  [ "$(completed --color = never expl)" = explain ]
   [ "$(completed explain --hex = 0807 ChatR)" = 'ChatRequest ChatReply' ]
   [ "$(completed explain --frames u16 ChatR)" = 'ChatRequest ChatReply' ]
 }
