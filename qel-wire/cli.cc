@@ -191,6 +191,11 @@ std::unique_ptr<CLI::App> make_table(Call* call) {
       .flag("--json", &call->json, "an object in a line for each message")
       .flag("--follow", &call->follow, "of a session file, what comes, too, until Ctrl-C")
       .flag("--show-token", &call->show_token, "let --where see what may be the access token");
+  command("export", "messages as pcapng, for Wireshark's own dissector")
+      .input()
+      .messages()
+      .where()
+      .flag("--ports", &call->ports, "print which port stands for which message there");
   command("diff", "in which fields the messages of two files differ")
       .files("the two files, of one message each", 2, 2)
       .notation("the files are ")

@@ -27,6 +27,7 @@ struct Call {
   bool follow = false;
   bool json = false;
   bool partial = false;
+  bool ports = false;
   bool received = false;
   bool sent = false;
   bool show_token = false;

@@ -19,6 +19,7 @@
 #include "decode.h"
 #include "encode.h"
 #include "explain.h"
+#include "export.h"
 #include "guess.h"
 #include "input.h"
 #include "listing.h"
@@ -329,6 +330,22 @@ int session(const Call& call) {
   return status;
 }
 
+int export_messages(const Call& call) {
+  if (call.ports) {
+    qel_wire::write_ports(&std::cout);
+    return kDone;
+  }
+  qel_wire::Session session;
+  qel_wire::write_head(&std::cout);
+  return for_each_entry(call, &session,
+                        [](const qel_wire::Entry& entry, const qel_wire::Found& found) {
+                          if (!found.is_unsent()) {
+                            write_packet(entry, found, &std::cout);
+                          }
+                          return kDone;
+                        });
+}
+
 // The message of the call's file.
 qel_wire::Side side_of(const qel_wire::Found& found, const Call& call) {
   const std::string& file = call.files.front();
@@ -400,7 +417,7 @@ int run(const Call& call) {
   using Command = int (*)(const Call& call);
   static const std::pair<const char*, Command> commands[] = {
       {"decode", decode},   {"encode", encode},          {"explain", explain}, {"guess", guess},
-      {"session", session}, {"diff", diff},       {"schema", schema}};
+      {"session", session}, {"export", export_messages}, {"diff", diff},       {"schema", schema}};
   return std::find_if(std::begin(commands), std::end(commands),
                       [&](const auto& command) { return call.command == command.first; })
       ->second(call);

@@ -15,6 +15,7 @@
 
 #include "decode.h"
 #include "explain.h"
+#include "export.h"
 #include "listing.h"
 #include "misread.h"
 #include "msgspec_frontend.pb.h"
@@ -336,6 +337,7 @@ std::vector<std::string> outputs(const Descriptor& type, const std::string& byte
   const qel_wire::Entry entry = qel_wire::Session().add(found);
   std::ostringstream listed;
   qel_wire::print_entry_json(entry, found, qel_wire::problem_of(bytes, type), &listed);
+  qel_wire::write_packet(entry, found, &listed);
   texts.push_back(listed.str());
   return texts;
 }
