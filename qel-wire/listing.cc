@@ -1,11 +1,7 @@
 #include "listing.h"
 
-#include <google/protobuf/descriptor.h>
-
 #include <iomanip>
 #include <nlohmann/json.hpp>
-
-#include "token.h"
 
 namespace qel_wire {
 namespace {
@@ -16,22 +12,12 @@ const char* direction_of(Use use) {
   return use == Use::kSends ? "sent" : use == Use::kReceives ? "received" : "?";
 }
 
-// Adds the ids of a message that are not hidden, as texts, as the JSON form has them.
-class Ids : public Visitor {
- public:
-  Ids(const Hidden& hidden, Object* object) : hidden_(hidden), object_(*object) {}
-
-  void begin(const Piece& piece) override {
-    if (piece.depth == 0 && piece.is_known && !hidden_.hides(piece) &&
-        (piece.field->name() == "requestId" || piece.field->name() == "chatroomId")) {
-      object_[piece.field->name()] = std::to_string(static_cast<int64_t>(piece.value));
-    }
+// int64 is a text in the JSON form.
+void add_id(const char* name, const std::optional<int64_t>& id, Object* object) {
+  if (id.has_value()) {
+    (*object)[name] = std::to_string(*id);
   }
-
- private:
-  const Hidden& hidden_;
-  Object& object_;
-};
+}
 
 void print(const Object& object, std::ostream* out) {
   *out << object.dump() << '\n';
@@ -69,8 +55,8 @@ void print_entry(const Entry& entry, const Found& found, const std::optional<Pro
        << std::setw(8) << direction_of(entry.use) << std::right << "  " << colours.name
        << entry.types.front()->name() << colours.end << (entry.is_guess ? "?" : "") << ", "
        << size_of(found);
-  if (entry.request_id.has_value()) {
-    *out << ", requestId " << *entry.request_id;
+  if (entry.shown_request_id.has_value()) {
+    *out << ", requestId " << *entry.shown_request_id;
   }
   if (entry.answers.has_value()) {
     *out << ", answers " << *entry.answers;
@@ -93,7 +79,6 @@ void print_unanswered(const Entry& entry, std::ostream* out) {
 
 void print_entry_json(const Entry& entry, const Found& found, const std::optional<Problem>& problem,
                       std::ostream* out) {
-  const google::protobuf::Descriptor& type = *entry.types.front();
   Object object;
   object["number"] = entry.number;
   if (found.time.has_value()) {
@@ -102,7 +87,7 @@ void print_entry_json(const Entry& entry, const Found& found, const std::optiona
   if (entry.use != Use::kNone) {
     object["direction"] = direction_of(entry.use);
   }
-  object["message"] = type.name();
+  object["message"] = entry.types.front()->name();
   if (entry.is_guess) {
     object["guess"] = true;
   }
@@ -113,9 +98,8 @@ void print_entry_json(const Entry& entry, const Found& found, const std::optiona
   if (found.missing > 0) {
     object["missing"] = found.missing;
   }
-  const Hidden hidden(found.bytes, type);
-  Ids ids(hidden, &object);
-  walk(found.bytes, type, &ids);
+  add_id("requestId", entry.shown_request_id, &object);
+  add_id("chatroomId", entry.shown_chatroom_id, &object);
   if (entry.answers.has_value()) {
     object["answers"] = *entry.answers;
   }
@@ -132,9 +116,7 @@ void print_unanswered_json(const Entry& entry, std::ostream* out) {
   Object object;
   object["unanswered"] = entry.number;
   object["message"] = entry.types.front()->name();
-  if (entry.request_id.has_value()) {
-    object["requestId"] = std::to_string(*entry.request_id);
-  }
+  add_id("requestId", entry.shown_request_id, &object);
   print(object, out);
 }
 

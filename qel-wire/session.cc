@@ -5,6 +5,7 @@
 #include <string_view>
 
 #include "guess.h"
+#include "token.h"
 #include "walk.h"
 
 namespace qel_wire {
@@ -24,6 +25,27 @@ class RequestId : public Visitor {
 
   std::optional<int64_t> value;
   bool is_sound = true;
+};
+
+// Notes the ids of a message that are not hidden.
+class ShownIds : public Visitor {
+ public:
+  ShownIds(const Hidden& hidden, Entry* entry) : hidden_(hidden), entry_(*entry) {}
+
+  void begin(const Piece& piece) override {
+    if (piece.depth > 0 || !piece.is_known || hidden_.hides(piece)) {
+      return;
+    }
+    if (piece.field->name() == "requestId") {
+      entry_.shown_request_id = static_cast<int64_t>(piece.value);
+    } else if (piece.field->name() == "chatroomId") {
+      entry_.shown_chatroom_id = static_cast<int64_t>(piece.value);
+    }
+  }
+
+ private:
+  const Hidden& hidden_;
+  Entry& entry_;
 };
 
 std::optional<int64_t> request_id_in(std::string_view bytes, const Descriptor& type) {
@@ -138,6 +160,9 @@ Entry Session::add(const Found& found) {
   entry.types = type == nullptr ? guess(found.bytes, use).front().types : Types{type};
   type = entry.types.front();
   entry.request_id = request_id_in(found.bytes, *type);
+  const Hidden hidden(found.bytes, *type);
+  ShownIds ids(hidden, &entry);
+  walk(found.bytes, *type, &ids);
   entry.use = use != Use::kNone ? use : use_of(*type);
   if (request != nullptr) {
     entry.answers = request->number;

@@ -27,6 +27,9 @@ struct Entry {
   Use end = Use::kNone;   // the same as the ports have it, which may turn it round
   size_t connection = 0;
   std::optional<int64_t> request_id;
+  // Those that are not hidden.
+  std::optional<int64_t> shown_request_id;
+  std::optional<int64_t> shown_chatroom_id;
   std::optional<size_t> answers;  // the number of the request
 };
 

@@ -50,62 +50,77 @@ holds() { [ -s "$1" ] && diff -u -F '^### ' <(grep -E '^(###|[$]) ' -A 9999 "$1"
 
 @test "it reads session files as their sessions show" { holds "$tests/session_files.txt"; }
 
-# The session of the page grows, until it has turned in a ring for two messages a section.
+# follow FILE: session --follow, whose lines next_line reads. A line that does not come fails.
+follow() { exec {followed}< <(exec qel-wire session --follow "$1" 2>&1); }
+next_line() { read -r -t 60 -u "$followed" line; }
+
+# lines_up_to NUMBER: up to that message's.
+lines_up_to() {
+  while next_line; do
+    echo "$line"
+    [[ $line != "$1 "* ]] || return 0
+  done
+  return 1
+}
+
+# The session of the page grows in a ring, which turns every few messages.
 @test "a session file is followed while it grows and turns" {
-  local line listed
+  local line followed end
   head -n 2 "$tests/session" | "$tests/session_file.py" growing 512
-  exec {listed}< <(exec qel-wire session --follow growing 2>errors)
+  follow growing
   for end in 2 3 4 5; do
     head -n "$end" "$tests/session" | "$tests/session_file.py" growing 512
-    # It has to come before there is more.
-    while read -r -u "$listed" line && echo "$line" >>followed && [[ $line != "$end "* ]]; do :; done
+    lines_up_to "$end" >>shown # before there is more
   done
   kill -INT $!
-  cat <&"$listed" >>followed
-  wait $!
+  cat <&"$followed" >>shown
   "$tests/session_file.py" whole <"$tests/session"
-  qel-wire session whole | head -n 5 | sed 's/^ *//' | diff - <(head -n 5 followed)
-  diff <(tail -n +6 followed) - <<<$'no answer to 2, CurrentTimeRequest\nno answer to 4, ReadMessageRequest\nno answer to 5, ClientEcho'
-  diff /dev/null errors
+  qel-wire session whole | head -n 5 | sed 's/^ *//' | diff - <(head -n 5 shown)
+  diff <(tail -n +6 shown) - <<<$'no answer to 2, CurrentTimeRequest\nno answer to 4, ReadMessageRequest\nno answer to 5, ClientEcho'
 }
 
 @test "what a session file lost while it was followed is noted, and that it begins anew" {
-  local line listed
+  local line followed
   head -n 1 "$tests/session" | "$tests/session_file.py" growing
-  exec {listed}< <(exec qel-wire session --follow growing 2>&1)
-  read -r -u "$listed" line
+  follow growing
+  next_line
   { echo 'at 4' && echo '< ClientEcho 1 0807'; } | "$tests/session_file.py" growing
-  read -r -u "$listed" line
+  next_line
   [ "$line" = 'qel-wire: messages 2 to 3 are not in the file' ]
-  read -r -u "$listed" line
+  next_line
   echo '< ClientEcho 1 0808' | "$tests/session_file.py" growing
-  read -r -u "$listed" line
+  next_line
   [ "$line" = 'qel-wire: the file was begun anew' ]
-  read -r -u "$listed" line
+  next_line
   [[ $line == '5 '*', requestId 8, taken' ]]
   kill -INT $!
 }
 
-# The records behind it wait, as the list is in order.
-@test "a call that is running is listed once it has ended" {
-  local line listed
-  echo '< ClientEcho 1 0807' | "$tests/session_file.py" growing
-  exec {listed}< <(exec qel-wire session --follow growing)
-  read -r -u "$listed" line
-  printf '%s\n' '< ClientEcho 1 0807' '< ClientEcho 0 0808' '< ClientEcho 1 0809' | "$tests/session_file.py" growing
-  read -r -u "$listed" line
-  [[ $line == '2 '*', not ended' ]]
-  read -r -u "$listed" line
-  [[ $line == '3 '*', taken' ]]
+@test "a call that has not ended is listed a moment later, if it has ended then or not" {
+  local line followed
+  printf '%s\n' '< ClientEcho 1 0807' '< ClientEcho 0 0808' | "$tests/session_file.py" growing
+  printf '%s\n' '< ClientEcho 1 0807' '< ClientEcho 1 0808' '< ClientEcho 0 0809' '< ClientEcho 1 080a' |
+    "$tests/session_file.py" grown
+  follow growing
+  next_line
+  kill -STOP $! # so that the second call ends before that moment is over
+  mv grown growing
+  kill -CONT $!
+  next_line
+  [[ $line == '2 '*', taken' ]]
+  next_line
+  [[ $line == '3 '*', not ended' ]]
+  next_line
+  [[ $line == '4 '*', taken' ]]
   kill -INT $!
 }
 
 @test "following ends when nobody reads it" {
-  local listed
+  local line followed
   "$tests/session_file.py" growing <"$tests/session"
-  exec {listed}< <(exec timeout 60 qel-wire session --follow growing)
-  read -r -u "$listed"
-  exec {listed}<&-
+  exec {followed}< <(exec timeout 60 qel-wire session --follow growing)
+  next_line
+  exec {followed}<&-
   wait $! || [ $? -ne 124 ]
 }
 

@@ -336,6 +336,7 @@ std::vector<std::string> outputs(const Descriptor& type, const std::string& byte
   found.name = type.name();
   const qel_wire::Entry entry = qel_wire::Session().add(found);
   std::ostringstream listed;
+  qel_wire::print_entry(entry, found, {}, qel_wire::Colours(false), &listed);
   qel_wire::print_entry_json(entry, found, qel_wire::problem_of(bytes, type), &listed);
   qel_wire::write_packet(entry, found, &listed);
   texts.push_back(listed.str());
