@@ -146,8 +146,8 @@ class Messages {
     hand_over(found);
   }
 
-  // Hands over what is new. A call that has not ended may do so in a moment, which is waited for
-  // once.
+  // Hands over what is new. A call that has not ended may do so in a moment, and a record that is
+  // not there may have been written while the file was read, so that is waited for once.
   void take_new(const Recording& recording, const std::string& source, bool is_waiting,
                 Shown* shown) {
     const std::vector<Record>& records = recording.records;
@@ -161,7 +161,9 @@ class Messages {
       if (record.number <= begin) {
         continue;
       }
-      if (is_waiting && record.outcome == Outcome::kNotEnded && record.number > shown->waited) {
+      const bool may_change =
+          record.outcome == Outcome::kNotEnded || record.number - shown->last > 1;
+      if (is_waiting && may_change && record.number > shown->waited) {
         shown->waited = records.back().number;
         return;
       }

@@ -54,6 +54,13 @@ holds() { [ -s "$1" ] && diff -u -F '^### ' <(grep -E '^(###|[$]) ' -A 9999 "$1"
 follow() { exec {followed}< <(exec qel-wire session --follow "$1" 2>&1); }
 next_line() { read -r -t 60 -u "$followed" line; }
 
+# turn_into FILE: the file becomes that one while nobody looks at it.
+turn_into() {
+  kill -STOP $!
+  mv "$1" growing
+  kill -CONT $!
+}
+
 # lines_up_to NUMBER: up to that message's.
 lines_up_to() {
   while next_line; do
@@ -103,15 +110,25 @@ lines_up_to() {
     "$tests/session_file.py" grown
   follow growing
   next_line
-  kill -STOP $! # so that the second call ends before that moment is over
-  mv grown growing
-  kill -CONT $!
+  turn_into grown # before that moment is over
   next_line
   [[ $line == '2 '*', taken' ]]
   next_line
   [[ $line == '3 '*', not ended' ]]
   next_line
   [[ $line == '4 '*', taken' ]]
+  kill -INT $!
+}
+
+@test "a record that is not there may come a moment later" {
+  local line followed
+  printf '%s\n' '< ClientEcho 1 0807' 'at 3' '< ClientEcho 1 0809' | "$tests/session_file.py" growing
+  printf '< ClientEcho 1 %s\n' 0807 0808 0809 | "$tests/session_file.py" grown
+  follow growing
+  next_line
+  turn_into grown
+  next_line
+  [[ $line == '2 '*', taken' ]]
   kill -INT $!
 }
 
