@@ -10,7 +10,9 @@ set(_cmake_package "${CMAKE_INSTALL_LIBDIR}/cmake/${PROJECT_NAME}")
 # With the name that has no number: programs on devices may name it so.
 install(TARGETS qel-message-protosvc LIBRARY COMPONENT runtime)
 
-install(TARGETS qel-trace LIBRARY COMPONENT trace)
+if(TARGET qel-trace)
+  install(TARGETS qel-trace LIBRARY COMPONENT trace)
+endif()
 
 install(
   FILES proto-lib/qel-message.h proto-lib/qel-message-serialize.h
@@ -79,8 +81,8 @@ install(FILES ${_example} DESTINATION "${CMAKE_INSTALL_DATADIR}/doc/${PROJECT_NA
   COMPONENT documentation)
 
 # Builds what is installed.
-add_custom_target(packaged DEPENDS qel-message-protosvc contract qel-trace)
-foreach(_target qel-wire qel-wire-says docs)
+add_custom_target(packaged DEPENDS qel-message-protosvc contract)
+foreach(_target qel-trace qel-wire qel-wire-says docs)
   if(TARGET ${_target})
     add_dependencies(packaged ${_target})
   endif()

@@ -15,7 +15,8 @@
 #elif defined(__aarch64__)
 #define OLDEST_DLSYM "GLIBC_2.17"
 #else
-#error "Which version does the C library's dlsym have on this processor?"
+#error \
+    "Which version does the C library's dlsym have on this processor? -DQEL_TRACE=OFF builds the rest."
 #endif
 
 typedef void* (*lookup_t)(void* handle, const char* name);
@@ -36,8 +37,8 @@ static void* loaded_library(void) {
   return dlopen(QEL_TRACED_LIBRARY, RTLD_LAZY | RTLD_NOLOAD);
 }
 
-/* All at once: a look-up waits for threads that are loading something, and is over then for good. In
-   the global scope, others may stand between the library and this one. */
+/* All at once: a look-up waits for threads that are loading something, and is over then for good.
+   In the global scope, others may stand between the library and this one. */
 static void find_functions(void) {
   const lookup_t lookup = real_lookup();
   void* const library = loaded_library();

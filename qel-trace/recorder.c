@@ -43,14 +43,15 @@ static uint64_t now(void) {
 
 /* ---- Loading */
 
-/* A number of bytes, of KiB or of MiB: "65536", "64K", "4M". 0 if the text is none that is allowed. */
+/* A number of bytes, of KiB or of MiB: "65536", "64K", "4M". 0 if the text is none that is allowed.
+ */
 static size_t size_in(const char* text) {
   char* end = NULL;
   const unsigned long long number = strtoull(text, &end, 10);
   const unsigned long long unit = *end == 'K' ? 1 << 10 : *end == 'M' ? 1 << 20 : 1;
   const bool is_number = text[0] >= '0' && text[0] <= '9' && end[unit > 1 ? 1 : 0] == '\0';
-  const bool is_allowed = is_number && number <= MOST_SIZE && number * unit >= LEAST_SIZE &&
-                          number * unit <= MOST_SIZE;
+  const bool is_allowed =
+      is_number && number <= MOST_SIZE && number * unit >= LEAST_SIZE && number * unit <= MOST_SIZE;
   return is_allowed ? (size_t)(number * unit) : 0;
 }
 
@@ -251,7 +252,9 @@ void trace_received_end(received_t* call) {
   if (call->place.number > 0) {
     pthread_mutex_lock(&lock);
     recording_end(&recorder.recording, &call->place,
-                  is_taken ? DONE : call->of_caller != NULL ? REFUSED : UNTOLD);
+                  is_taken                  ? DONE
+                  : call->of_caller != NULL ? REFUSED
+                                            : UNTOLD);
     pthread_mutex_unlock(&lock);
   }
 }

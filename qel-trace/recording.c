@@ -244,7 +244,8 @@ record_place_t recording_add(recording_t* recording, const record_t* record) {
   const size_t name_size = strlen(record->function);
   const size_t size = RECORD_HEAD + name_size + record->size;
   /* Behind it there must be room for an unused block. */
-  const size_t most = recording->half_size - recording->head_size - 2 * BLOCK_SIZE - PACKET_HEAD - 4;
+  const size_t most =
+      recording->half_size - recording->head_size - 2 * BLOCK_SIZE - PACKET_HEAD - 4;
   const size_t captured = size < most ? size : most;
   const size_t block_size = BLOCK_SIZE + PACKET_HEAD + padded(captured);
   record_place_t place;

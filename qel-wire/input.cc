@@ -54,7 +54,7 @@ std::string read_source(const Call& call, const std::string& name) {
 // Waits a moment for more of a file. False if the user ends that (Ctrl-C), or nobody reads the
 // output any more.
 bool wait_for_more() {
-  constexpr timespec kMoment = {0, 200'000'000};
+  constexpr timespec kMoment = {0, 400'000'000};
   sigset_t interrupt;
   sigemptyset(&interrupt);
   sigaddset(&interrupt, SIGINT);

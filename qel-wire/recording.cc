@@ -98,17 +98,14 @@ class Reading {
   }
 
   // Goes to the next section that can be opened. What lies before it cannot be read for that
-  // reason, unless it is room that is not used: of much room libpcap says that the block is too
-  // large.
+  // reason.
   void skip(const std::string& reason) {
     const size_t begin = at_;
     do {
       at_ = next_section();
     } while (at_ < file_.size() && !can_open());
-    if (!is_room(begin)) {
-      recording_.notes.push_back(counted(at_ - begin, "byte") + " from offset " +
-                                 std::to_string(begin) + " on cannot be read: " + reason);
-    }
+    recording_.notes.push_back(counted(at_ - begin, "byte") + " from offset " +
+                               std::to_string(begin) + " on cannot be read: " + reason);
   }
 
   size_t next_section() const {
@@ -126,12 +123,6 @@ class Reading {
     } catch (const Failure&) {
       return false;
     }
-  }
-
-  bool is_room(size_t begin) const {
-    constexpr uint32_t kRoom = 0x80000000;
-    return at_ - begin >= 8 && number_in(file_, begin, 4) == kRoom &&
-           number_in(file_, begin + 4, 4) == at_ - begin;
   }
 
   void finish() {

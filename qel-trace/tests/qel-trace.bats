@@ -221,6 +221,22 @@ in_trouble() {
   [ "$(session session | wc -l)" -eq 3 ]
 }
 
+@test "its page shows what happens" {
+  [ -z "$EMULATOR" ] || skip "this machine's"
+  awk '/^```/ { on = $0 == "```c"; next } on' "$SOURCE/README.md" >first.c
+  "$CC" "${C_FLAGS[@]}" first.c -I "$SOURCE/proto-lib" "$LIBRARY" -Wl,-rpath,"${LIBRARY%/*}" -o first
+  mkdir build
+  ln -s "$BUILD" build/release
+  PATH=$BUILD/qel-wire:$PATH
+  awk '/^```/ { on = $0 == "```console"; next } on' "$SOURCE/docs/recorder.md" >shown
+  sed -n 's/^[$] //p' shown >commands
+  while IFS= read -r command; do
+    echo "\$ $command"
+    eval "$command"
+  done <commands >printed
+  diff shown printed
+}
+
 @test "it shows the functions that carry a message, and one of the C library's" {
   diff <("$NM" -D --defined-only "$TRACE/libqel-trace.so" | awk '{ print $3 }' | sort) \
     <({ echo dlsym && functions | grep -v forward_stored; } | sort)

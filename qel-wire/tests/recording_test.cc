@@ -96,13 +96,6 @@ TEST(Recording, WithoutRecords_IsEmpty) {
   EXPECT_EQ(told(beginning() + room(64)), "");
 }
 
-// libpcap takes no block of more than 16 MiB.
-TEST(Recording, WithMuchRoom_IsRead) {
-  EXPECT_EQ(told(beginning() + record(1, "a") + room(20 << 20) + beginning() + room(20 << 20)),
-            "1a ");
-}
-
-// Neither libpcap nor Wireshark takes packets with more bytes.
 TEST(Recording, OfALargeMessage_HasAllOfIt) {
   const std::string large(262144 - data_of(1, "").size(), 'x');
   EXPECT_EQ(told(beginning() + record(1, large) + record(2, "b")), "1" + large + " 2b ");
