@@ -144,27 +144,23 @@ static bool is_within_limit(size_t size) {
   return getrlimit(RLIMIT_FSIZE, &limit) != 0 || limit.rlim_cur >= size;
 }
 
-static int map_file(int file, size_t size, unsigned char** mapping) {
-  int error = EFBIG;
+/* Null without memory or disk space, with the reason in errno. */
+static unsigned char* map_file(int file, size_t size) {
+  void* memory = MAP_FAILED;
+  errno = EFBIG;
   if (is_within_limit(size)) {
     do {
-      error = posix_fallocate(file, 0, (off_t)size);
-    } while (error == EINTR);
+      errno = posix_fallocate(file, 0, (off_t)size);
+    } while (errno == EINTR);
+    if (errno == 0) {
+      memory = mmap(NULL, size, PROT_READ | PROT_WRITE, MAP_SHARED, file, 0);
+    }
   }
-  if (error != 0) {
-    return error;
-  }
-  void* const memory = mmap(NULL, size, PROT_READ | PROT_WRITE, MAP_SHARED, file, 0);
-  if (memory == MAP_FAILED) {
-    return errno;
-  }
-  *mapping = memory;
-  return 0;
+  return memory == MAP_FAILED ? NULL : memory;
 }
 
 int recording_create(recording_t* recording, const char* file, size_t size, const char* writer) {
-  unsigned char* mapping = NULL;
-  int error = move_away(file);
+  const int error = move_away(file);
   if (error != 0) {
     return error;
   }
@@ -172,20 +168,21 @@ int recording_create(recording_t* recording, const char* file, size_t size, cons
   if (opened < 0) {
     return errno;
   }
-  recording->half_size = size / 2 / 4096 * 4096;
-  error = map_file(opened, 2 * recording->half_size, &mapping);
+  const size_t half_size = size / 2 / 4096 * 4096;
+  unsigned char* const mapping = map_file(opened, 2 * half_size);
+  const int map_error = errno;
   close(opened);
-  if (error != 0) {
+  if (mapping == NULL) {
     unlink(file);
-    recording->half_size = 0;
-    return error;
+    return map_error;
   }
+  recording->half_size = half_size;
   ++recording->file_number;
   recording->last_number = 0;
   recording->current = 0;
   for (int i = 0; i < 2; ++i) {
-    recording->halves[i].begin = mapping + (size_t)i * recording->half_size;
-    recording->head_size = write_head(recording->halves[i].begin, recording->half_size, writer);
+    recording->halves[i].begin = mapping + (size_t)i * half_size;
+    recording->head_size = write_head(recording->halves[i].begin, half_size, writer);
     empty(recording, &recording->halves[i]);
   }
   return 0;
@@ -244,8 +241,8 @@ record_place_t recording_add(recording_t* recording, const record_t* record) {
   const size_t name_size = strlen(record->function);
   const size_t size = RECORD_HEAD + name_size + record->size;
   /* Behind it there must be room for an unused block. */
-  const size_t most =
-      recording->half_size - recording->head_size - 2 * BLOCK_SIZE - PACKET_HEAD - 4;
+  const size_t around = BLOCK_SIZE + PACKET_HEAD + BLOCK_SIZE + 3; /* with padding */
+  const size_t most = recording->half_size - recording->head_size - around;
   const size_t captured = size < most ? size : most;
   const size_t block_size = BLOCK_SIZE + PACKET_HEAD + padded(captured);
   record_place_t place;

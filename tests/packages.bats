@@ -90,7 +90,7 @@ compile() {
   compile "$SOURCE/tests/consumers/c/plugin.c"
   local preload=LD_PRELOAD=libqel-trace.so
   [ -z "$TOOLCHAIN" ] || preload=QEMU_SET_ENV=$preload
-  (export "$preload" QEL_TRACE_FILE=session DLOG_STANDIN_PRIORITY=S && run_installed ./program)
+  (export "${preload?}" QEL_TRACE_FILE=session DLOG_STANDIN_PRIORITY=S && run_installed ./program)
   "$SOURCE/qel-trace/tests/session.py" session >found
   diff <(cut -d ' ' -f 2-4 found) - <<'TXT'
 received done client_echo_deserialize

@@ -1,5 +1,6 @@
 #!/usr/bin/env bats
 # The recorder before programs that know nothing of it.
+# shellcheck disable=SC2030,SC2031,SC2154 # a test has variables of its own; bats sets some
 load ../../tests/build
 
 TRACE=$BUILD/qel-trace
@@ -138,7 +139,7 @@ TXT
 
 @test "%p in the file's name is the process" {
   recorded "$PWD/session-%p" "$TESTS/caller" fork
-  [ "$(ls | grep -cxE 'session-[0-9]+')" -eq 2 ]
+  [ "$(find . -name 'session-*' | grep -cxE './session-[0-9]+')" -eq 2 ]
 }
 
 @test "the session before is kept beside the new one" {
@@ -149,7 +150,7 @@ TXT
 
 @test "a process that is killed at any moment leaves a whole file" {
   export QEL_TRACE_SIZE=64K
-  for round in $(seq 10); do
+  for _ in $(seq 10); do
     KILL_AFTER=${EMULATOR:+2}.$((RANDOM % 400 + 200)) run -137 recorded "$PWD/session" "$TESTS/caller" threads
     last_ones session
     rm session
@@ -193,6 +194,7 @@ in_trouble() {
 }
 
 @test "without a name nothing is recorded, which is told unless the name is empty" {
+  # shellcheck disable=SC2016 # it is a text here
   in_trouble 'QEL_TRACE_FILE names no file' env -u QEL_TRACE_FILE bash -c "
     $(declare -f recorded | sed 's/QEL_TRACE_FILE="$1" //'); $(declare -p TRACE EMULATOR)
     recorded - '$TESTS/caller' many 10"
