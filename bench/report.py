@@ -26,12 +26,14 @@ import measure
 
 ROOT = pathlib.Path(__file__).resolve().parent.parent
 PAGE = ROOT / "docs" / "performance.md"
+RECORDED = str(ROOT / "build" / "recorded.pcapng")
 
 # The programs, and what they are called in the report.
 NAMES = {"ours": "this library", "baseline": "generated classes", "by_hand": "by hand",
          "protobuf3": "Protocol Buffers 3.21", "protobuf_c": "protobuf-c", "nanopb": "nanopb"}
-# What is timed: also the library with a thread id that costs nothing.
-TIMED = {"ours": NAMES["ours"], "ours_no_kernel": "this library, thread id for free", **NAMES}
+# What is timed: also the library with a thread id that costs nothing, and with the recorder.
+TIMED = {"ours": NAMES["ours"], "ours_no_kernel": "this library, thread id for free",
+         "ours_recorded": "this library, recorded", **NAMES}
 BY_HAND = ["echo_reply", "chat_request/100", "chat_request/40000"]
 
 CASE_NAMES = {
@@ -72,6 +74,10 @@ ALLOCATORS = {"glibc's": {},
                   {"GLIBC_TUNABLES": "glibc.malloc.tcache_count=10000"},
               "jemalloc": {"LD_PRELOAD": "libjemalloc.so.2"}}
 
+# What the recorder may take of a call. Of long messages, copying takes more.
+RECORDER_NS = 1000
+LONG_CASES = ["chat_request/40000", "message_page/500", "chatroom_entry/500"]
+
 
 def benchmark(program, case="", counter="cpu_time", seconds=0.02, settings=None):
     """The nanoseconds of the program's benchmarks by name: of all, or of those of a case."""
@@ -79,7 +85,7 @@ def benchmark(program, case="", counter="cpu_time", seconds=0.02, settings=None)
     out = subprocess.run([program, f"--benchmark_filter={pattern}", "--benchmark_format=json",
                           f"--benchmark_min_time={seconds}"],
                          stdout=subprocess.PIPE, stderr=subprocess.PIPE, text=True,
-                         env={**os.environ, **(settings or {})})
+                         env={**os.environ, "QEL_TRACE_FILE": RECORDED, **(settings or {})})
     if out.returncode != 0 or "cannot be preloaded" in out.stderr:
         sys.exit(f"{program}, {case}: {out.stderr}")
     return {run["name"]: run[counter] for run in json.loads(out.stdout)["benchmarks"]}
@@ -96,6 +102,9 @@ class Rounds:
 
     def median(self, name):
         return statistics.median(self.values[name])
+
+    def difference(self, name, to):
+        return statistics.median(a - b for a, b in zip(self.values[name], self.values[to]))
 
     def ratio(self, name, to):
         return statistics.median(a / b for a, b in zip(self.values[name], self.values[to]))
@@ -188,6 +197,8 @@ def measure_all(build, arm_builds, rounds):
         "parts": {name[1]: times.median(name) for name in times.values if name[0] == "part"},
         "allocators": {name: {case: times.median(("allocator", name, case)) for case in ALLOCATOR_CASES}
                        for name in ALLOCATORS},
+        "recorder": {case: times.difference(("ours_recorded", case), ("ours", case))
+                     for case in measure.CASES},
         "loading": {name: {"ns": loading.median(name), "ratio": loading.ratio(name, "plain")}
                     for name in loading.values},
         "size": {each.name: size_of(each, scratch) for each in builds},
@@ -259,6 +270,9 @@ def thresholds(results):
             yield Threshold(
                 f"{CASE_NAMES[case]}: instructions on {PRESETS[preset]} through qel-message.h, ratio",
                 counted["message"] / counted["ours"], measure.HEADER_THRESHOLD, is_ratio=True)
+    for case, time in results["recorder"].items():
+        if case not in LONG_CASES:
+            yield Threshold(f"{CASE_NAMES[case]}: ns that the recorder takes", time, RECORDER_NS)
     for name, threshold in LOADING_RATIOS.items():
         yield Threshold(f"loading {name}, ratio", results["loading"][name]["ratio"], threshold,
                         is_ratio=True)
@@ -342,6 +356,8 @@ def report(results):
     allocators = table(["ns a call, by allocator", *(CASE_NAMES[case] for case in ALLOCATOR_CASES)],
                        [[name, *(number(times[case]) for case in ALLOCATOR_CASES)]
                         for name, times in results["allocators"].items()])
+    recorded = table(["ns that the recorder takes", *CASE_NAMES.values()][:len(measure.CASES) + 1],
+                     [["", *(number(results["recorder"][case]) for case in measure.CASES)]])
     return f"""# Benchmark
 
 Written by `{results['command']}` on {results['date']}. {about['processor']}; {about['system']};
@@ -357,6 +373,8 @@ numbers are explained in [performance.md](../performance.md).
 {threads}
 
 {allocators}
+
+{recorded}
 
 {parts_table(results)}
 

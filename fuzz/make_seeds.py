@@ -17,6 +17,14 @@ import schema  # pylint: disable=wrong-import-position
 # fields and groups, an enumeration's number that is no member, a length behind the end.
 UNUSUAL = bytes.fromhex("5a020063 3007 c33e0801c43e 7063 6a0308")
 
+# A session in which every call ends in another way; the first records are overwritten by the others.
+SESSION_FILE = pathlib.Path(__file__).resolve().parent.parent / "qel-wire" / "tests" / "session_file.py"
+SAID = 3 * b"""> chat_request_serialize 1 5807602a
+> invite_chat_request_serialize 2 -
+< chat_reply_deserialize 2 58076a0208 100
+< ClientEcho 3 0807
+"""
+
 
 def capture(data):
     """A file of tcpdump's with two packets of TCP, the second one before the first."""
@@ -68,6 +76,8 @@ def main():
         seed("qel_wire_input", f"{name}_frames", 2 * (len(encoded).to_bytes(4, "big") + encoded))
         seed("qel_wire_input", f"{name}_example", bytes([len(name)]) + name.encode() + len(encoded).to_bytes(4, "big") + encoded)
         seed("qel_wire_input", f"{name}_pcap", capture(encoded))
+    session = subprocess.run([SESSION_FILE, "/dev/stdout", "1024"], input=SAID, check=True, stdout=subprocess.PIPE).stdout
+    seed("qel_wire_input", "session", session)
     data = bytes(range(32)) + b"ab cd 12"
     for command in ("xxd", "xxd -i", "xxd -p", "hexdump -C", "hexdump", "od", "od -tx1z", "od -c", "base64"):
         dump = subprocess.run(command.split(), input=data, check=True, stdout=subprocess.PIPE).stdout

@@ -10,6 +10,10 @@ set(_cmake_package "${CMAKE_INSTALL_LIBDIR}/cmake/${PROJECT_NAME}")
 # With the name that has no number: programs on devices may name it so.
 install(TARGETS qel-message-protosvc LIBRARY COMPONENT runtime)
 
+if(TARGET qel-trace)
+  install(TARGETS qel-trace LIBRARY COMPONENT trace)
+endif()
+
 install(
   FILES proto-lib/qel-message.h proto-lib/qel-message-serialize.h
     "${PROJECT_BINARY_DIR}/proto-lib/msgspec_frontend.pb.h"
@@ -105,7 +109,7 @@ add_custom_target(packaged DEPENDS qel-message-protosvc contract)
 if(TARGET qel-testkit)
   add_dependencies(packaged qel-testkit-says qel-message-testlog)
 endif()
-foreach(_target qel-wire qel-wire-says docs)
+foreach(_target qel-trace qel-wire qel-wire-says docs)
   if(TARGET ${_target})
     add_dependencies(packaged ${_target})
   endif()

@@ -87,7 +87,9 @@ class Options {
 
   // What commands that take bytes have in common.
   Options& input() {
-    return files("bytes, or packets as pcap or pcapng; standard input if there is none, or for '-'")
+    return files(
+               "bytes, packets as pcap or pcapng, or a session file; standard input if there is "
+               "none, or for '-'")
         .notation("the bytes, or a file's, are ", "[=BYTES]")
         .choice("--frames", &call_.frames, kFramings,
                 "many messages: what tells where each of them ends");
@@ -95,6 +97,25 @@ class Options {
 
   Options& name(const char* option, const char* type, const char* description) {
     command_.add_option(option, call_.message, description)->type_name(type);
+    return *this;
+  }
+
+  Options& number() {
+    command_.add_option("--number", call_.number, "only the message with this number")
+        ->type_name("N")
+        ->check([](const std::string& number) -> std::string {
+          const bool is_one = number.find_first_not_of("0123456789") == std::string::npos;
+          return is_one && number.find_first_not_of('0') != std::string::npos
+                     ? ""
+                     : "not a number from 1 on";
+        });
+    return *this;
+  }
+
+  Options& messages() {
+    command_.add_option("--message", call_.messages, "only such messages; may be repeated")
+        ->type_name("MESSAGE")
+        ->allow_extra_args(false);
     return *this;
   }
 
@@ -133,6 +154,7 @@ std::unique_ptr<CLI::App> make_table(Call* call) {
   command("decode", "the fields, in the text form of Protocol Buffers or as JSON")
       .message()
       .input()
+      .number()
       .where()
       .flag("--json", &call->json, "as JSON")
       .flag("--partial", &call->partial, "of broken bytes, what comes before the place")
@@ -145,12 +167,14 @@ std::unique_ptr<CLI::App> make_table(Call* call) {
   command("explain", "each field with its offset and its bytes, and what is wrong with them")
       .message()
       .input()
+      .number()
       .where()
       .flag("--json", &call->json, "an object in a line for each row")
       .flag("--all", &call->all, "all bytes of long fields")
       .output();
   command("guess", "which messages the bytes fit best")
       .input()
+      .number()
       .flag("--sent", &call->sent, "not those that a plug-in receives")
       .flag("--received", &call->received, "not those that it sends")
       .flag("--all", &call->all, "all messages");
@@ -160,10 +184,18 @@ std::unique_ptr<CLI::App> make_table(Call* call) {
   exclude("guess", "--sent", "--received");
   exclude("explain", "--all", "--json");      // which has all bytes anyway
   exclude("decode", "--partial", "--where");  // which leaves broken messages out
-  command("session", "messages in order, and which of them answers which")
+  command("session", "messages in order, how their calls ended, and which of them answers which")
       .input()
+      .messages()
       .where()
+      .flag("--json", &call->json, "an object in a line for each message")
+      .flag("--follow", &call->follow, "of a session file, what comes, too, until Ctrl-C")
       .flag("--show-token", &call->show_token, "let --where see what may be the access token");
+  command("export", "messages as pcapng, for Wireshark's own dissector")
+      .input()
+      .messages()
+      .where()
+      .flag("--ports", &call->ports, "print which port stands for which message there");
   command("diff", "in which fields the messages of two files differ")
       .files("the two files, of one message each", 2, 2)
       .notation("the files are ")

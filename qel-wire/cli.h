@@ -21,9 +21,13 @@ struct Call {
   std::string bytes;
   std::string colour = "auto";
   std::vector<std::string> where;
+  std::vector<std::string> messages;  // of which all others are left out
+  size_t number = 0;                  // of the one message that is wanted; 0: all
   bool all = false;
+  bool follow = false;
   bool json = false;
   bool partial = false;
+  bool ports = false;
   bool received = false;
   bool sent = false;
   bool show_token = false;

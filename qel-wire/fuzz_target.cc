@@ -19,7 +19,9 @@
 #include "misread.h"
 #include "notation.h"
 #include "packets.h"
+#include "pcap_file.h"
 #include "print.h"
+#include "recording.h"
 #include "session.h"
 #include "target.h"
 #include "text.h"
@@ -143,6 +145,20 @@ void check_frames(const std::string& input, const std::string& frames) {
   }
 }
 
+// Records are in order, and what is said of them is fit for a terminal.
+void check_recording(const qel_wire::Recording& recording) {
+  uint32_t last = 1;
+  for (const qel_wire::Record& record : recording.records) {
+    if (record.number < last) {
+      fail("records are not in order");
+    }
+    last = record.number;
+  }
+  for (const std::string& note : recording.notes) {
+    expect_fit_for_terminals(note);
+  }
+}
+
 }  // namespace
 
 void check_qel_wire(const std::string& input) {
@@ -192,7 +208,11 @@ void check_qel_wire_input(const std::string& input) {
   }
   if (qel_wire::is_capture(input)) {
     try {
-      qel_wire::read_capture(input);
+      if (qel_wire::is_recording(input)) {
+        check_recording(qel_wire::read_recording(input));
+      } else {
+        qel_wire::read_capture(input);
+      }
     } catch (const qel_wire::Failure& failure) {
       expect_fit_for_terminals(failure.reason);
     }

@@ -1,20 +1,24 @@
 #include "input.h"
 
+#include <poll.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
 #include <algorithm>
 #include <cerrno>
-#include <chrono>
+#include <csignal>
 #include <cstdio>
 #include <cstring>
 #include <iostream>
 #include <memory>
+#include <utility>
 #include <vector>
 
 #include "framing.h"
+#include "listing.h"
 #include "misread.h"
 #include "packets.h"
+#include "pcap_file.h"
 #include "text.h"
 #include "walk.h"
 
@@ -47,6 +51,19 @@ std::string read_source(const Call& call, const std::string& name) {
   }
 }
 
+// Waits a moment for more of a file. False if the user ends that (Ctrl-C), or nobody reads the
+// output any more.
+bool wait_for_more() {
+  constexpr timespec kMoment = {0, 400'000'000};
+  sigset_t interrupt;
+  sigemptyset(&interrupt);
+  sigaddset(&interrupt, SIGINT);
+  sigprocmask(SIG_BLOCK, &interrupt, nullptr);  // it is taken here, and ends nothing halfway
+  pollfd output = {STDOUT_FILENO, 0, 0};
+  return std::cout.flush() && poll(&output, 1, 0) == 0 &&
+         sigtimedwait(&interrupt, nullptr, &kMoment) != SIGINT;
+}
+
 // Hands over the messages of the files, with their places if there may be more than one.
 class Messages {
  public:
@@ -56,8 +73,13 @@ class Messages {
   void of_file(const std::string& name) {
     const std::string bytes = read_source(call_, name);
     const std::string source = call_.files.size() > 1 ? name + ", " : "";
-    if (is_capture(bytes)) {
-      is_many_ = true;
+    const bool is_of_packets = is_capture(bytes);
+    is_many_ = is_many_ || is_of_packets;
+    if (is_of_packets && is_recording(bytes)) {
+      of_recording(name, read_recording(bytes), source);
+    } else if (call_.follow) {
+      throw Failure{kWrongCall, "--follow takes a session file, which this is not"};
+    } else if (is_of_packets) {
       of_capture(bytes, source);
     } else if (call_.frames.empty()) {
       take(bytes, {0, bytes.size(), ""}, source, {});
@@ -68,18 +90,27 @@ class Messages {
   }
 
   int status() const { return status_; }
+  bool has_found() const { return has_found_; }
 
  private:
   void take(std::string_view bytes, const Frame& frame, const std::string& source, Found found) {
     found.bytes = bytes.substr(frame.offset, frame.size);
     found.name = frame.name;
+    ++count_;
     if (is_many_) {
-      found.number = ++count_;
+      found.number = count_;
       found.place = "message " + std::to_string(found.number) + ": " +
-                    (found.time.has_value() ? utc(*found.time) + ", " : "") + source + "offset " +
-                    std::to_string(frame.offset) + ", " + counted(frame.size, "byte");
+                    (found.time.has_value() ? utc(found.milliseconds()) + ", " : "") + source +
+                    "offset " + std::to_string(frame.offset) + ", " + counted(frame.size, "byte");
     }
-    status_ = std::max(status_, take_(found));
+    hand_over(found);
+  }
+
+  void hand_over(const Found& found) {
+    if (call_.number == 0 || call_.number == count_) {
+      has_found_ = true;
+      status_ = std::max(status_, take_(found));
+    }
   }
 
   void blame(const std::string& source, const std::string& problem) {
@@ -88,6 +119,91 @@ class Messages {
       status_ = std::max(status_, kBroken);
     }
   }
+
+  // ---- Session files
+
+  // What was handed over of a session file.
+  struct Shown {
+    size_t before = 0;    // the number of the last message of the files before
+    uint32_t last = 0;    // record
+    uint32_t waited = 0;  // records up to there have had time to end
+  };
+
+  void take(const Record& record, size_t before, const std::string& source) {
+    Found found;
+    const auto* const type = message_of_function(record.name);
+    found.function = type != nullptr ? record.name : "";
+    found.name = type != nullptr ? type->name() : record.name;
+    found.bytes = record.bytes;
+    found.missing = record.missing;
+    found.use = record.use;
+    found.outcome = record.outcome;
+    found.time = record.time;
+    found.connection = connections_;
+    found.number = count_ = before + record.number;
+    found.place = "message " + std::to_string(found.number) + ": " + utc(found.milliseconds()) +
+                  ", " + source + way_of(found) + ", " + size_of(found);
+    hand_over(found);
+  }
+
+  // Hands over what is new. A call that has not ended may do so in a moment, and a record that is
+  // not there may have been written while the file was read, so that is waited for once.
+  void take_new(const Recording& recording, const std::string& source, bool is_waiting,
+                Shown* shown) {
+    const std::vector<Record>& records = recording.records;
+    if (!records.empty() && records.back().number < shown->last && recording.notes.empty()) {
+      complain(source + "the file was begun anew");
+      ++connections_;
+      *shown = {count_, 0, 0};
+    }
+    const uint32_t begin = shown->last;
+    for (const Record& record : records) {
+      if (record.number <= begin) {
+        continue;
+      }
+      const bool may_change =
+          record.outcome == Outcome::kNotEnded || record.number - shown->last > 1;
+      if (is_waiting && may_change && record.number > shown->waited) {
+        shown->waited = records.back().number;
+        return;
+      }
+      note_gap(*shown, record.number, source);
+      shown->last = record.number;
+      take(record, shown->before, source);
+    }
+  }
+
+  static void note_gap(const Shown& shown, uint32_t number, const std::string& source) {
+    const size_t first = shown.before + shown.last + 1;
+    const size_t next = shown.before + number;
+    if (next == first + 1) {
+      complain(source + "message " + std::to_string(first) + " is not in the file");
+    } else if (next > first) {
+      complain(source + "messages " + std::to_string(first) + " to " + std::to_string(next - 1) +
+               " are not in the file");
+    }
+  }
+
+  void of_recording(const std::string& name, Recording recording, const std::string& source) {
+    Shown shown = {count_, 0, 0};
+    ++connections_;
+    while (call_.follow) {
+      take_new(recording, source, true, &shown);
+      if (!wait_for_more()) {
+        break;
+      }
+      try {
+        recording = read_recording(read_file(name));
+      } catch (const Failure&) {  // it is begun anew just now, or gone
+      }
+    }
+    take_new(recording, source, false, &shown);
+    for (const std::string& note : recording.notes) {
+      blame(source, note);
+    }
+  }
+
+  // ---- Captures of packets
 
   struct Arrived {
     const Stream* stream;
@@ -125,8 +241,7 @@ class Messages {
       Found found;
       found.use = stream.from_client ? Use::kSends : Use::kReceives;
       found.connection = connections_ + stream.connection;
-      found.time =
-          std::chrono::duration_cast<std::chrono::milliseconds>(arrived.arrival.time).count();
+      found.time = arrived.arrival.time;
       take(stream.bytes, arrived.frame, place_of(stream, source), found);
     }
     connections_ += capture.streams.empty() ? 0 : capture.streams.back().connection;
@@ -156,7 +271,8 @@ class Messages {
   const Call& call_;
   const std::function<int(const Found&)>& take_;
   bool is_many_;
-  size_t count_ = 0;
+  size_t count_ = 0;        // number of the last message
+  bool has_found_ = false;  // whether there was one that is wanted
   size_t connections_ = 0;  // of the captures before
   int status_ = kDone;
 };
@@ -195,12 +311,18 @@ int for_each_message(const Call& call, const std::function<int(const Found&)>& t
   if (std::count(call.files.begin(), call.files.end(), "-") > 1) {
     throw Failure{kWrongCall, "standard input can be read once"};
   }
+  if (call.follow && (call.files.size() != 1 || call.files.front() == "-")) {
+    throw Failure{kWrongCall, "--follow takes one file"};
+  }
   Messages messages(call, take);
   if (call.files.empty()) {
     messages.of_file("-");
   }
   for (const std::string& file : call.files) {
     messages.of_file(file);
+  }
+  if (call.number > 0 && !messages.has_found()) {
+    throw Failure{kWrongCall, "there is no message " + std::to_string(call.number)};
   }
   return messages.status();
 }

@@ -19,8 +19,10 @@
 #include "decode.h"
 #include "encode.h"
 #include "explain.h"
+#include "export.h"
 #include "guess.h"
 #include "input.h"
+#include "listing.h"
 #include "misread.h"
 #include "notation.h"
 #include "query.h"
@@ -43,7 +45,7 @@ using qel_wire::kWrongCall;
 using qel_wire::Notation;
 
 // Which name is not said: it may be a piece of a token, if the stream is cut.
-constexpr char kNoSuchName[] = "its frame has a name that no message has";
+constexpr char kNoSuchName[] = "its frame or its record has a name that no message has";
 
 void complain_about(const qel_wire::Found& found, const std::string& text) {
   qel_wire::complain((found.place.empty() ? "" : found.place + ": ") + text);
@@ -80,14 +82,16 @@ class Conditions {
     if (conditions_.empty()) {
       return std::nullopt;
     }
-    if (qel_wire::problem_of(found.bytes, type).has_value()) {
+    const auto problem = qel_wire::problem_of(found.bytes, type);
+    if (problem.has_value() && found.missing == 0) {
       complain_about(found, "broken, and so left out");
       return kBroken;
     }
+    const auto whole =
+        found.bytes.substr(0, problem.has_value() ? problem->readable : found.size());
     const qel_wire::Hidden hidden(found.bytes, type, shows_token_);
-    if (std::all_of(conditions_.begin(), conditions_.end(), [&](const auto& condition) {
-          return condition.holds(found.bytes, type, hidden);
-        })) {
+    if (std::all_of(conditions_.begin(), conditions_.end(),
+                    [&](const auto& condition) { return condition.holds(whole, type, hidden); })) {
       return std::nullopt;
     }
     if (hidden.hides_any()) {
@@ -275,53 +279,71 @@ int guess(const Call& call) {
   });
 }
 
-void print_entry(const qel_wire::Entry& entry, const qel_wire::Found& found,
-                 const qel_wire::Colours& colours) {
-  const char* use = entry.use == qel_wire::Use::kSends      ? "sent    "
-                    : entry.use == qel_wire::Use::kReceives ? "received"
-                                                            : "?       ";
-  std::cout << std::setw(5) << entry.number << "  "
-            << (found.time.has_value() ? qel_wire::utc(*found.time) + "  " : "") << use << "  "
-            << colours.name << entry.types.front()->name() << colours.end
-            << (entry.is_guess ? "?" : "") << ", " << qel_wire::counted(found.bytes.size(), "byte");
-  if (entry.request_id.has_value()) {
-    std::cout << ", requestId " << *entry.request_id;
-  }
-  if (entry.answers.has_value()) {
-    std::cout << ", answers " << *entry.answers;
-  }
-}
-
-int session(const Call& call) {
-  const qel_wire::Colours colours = colours_of(call);
+// Calls take(entry, found) for each message that is wanted.
+template <typename Take>
+int for_each_entry(const Call& call, qel_wire::Session* session, Take take) {
   const Conditions conditions(call, nullptr);
-  qel_wire::Session session;
-  std::set<size_t> shown;
-  const int status = qel_wire::for_each_message(call, [&](const qel_wire::Found& found) {
-    const qel_wire::Entry entry = session.add(found);
+  std::set<const Descriptor*> wanted;
+  for (const std::string& name : call.messages) {
+    wanted.insert(&message_of(name));
+  }
+  return qel_wire::for_each_message(call, [&](const qel_wire::Found& found) {
+    const qel_wire::Entry entry = session->add(found);
     const bool is_named = found.name.empty() || qel_wire::message_named(found.name) != nullptr;
     if (!is_named) {
       complain_about(found, kNoSuchName);
     }
+    if (!wanted.empty() && wanted.count(entry.types.front()) == 0) {
+      return kDone;
+    }
     if (const auto status = conditions.refuse(found, *entry.types.front())) {
       return *status;
     }
-    shown.insert(entry.number);
-    print_entry(entry, found, colours);
-    const auto problem = qel_wire::problem_of(found.bytes, *entry.types.front());
-    if (problem.has_value()) {
-      std::cout << "  " << colours.wrong << "broken at offset " << problem->offset << ": "
-                << problem->reason << colours.end;
-    }
-    std::cout << '\n';
-    return problem.has_value() || !is_named ? kBroken : kDone;
+    const int status = take(entry, found);
+    return is_named ? status : kBroken;
   });
+}
+
+int session(const Call& call) {
+  const qel_wire::Colours colours = colours_of(call);
+  qel_wire::Session session;
+  std::set<size_t> shown;
+  const auto show = [&](const qel_wire::Entry& entry, const qel_wire::Found& found) {
+    shown.insert(entry.number);
+    const auto problem = found.missing > 0
+                             ? std::nullopt  // nobody knows
+                             : qel_wire::problem_of(found.bytes, *entry.types.front());
+    if (call.json) {
+      print_entry_json(entry, found, problem, &std::cout);
+    } else {
+      print_entry(entry, found, problem, colours, &std::cout);
+    }
+    return problem.has_value() ? kBroken : kDone;
+  };
+  const int status = for_each_entry(call, &session, show);
+  const auto print = call.json ? qel_wire::print_unanswered_json : qel_wire::print_unanswered;
   for (const qel_wire::Entry& entry : session.unanswered()) {
     if (shown.count(entry.number) > 0) {
-      std::cout << "no answer to " << entry.number << ", " << entry.types.front()->name() << '\n';
+      print(entry, &std::cout);
     }
   }
   return status;
+}
+
+int export_messages(const Call& call) {
+  if (call.ports) {
+    qel_wire::write_ports(&std::cout);
+    return kDone;
+  }
+  qel_wire::Session session;
+  qel_wire::write_head(&std::cout);
+  return for_each_entry(call, &session,
+                        [](const qel_wire::Entry& entry, const qel_wire::Found& found) {
+                          if (!found.is_unsent()) {
+                            write_packet(entry, found, &std::cout);
+                          }
+                          return kDone;
+                        });
 }
 
 // The message of the call's file.
@@ -394,8 +416,8 @@ int run(const Call& call) {
   }
   using Command = int (*)(const Call& call);
   static const std::pair<const char*, Command> commands[] = {
-      {"decode", decode},   {"encode", encode}, {"explain", explain}, {"guess", guess},
-      {"session", session}, {"diff", diff},     {"schema", schema}};
+      {"decode", decode},   {"encode", encode},          {"explain", explain}, {"guess", guess},
+      {"session", session}, {"export", export_messages}, {"diff", diff},       {"schema", schema}};
   return std::find_if(std::begin(commands), std::end(commands),
                       [&](const auto& command) { return call.command == command.first; })
       ->second(call);

@@ -12,16 +12,14 @@
 #include <array>
 #include <cstddef>
 #include <cstdint>
-#include <cstdio>
 #include <cstring>
 #include <deque>
 #include <map>
-#include <memory>
-#include <new>
 #include <optional>
 #include <utility>
 
 #include "failure.h"
+#include "pcap_file.h"
 #include "text.h"
 
 namespace qel_wire {
@@ -367,25 +365,6 @@ class Connections {
 
 // ---- The file
 
-using Pcap = std::unique_ptr<pcap_t, void (*)(pcap_t*)>;
-
-Pcap opened(const std::string& file) {
-  std::unique_ptr<std::FILE, int (*)(std::FILE*)> input(
-      fmemopen(const_cast<char*>(file.data()), file.size(), "r"), std::fclose);
-  if (input == nullptr) {
-    throw std::bad_alloc();
-  }
-  std::array<char, PCAP_ERRBUF_SIZE> reason{};
-  Pcap pcap(pcap_fopen_offline_with_tstamp_precision(input.get(), PCAP_TSTAMP_PRECISION_NANO,
-                                                     reason.data()),
-            pcap_close);
-  if (pcap == nullptr) {
-    throw Failure{kBroken, reason.data()};
-  }
-  static_cast<void>(input.release());  // it is closed with the other
-  return pcap;
-}
-
 const Link& link_of(pcap_t* pcap) {
   const int type = pcap_datalink(pcap);
   for (const Link& link : kLinks) {
@@ -397,14 +376,6 @@ const Link& link_of(pcap_t* pcap) {
                              pcap_datalink_val_to_description_or_dlt(type)};
 }
 
-// A damaged file may have any numbers.
-std::chrono::nanoseconds time_of(const timeval& time) {
-  constexpr int64_t kMost = 9'000'000'000;
-  return std::max<std::chrono::nanoseconds>(
-      std::chrono::nanoseconds(0), std::chrono::seconds(std::min<int64_t>(time.tv_sec, kMost)) +
-                                       std::chrono::nanoseconds(time.tv_usec));
-}
-
 }  // namespace
 
 const Segment& Stream::segment_at(size_t offset) const {
@@ -413,22 +384,8 @@ const Segment& Stream::segment_at(size_t offset) const {
       [](size_t wanted, const Segment& segment) { return wanted < segment.offset; }));
 }
 
-bool is_capture(std::string_view bytes) {
-  constexpr std::array<std::string_view, 4> kPcap = {
-      "\xa1\xb2\xc3\xd4", "\xd4\xc3\xb2\xa1",   // with microseconds
-      "\xa1\xb2\x3c\x4d", "\x4d\x3c\xb2\xa1"};  // with nanoseconds
-  // A message may begin as pcapng does, but does not go on so.
-  constexpr std::array<std::string_view, 2> kPcapngOrder = {"\x1a\x2b\x3c\x4d", "\x4d\x3c\x2b\x1a"};
-  const auto is_one_of = [](const auto& texts, std::string_view text) {
-    return std::find(texts.begin(), texts.end(), text) != texts.end();
-  };
-  return is_one_of(kPcap, bytes.substr(0, 4)) ||
-         (bytes.size() >= 12 && bytes.substr(0, 4) == "\x0a\x0d\x0d\x0a" &&
-          is_one_of(kPcapngOrder, bytes.substr(8, 4)));
-}
-
 Capture read_capture(const std::string& file) {
-  const Pcap pcap = opened(file);
+  const Pcap pcap = open_pcap(file);
   const Link& link = link_of(pcap.get());
   Connections connections;
   std::map<Remark, size_t> remarks;

@@ -46,9 +46,6 @@ struct Capture {
   bool is_broken = false;          // whether it does
 };
 
-// Whether the bytes begin as a file of pcap or pcapng does.
-bool is_capture(std::string_view bytes);
-
 // Throws a Failure, which has none of the bytes, if the bytes are no capture, or one of another
 // kind of network. Of a file that breaks off, it reads what is before that.
 Capture read_capture(const std::string& file);

@@ -76,6 +76,16 @@ std::string with_coloured_names(const std::string& text, const Colours& colours)
   return result;
 }
 
+struct Function {
+  const char* name;
+  const char* message;
+  Use use;
+};
+
+constexpr Function kFunctions[] = {
+#include "interface.inc"
+};
+
 struct Facts {
   bool is_record = false;
   Use use = Use::kNone;
@@ -83,9 +93,10 @@ struct Facts {
 };
 
 std::vector<Facts> all_facts() {
-  static const std::map<std::string, Use> uses = {
-#include "interface.inc"
-  };
+  std::map<std::string, Use> uses;
+  for (const Function& function : kFunctions) {
+    uses[function.message] = function.use;
+  }
   std::vector<Facts> facts(static_cast<size_t>(schema_file().message_type_count()));
   for (size_t m = 0; m < facts.size(); ++m) {
     const Descriptor& type = *schema_file().message_type(static_cast<int>(m));
@@ -119,6 +130,15 @@ const FileDescriptor& schema_file() {
 const Descriptor* message_named(const std::string& name) {
   return one_named(name, schema_file().message_type_count(),
                    [](int i) { return schema_file().message_type(i); });
+}
+
+const Descriptor* message_of_function(const std::string& name) {
+  for (const Function& function : kFunctions) {
+    if (name == function.name) {
+      return schema_file().FindMessageTypeByName(function.message);
+    }
+  }
+  return nullptr;
 }
 
 const FieldDescriptor* field_named(const Descriptor& type, const std::string& name) {

@@ -16,6 +16,8 @@ const google::protobuf::FileDescriptor& schema_file();
 
 // In any case of letters; null if there is none.
 const google::protobuf::Descriptor* message_named(const std::string& name);
+// Of the function of the C interface that makes it or takes it; null if there is no such function.
+const google::protobuf::Descriptor* message_of_function(const std::string& name);
 const google::protobuf::FieldDescriptor* field_named(const google::protobuf::Descriptor& type,
                                                      const std::string& name);
 const google::protobuf::EnumValueDescriptor* member_named(

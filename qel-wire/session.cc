@@ -5,6 +5,7 @@
 #include <string_view>
 
 #include "guess.h"
+#include "token.h"
 #include "walk.h"
 
 namespace qel_wire {
@@ -24,6 +25,27 @@ class RequestId : public Visitor {
 
   std::optional<int64_t> value;
   bool is_sound = true;
+};
+
+// Notes the ids of a message that are not hidden.
+class ShownIds : public Visitor {
+ public:
+  ShownIds(const Hidden& hidden, Entry* entry) : hidden_(hidden), entry_(*entry) {}
+
+  void begin(const Piece& piece) override {
+    if (piece.depth > 0 || !piece.is_known || hidden_.hides(piece)) {
+      return;
+    }
+    if (piece.field->name() == "requestId") {
+      entry_.shown_request_id = static_cast<int64_t>(piece.value);
+    } else if (piece.field->name() == "chatroomId") {
+      entry_.shown_chatroom_id = static_cast<int64_t>(piece.value);
+    }
+  }
+
+ private:
+  const Hidden& hidden_;
+  Entry& entry_;
 };
 
 std::optional<int64_t> request_id_in(std::string_view bytes, const Descriptor& type) {
@@ -107,10 +129,10 @@ Session::Alike* Session::requests_answered_by(const Found& found, const Descript
   return nullptr;
 }
 
-// A message that only one of the ends sends tells more than the ports.
+// A message that only one of the ends sends tells more than the ports. A record knows.
 Use Session::use_of_sender(const Found& found, const Descriptor* type) {
-  if (found.use == Use::kNone) {
-    return Use::kNone;
+  if (found.use == Use::kNone || found.outcome.has_value()) {
+    return found.use;
   }
   if (type != nullptr && use_of(*type) != Use::kNone) {
     if (use_of(*type) == found.use) {
@@ -124,7 +146,7 @@ Use Session::use_of_sender(const Found& found, const Descriptor* type) {
 
 Entry Session::add(const Found& found) {
   Entry entry;
-  entry.number = ++count_;
+  entry.number = last_ = found.number > 0 ? found.number : last_ + 1;
   entry.connection = found.connection;
   entry.end = found.use;
   const Descriptor* type = message_named(found.name);
@@ -138,12 +160,16 @@ Entry Session::add(const Found& found) {
   entry.types = type == nullptr ? guess(found.bytes, use).front().types : Types{type};
   type = entry.types.front();
   entry.request_id = request_id_in(found.bytes, *type);
+  const Hidden hidden(found.bytes, *type);
+  ShownIds ids(hidden, &entry);
+  walk(found.bytes, *type, &ids);
   entry.use = use != Use::kNone ? use : use_of(*type);
   if (request != nullptr) {
     entry.answers = request->number;
     entry.use = entry.use != Use::kNone ? entry.use : other(request->use);
     requests->pop_back();
-  } else if (reply_to(*type) != nullptr && !problem_of(found.bytes, *type).has_value()) {
+  } else if (reply_to(*type) != nullptr && !found.is_unsent() &&
+             (found.missing > 0 || !problem_of(found.bytes, *type).has_value())) {
     open_[{entry.connection, entry.request_id}][{entry.end, entry.types}].push_back(entry);
   }
   return entry;

@@ -19,7 +19,7 @@
 namespace qel_wire {
 
 struct Entry {
-  size_t number = 0;  // from 1
+  size_t number = 0;  // that of Found, or from 1
   // Of a guess all that fit equally well, otherwise one.
   std::vector<const google::protobuf::Descriptor*> types;
   bool is_guess = false;  // or answers a guess
@@ -27,6 +27,9 @@ struct Entry {
   Use end = Use::kNone;   // the same as the ports have it, which may turn it round
   size_t connection = 0;
   std::optional<int64_t> request_id;
+  // Those that are not hidden.
+  std::optional<int64_t> shown_request_id;
+  std::optional<int64_t> shown_chatroom_id;
   std::optional<size_t> answers;  // the number of the request
 };
 
@@ -36,7 +39,7 @@ class Session {
   // same requestId from the other end, or the best guess.
   Entry add(const Found& found);
 
-  // Requests that no message has answered, the first one first.
+  // Requests that were sent and that no message has answered, the first one first.
   std::vector<Entry> unanswered() const;
 
  private:
@@ -48,7 +51,7 @@ class Session {
 
   Use use_of_sender(const Found& found, const google::protobuf::Descriptor* type);
 
-  size_t count_ = 0;
+  size_t last_ = 0;          // the number of the last message
   std::set<size_t> turned_;  // connections whose ends are the other way round than they seemed
   // By their connections and requestIds; those without one are never answered.
   std::map<std::pair<size_t, std::optional<int64_t>>, std::map<Kind, Alike>> open_;

@@ -83,6 +83,18 @@ void write_if_long(std::string* part, std::ostream* out) {
   }
 }
 
+// With milliseconds behind the form.
+std::string time_text(int64_t milliseconds, const char* form, const char* zone) {
+  const std::time_t seconds = milliseconds / 1000;
+  std::tm parts{};
+  gmtime_r(&seconds, &parts);
+  char date[32];
+  char text[48];
+  std::strftime(date, sizeof date, form, &parts);
+  std::snprintf(text, sizeof text, "%s.%03d%s", date, static_cast<int>(milliseconds % 1000), zone);
+  return text;
+}
+
 }  // namespace
 
 std::string readable(std::string_view text) {
@@ -171,14 +183,11 @@ std::string too_long(size_t length, size_t there) {
 }
 
 std::string utc(int64_t milliseconds) {
-  const std::time_t seconds = milliseconds / 1000;
-  std::tm parts{};
-  gmtime_r(&seconds, &parts);
-  char date[32];
-  char text[48];
-  std::strftime(date, sizeof date, "%Y-%m-%d %H:%M:%S", &parts);
-  std::snprintf(text, sizeof text, "%s.%03d UTC", date, static_cast<int>(milliseconds % 1000));
-  return text;
+  return time_text(milliseconds, "%Y-%m-%d %H:%M:%S", " UTC");
+}
+
+std::string rfc3339(int64_t milliseconds) {
+  return time_text(milliseconds, "%Y-%m-%dT%H:%M:%S", "Z");
 }
 
 bool is_plausible_time(int64_t milliseconds) {

@@ -41,6 +41,9 @@ std::string too_long(size_t length, size_t there);
 // "2023-11-14 22:13:20.000 UTC" of milliseconds since 1970.
 std::string utc(int64_t milliseconds);
 
+// The same as programs have it: "2023-11-14T22:13:20.000Z".
+std::string rfc3339(int64_t milliseconds);
+
 // Whether it may be such a time: of the years 2000 to 2099.
 bool is_plausible_time(int64_t milliseconds);
 

@@ -61,6 +61,13 @@ setup_file() {
   grep -Ev '^lib(dlog|protobuf|stdc\+\+|gcc_s|m|c)\.so' needed | none
 }
 
+@test "the recorder's packages have the same file, and need the C library alone" {
+  mkdir deb
+  dpkg-deb -x "$made"/qel-trace_*.deb deb
+  dpkg-deb -f "$made"/qel-trace_*.deb Depends | grep -x 'libc6 ([^,]*), libgcc-s1 ([^,]*)'
+  rpm -qpl "$made"/qel-message-protosvc-trace-*.rpm | diff - <(cd deb && find /usr/lib ./usr/lib -name 'libqel-trace.so' | sed 's/^\.//')
+}
+
 @test "a plug-in in C is built and run with what the RPMs install" {
   fakeroot rpm --root "$sdk/rpm" --dbpath /var/lib/rpm --nodeps --ignorearch --ignoreos -i \
     "$made"/qel-message-protosvc-{[0-9]*,devel*}.rpm

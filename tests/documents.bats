@@ -65,6 +65,7 @@ in_document() {
   sed 's/@VERSION@/1.2.3/' "$SOURCE/packaging/buildroot/qel-message-protosvc.mk" >package.mk
   cat >Makefile <<'E2'
 BR2_DL_DIR = downloads
+BR2_PACKAGE_QEL_MESSAGE_PROTOSVC_TRACE = y
 STAGING_DIR = staging
 HOST_DIR = host
 define cmake-package
@@ -80,7 +81,7 @@ E2
 @test "Kconfig reads Buildroot's option" {
   printf 'config %s\n\tdef_bool y\n' BR2_INSTALL_LIBSTDCPP BR2_TOOLCHAIN_HAS_THREADS >Kconfig
   printf 'config %s\n\tbool "%s"\n' BR2_STATIC_LIBS static BR2_PACKAGE_PROTOBUF protobuf \
-    BR2_PACKAGE_DLOG dlog >>Kconfig
+    BR2_PACKAGE_DLOG dlog BR2_TOOLCHAIN_USES_GLIBC glibc >>Kconfig
   echo "source \"$SOURCE/packaging/buildroot/Config.in\"" >>Kconfig
   run -0 /usr/bin/python3 -c 'import kconfiglib
 k = kconfiglib.Kconfig("Kconfig")

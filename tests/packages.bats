@@ -9,10 +9,11 @@ root=$BATS_FILE_TMPDIR/root # where they are installed
 libraries=$root/usr/$LIBDIR
 native=$(dpkg --print-architecture)
 runtime=("libqel-message-protosvc$FIRST" qel-message-protosvc-workstation)
-installed=("${runtime[@]/%/:$native}" {libqel-message-protosvc-dev,qel-message-testkit,qel-wire}:"$native")
+installed=("${runtime[@]/%/:$native}"
+  {libqel-message-protosvc-dev,qel-message-testkit,qel-trace,qel-wire}:"$native")
 if [ -n "$TOOLCHAIN" ]; then
   runtime=(qel-message-protosvc-emulator)
-  installed+=({qel-message-protosvc-emulator,libqel-message-protosvc-dev}:"$ARCHITECTURE")
+  installed+=({qel-message-protosvc-emulator,libqel-message-protosvc-dev,qel-trace}:"$ARCHITECTURE")
 fi
 
 setup_file() {
@@ -84,6 +85,18 @@ compile() {
   compile "$SOURCE/tests/consumers/c/plugin.c"
   DLOG_STANDIN_PRIORITY=S run -0 run_installed ./program
   [ "$output" = 'probe 7, answer of 2 bytes' ]
+}
+
+@test "the recorder records a plug-in in C" {
+  compile "$SOURCE/tests/consumers/c/plugin.c"
+  local preload=LD_PRELOAD=libqel-trace.so
+  [ -z "$TOOLCHAIN" ] || preload=QEMU_SET_ENV=$preload
+  (export "${preload?}" QEL_TRACE_FILE=session DLOG_STANDIN_PRIORITY=S && run_installed ./program)
+  "$SOURCE/qel-trace/tests/session.py" session >found
+  diff <(cut -d ' ' -f 2-4 found) - <<'TXT'
+received done client_echo_deserialize
+sent done client_echo_reply_serialize
+TXT
 }
 
 @test "the library is found by its name without a number, with what runs it alone" {

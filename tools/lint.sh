@@ -25,7 +25,7 @@ json.dump(list(commands.values()), sys.stdout, indent=1)'
 tidy() {
   local checks=''
   case $2 in
-    tests/* | bench/* | fuzz/* | qel-wire/tests/* | testkit/tests/* | qel-wire/fuzz_target.cc)
+    tests/* | */tests/* | bench/* | fuzz/* | qel-wire/fuzz_target.cc)
       checks='-clang-analyzer-*,-bugprone-*,-misc-*,-performance-*'
       ;;
   esac

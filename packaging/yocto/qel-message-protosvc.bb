@@ -22,4 +22,7 @@ EXTRA_OECMAKE = " \
 FILES_SOLIBSDEV = ""
 FILES:${PN} += "${libdir}/libqel-message-protosvc.so"
 INSANE_SKIP:${PN} += "dev-so"
+PACKAGES =+ "${PN}-trace"
+FILES:${PN}-trace = "${libdir}/libqel-trace.so"
+INSANE_SKIP:${PN}-trace += "dev-so"
 FILES:${PN}-dev += "${datadir}/qel-message-protosvc"

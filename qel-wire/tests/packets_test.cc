@@ -11,6 +11,8 @@
 #include <vector>
 
 #include "failure.h"
+#include "numbers.h"
+#include "pcap_file.h"
 
 namespace {
 
@@ -19,19 +21,6 @@ using qel_wire::Stream;
 using namespace std::string_literals;
 
 // ---- Packets
-
-std::string little_endian(uint64_t number, size_t size) {
-  std::string bytes;
-  for (size_t i = 0; i < size; ++i) {
-    bytes += static_cast<char>(number >> (8 * i));
-  }
-  return bytes;
-}
-
-std::string big_endian(uint64_t number, size_t size) {
-  const std::string bytes = little_endian(number, size);
-  return {bytes.rbegin(), bytes.rend()};
-}
 
 struct End {
   std::string address;
@@ -113,12 +102,6 @@ std::string pcap(const std::vector<std::string>& packets, uint32_t link = kRaw,
             integer(packet.size(), 4) + packet.substr(0, limit);
   }
   return file;
-}
-
-std::string block(uint32_t type, std::string body) {
-  body.resize((body.size() + 3) / 4 * 4);
-  const std::string size = little_endian(body.size() + 12, 4);
-  return little_endian(type, 4) + size + body + size;
 }
 
 std::string pcapng(const std::vector<std::string>& packets, uint64_t begin = 5) {

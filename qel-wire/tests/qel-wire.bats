@@ -8,7 +8,7 @@ setup() {
   export LC_ALL=C
   unset NO_COLOR
   PATH=$BUILT:$PATH
-  tests=$SOURCE/qel-wire/tests
+  export tests=$SOURCE/qel-wire/tests
   page=$SOURCE/docs/qel-wire.md
   cd "$BATS_TEST_TMPDIR" || exit
 }
@@ -48,6 +48,99 @@ holds() { [ -s "$1" ] && diff -u -F '^### ' <(grep -E '^(###|[$]) ' -A 9999 "$1"
 
 @test "it hides what its sessions hide" { holds "$tests/access_token.txt"; }
 
+@test "it reads session files as their sessions show" { holds "$tests/session_files.txt"; }
+
+# follow FILE: session --follow, whose lines next_line reads. A line that does not come fails.
+follow() { exec {followed}< <(exec qel-wire session --follow "$1" 2>&1); }
+next_line() { read -r -t 60 -u "$followed" line; }
+
+# turn_into FILE: the file becomes that one while nobody looks at it.
+turn_into() {
+  kill -STOP $!
+  mv "$1" growing
+  kill -CONT $!
+}
+
+# lines_up_to NUMBER: up to that message's.
+lines_up_to() {
+  while next_line; do
+    echo "$line"
+    [[ $line != "$1 "* ]] || return 0
+  done
+  return 1
+}
+
+# The session of the page grows in a ring, which turns every few messages.
+@test "a session file is followed while it grows and turns" {
+  local line followed end
+  head -n 2 "$tests/session" | "$tests/session_file.py" growing 512
+  follow growing
+  for end in 2 3 4 5; do
+    head -n "$end" "$tests/session" | "$tests/session_file.py" growing 512
+    lines_up_to "$end" >>shown # before there is more
+  done
+  kill -INT $!
+  cat <&"$followed" >>shown
+  "$tests/session_file.py" whole <"$tests/session"
+  qel-wire session whole | head -n 5 | sed 's/^ *//' | diff - <(head -n 5 shown)
+  diff <(tail -n +6 shown) - <<<$'no answer to 2, CurrentTimeRequest\nno answer to 4, ReadMessageRequest\nno answer to 5, ClientEcho'
+}
+
+@test "what a session file lost while it was followed is noted, and that it begins anew" {
+  local line followed
+  head -n 1 "$tests/session" | "$tests/session_file.py" growing
+  follow growing
+  next_line
+  { echo 'at 4' && echo '< ClientEcho 1 0807'; } | "$tests/session_file.py" growing
+  next_line
+  [ "$line" = 'qel-wire: messages 2 to 3 are not in the file' ]
+  next_line
+  echo '< ClientEcho 1 0808' | "$tests/session_file.py" growing
+  next_line
+  [ "$line" = 'qel-wire: the file was begun anew' ]
+  next_line
+  [[ $line == '5 '*', requestId 8, taken' ]]
+  kill -INT $!
+}
+
+@test "a call that has not ended is listed a moment later, if it has ended then or not" {
+  local line followed
+  printf '%s\n' '< ClientEcho 1 0807' '< ClientEcho 0 0808' | "$tests/session_file.py" growing
+  printf '%s\n' '< ClientEcho 1 0807' '< ClientEcho 1 0808' '< ClientEcho 0 0809' '< ClientEcho 1 080a' |
+    "$tests/session_file.py" grown
+  follow growing
+  next_line
+  turn_into grown # before that moment is over
+  next_line
+  [[ $line == '2 '*', taken' ]]
+  next_line
+  [[ $line == '3 '*', not ended' ]]
+  next_line
+  [[ $line == '4 '*', taken' ]]
+  kill -INT $!
+}
+
+@test "a record that is not there may come a moment later" {
+  local line followed
+  printf '%s\n' '< ClientEcho 1 0807' 'at 3' '< ClientEcho 1 0809' | "$tests/session_file.py" growing
+  printf '< ClientEcho 1 %s\n' 0807 0808 0809 | "$tests/session_file.py" grown
+  follow growing
+  next_line
+  turn_into grown
+  next_line
+  [[ $line == '2 '*', taken' ]]
+  kill -INT $!
+}
+
+@test "following ends when nobody reads it" {
+  local line followed
+  head -n 1 "$tests/session" | "$tests/session_file.py" growing
+  exec {followed}< <(exec timeout 20 qel-wire session --follow growing)
+  next_line
+  exec {followed}<&-
+  wait $! || [ $? -ne 124 ]
+}
+
 @test "its page shows what happens" {
   capture chat.pcap <<'end'
 > ChatRequest requestId: 7 chatroomId: 42 chatMessageParams { msgId: 1 chatMsg: "hi" }
@@ -58,6 +151,7 @@ holds() { [ -s "$1" ] && diff -u -F '^### ' <(grep -E '^(###|[$]) ' -A 9999 "$1"
 > ClientEchoReply requestId: 700001
 < CurrentTimeReply requestId: 8 result { code: 0 } currentTimeMillis: 1795430406000
 end
+  "$tests/session_file.py" session.pcapng <"$tests/session"
   awk '/^```/ { on = $0 == "```console"; next } on' "$page" >page.txt
   holds page.txt
 }
@@ -83,7 +177,7 @@ requestId: 7" ]
 @test "a frame of an unknown message, and bytes that are none, are not left out" {
   printf '> %s\n' "$(frame NewMessage 0807)" "$(frame ClientEcho 0807)" | packets named.pcap 9000,40000
   run -1 --separate-stderr qel-wire decode auto --frames=example named.pcap
-  [[ $output == *requestId* && $stderr == *'its frame has a name that no message has' ]]
+  [[ $output == *requestId* && $stderr == *'its frame or its record has a name that no message has' ]]
   printf '> 0a436c69\n' | packets cut.pcap 9000,40000
   run -1 --separate-stderr qel-wire decode auto --frames=example cut.pcap
   [[ $stderr == *'the frame at offset 0 cannot be read'* ]]
@@ -220,7 +314,7 @@ completed() {
 }
 
 @test "Bash goes on behind values" {
-  [ "$(completed --color = never exp)" = explain ]
+  [ "$(completed --color = never expl)" = explain ]
   [ "$(completed explain --hex = 0807 ChatR)" = 'ChatRequest ChatReply' ]
   [ "$(completed explain --frames u16 ChatR)" = 'ChatRequest ChatReply' ]
 }

@@ -15,11 +15,14 @@
 
 #include "decode.h"
 #include "explain.h"
+#include "export.h"
+#include "listing.h"
 #include "misread.h"
 #include "msgspec_frontend.pb.h"
 #include "notation.h"
 #include "query.h"
 #include "schema.h"
+#include "session.h"
 
 namespace {
 
@@ -328,6 +331,15 @@ std::vector<std::string> outputs(const Descriptor& type, const std::string& byte
     qel_wire::diff(nothing, side, qel_wire::Colours(false), &differences);
   }
   texts.push_back(differences.str());
+  qel_wire::Found found;
+  found.bytes = bytes;
+  found.name = type.name();
+  const qel_wire::Entry entry = qel_wire::Session().add(found);
+  std::ostringstream listed;
+  qel_wire::print_entry(entry, found, {}, qel_wire::Colours(false), &listed);
+  qel_wire::print_entry_json(entry, found, qel_wire::problem_of(bytes, type), &listed);
+  qel_wire::write_packet(entry, found, &listed);
+  texts.push_back(listed.str());
   return texts;
 }
 

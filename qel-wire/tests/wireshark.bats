@@ -1,12 +1,13 @@
 #!/usr/bin/env bats
-# The plug-in for Wireshark, installed and used as its page says. SOURCE is the repository, EXAMPLES
-# the folder of the demo's programs. What the demo prints is what Wireshark has to show.
+# Wireshark, with our plug-in and without, as its page says. SOURCE is the repository, BUILT the folder
+# of qel-wire, EXAMPLES the folder of the demo's programs. What the demo prints is what Wireshark has to show.
 bats_require_minimum_version 1.5.0
 load frames
 
 # A program on the way records the demo's connection: to capture it takes privileges.
 setup_file() {
   export LC_ALL=C.UTF-8 HOME=$BATS_FILE_TMPDIR
+  PATH=$BUILT:$PATH
   unset XDG_CONFIG_HOME XDG_DATA_HOME WIRESHARK_CONFIG_DIR WIRESHARK_DATA_DIR
   cd "$SOURCE" || exit
   bash -euc "$(grep '^install ' docs/wireshark.md)"
@@ -16,7 +17,23 @@ setup_file() {
   capture chat.pcap <record
 }
 
-setup() { cd "$HOME" || exit; }
+setup() {
+  cd "$HOME" || exit
+  PATH=$BUILT:$PATH
+  ports=$(sed -n '/^mkdir/,/^qel-wire export --ports/p' "$SOURCE/docs/wireshark.md")
+}
+
+# session FILE: makes a session file of records on standard input.
+session() { "$SOURCE/qel-wire/tests/session_file.py" "$1"; }
+
+# plain_shark FILE OPTION...: tshark without the plug-in, as the page says, on the messages of a session
+# file.
+plain_shark() {
+  export HOME=$BATS_TEST_TMPDIR
+  bash -euc "$(grep '^install .*[.]proto$' "$SOURCE/docs/wireshark.md" | sed "s#proto-lib#$SOURCE/&#"; echo "$ports")"
+  qel-wire export "$1" >"$HOME/exported.pcapng"
+  tshark -r "$HOME/exported.pcapng" -o protobuf.preload_protos:TRUE -o protobuf.pbf_as_hf:TRUE "${@:2}" 2>/dev/null
+}
 
 # capture FILE [PORT]: makes one of a connection's pieces on standard input, a packet of each line.
 capture() { packets "$1" "45000,${2:-40000}"; }
@@ -125,11 +142,57 @@ whole() {
 @test "its page shows what happens" {
   cp chat.pcap "$BATS_TEST_TMPDIR"
   cd "$BATS_TEST_TMPDIR" || exit
+  bash -euc "$ports"
+  session session.pcapng <"$SOURCE/qel-wire/tests/session"
   awk '/^```/ { on = $0 == "```console"; next } on' "$SOURCE/docs/wireshark.md" >page.txt
   grep '^\$ ' page.txt | while IFS= read -r line; do
     printf '%s\n' "$line"
     bash -c "${line#\$ }" 2>errors
   done | grep . | diff page.txt -
+}
+
+@test "without the plug-in, Wireshark shows a session's messages, fields, times and directions" {
+  session session.pcapng <"$SOURCE/qel-wire/tests/session"
+  plain_shark session.pcapng -T fields -E separator=' ' -e frame.time_epoch -e frame.p2p_dir -e _ws.col.Source \
+    -e protobuf.message.name -e pbf.ChatMessageParam.chatMsg -e pbf.Result.code -e pbf.ChannelAuthRequest.accessToken |
+    sed 's/ *$//' >shown
+  diff - shown <<'end'
+1795428000.123456789 0 10.0.0.1 ChatRequest,ChatMessageParam hi
+1795428001.123456789 0 10.0.0.1 CurrentTimeRequest
+1795428002.123456789 1 10.0.0.2 ChatReply,Result  0
+1795428003.123456789 0 10.0.0.1 ReadMessageRequest
+1795428004.123456789 1 10.0.0.2 ClientEcho
+1795428005.123456789 0 10.0.0.1 ClientEchoReply
+1795428006.123456789 1 10.0.0.2 CurrentTimeReply,Result  1001
+1795428008.123456789 0 10.0.0.1 ChannelAuthRequest   ********
+1795428009.123456789 1 10.0.0.2 ChannelAuthReply,Result  0
+end
+}
+
+@test "without the plug-in, Wireshark shows each message of the schema by its name, in both directions" {
+  sed -nE 's/^message (\w+) .*/\1/p' "$SOURCE/proto-lib/msgspec_frontend.proto" >names
+  sed 's/.*/> & 1 -/; p; s/>/</' names | session session.pcapng
+  plain_shark session.pcapng -T fields -e _ws.col.Protocol | sed 's/^PB(//; s/)$//' | diff <(sed p names) -
+}
+
+# text_of SIZE: the record of a message with requestId 7, and behind that a text of so many bytes.
+text_of() {
+  # shellcheck disable=SC2183
+  printf 'requestId: 7 chatMessageParams { chatMsg: "%0*d" }' "$1" | qel-wire encode ChatRequest | hex | sed 's/^/> ChatRequest 1 /'
+}
+
+@test "without the plug-in, Wireshark shows a large message whole, and the beginning of a larger one" {
+  text_of 260000 | session session.pcapng
+  [ "$(plain_shark session.pcapng -T fields -e pbf.ChatMessageParam.chatMsg | tr -d '\n' | wc -c)" -eq 260000 ]
+  text_of 262111 | session session.pcapng # with 33 bytes before it, as much as a packet has
+  plain_shark session.pcapng -T fields -e pbf.ChatRequest.requestId -e frame.comment >shown
+  diff shown - <<<$'7\tmessage 1, sent, written, 262121 bytes, of which 262088 are there'
+}
+
+@test "without the plug-in, Wireshark shows the beginning of a message that was not recorded whole" {
+  text_of 100 | sed -E 's/(30){20}$/ 20/' | session session.pcapng
+  plain_shark session.pcapng -T fields -e pbf.ChatRequest.requestId -e frame.comment >shown
+  diff shown - <<<$'7\tmessage 1, sent, written, 106 bytes, of which 86 are there'
 }
 
 @test "the access token is shown, as its page says" {

@@ -235,7 +235,16 @@ Reader CaseRun::reader() const {
 
 Json CaseRun::outputs() const {
   Reader shows = reader();
-  return call_.outputs(&shows);
+  return comparable(call_.outputs(&shows));
+}
+
+// If the recorder stands before the library, a requestId is written when the call returns.
+Json CaseRun::comparable(Json outputs) const {
+  static const bool is_recorded = std::getenv("QEL_TRACE_FILE") != nullptr;
+  if (is_recorded && !has_returned_) {
+    outputs.erase("requestId");
+  }
+  return outputs;
 }
 
 void CaseRun::store(const std::string& path, const Json& value) {
@@ -253,7 +262,7 @@ void CaseRun::apply(const Step& step) {
 
 void CaseRun::compare_outputs(const std::string& when) {
   const Json got = outputs();
-  if (got != model_) {
+  if (got != comparable(model_)) {
     problem(when + ", the outputs hold\n  " + got.dump() + "\ninstead of\n  " + model_.dump());
   }
 }
@@ -384,11 +393,11 @@ bool CaseRun::on_new() {
   const bool fills_anywhere =
       next_ > 0 && std::none_of(course_.steps.begin(), course_.steps.end(),
                                 [](const Step& step) { return step.kind == Step::kNews; });
-  bool fits = fills_anywhere && got == model_;
+  bool fits = fills_anywhere && got == comparable(model_);
   for (size_t i = next_; i < course_.steps.size() && !fits; ++i) {
     const Step& step = course_.steps[i];
     if (step.kind == Step::kNews) {
-      fits = got == model_;
+      fits = got == comparable(model_);
       has_copied_ = has_copied_ || (fits && step.is_copy());
     } else if (step.kind == Step::kWrite) {
       apply(step);
@@ -500,6 +509,7 @@ void CaseRun::execute() {
     try {
       status = invocation();
       is_called_ = false;
+      has_returned_ = true;
     } catch (const std::exception& exception) {
       is_called_ = false;
       thrown = exception.what();

@@ -83,6 +83,7 @@ class CaseRun : public Observer {
 
   std::string function() const { return case_.at("call"); }
   Json outputs() const;
+  Json comparable(Json outputs) const;
   void set_model(const Json& model) { model_ = model; }
   bool owns_blocks() const { return !blocks_.empty(); }
   void problem(const std::string& text);
@@ -116,6 +117,7 @@ class CaseRun : public Observer {
   size_t next_ = 0;                       // step
   Json model_;                            // of the outputs
   bool is_called_ = false;
+  bool has_returned_ = false;
   int news_ = 0;
   bool has_copied_ = false;
   std::optional<Json> thrown_at_;  // the outputs when operator new refused
