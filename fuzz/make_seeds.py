@@ -36,20 +36,8 @@ def capture(data):
     return file
 
 
-def block(kind, body):
-    """A block of pcapng."""
-    body += bytes(-len(body) % 4)
-    length = struct.pack("<I", len(body) + 12)
-    return struct.pack("<I", kind) + length + body + length
-
-
-def session(name, message):
-    """A recorded session with a message that was received, and sent."""
-    file = block(0x0A0D0D0A, struct.pack("<IHHq", 0x1A2B3C4D, 1, 0, -1)) + block(1, struct.pack("<HHI", 147, 0, 0))
-    for number in 1, 2:
-        data = b"qel\1" + struct.pack("<IBBH", number, 3 - number, 1, len(name)) + name.encode() + message
-        file += block(6, struct.pack("<IIIII", 0, 0, 0, len(data), len(data)) + data)
-    return file
+def session_file(lines, *size):
+    return subprocess.run([SESSION_FILE, "/dev/stdout", *size], input=lines, check=True, stdout=subprocess.PIPE).stdout
 
 
 def main():
@@ -64,20 +52,21 @@ def main():
     for number, case in enumerate(contract["cases"]):
         if "received" in case and case["call"] in contract["messages"]:
             seed(case["call"], number, bytes.fromhex(case["received"]["bytes"]))
+    said = b""
     for number, message in enumerate(schema.messages(schema_folder)):
         name = message.DESCRIPTOR.name
         encoded = schema.fill(message).SerializeToString(deterministic=True)
         seed("round_trip", name, bytes([number]) + encoded)  # the first byte chooses the message
         seed("testkit", name, bytes([number]) + encoded)
-        seed("testkit", f"{name}_session", session(name, encoded))
+        said += f"< {name} 1 {encoded.hex()}\n> {name} 1 {encoded.hex()}\n".encode()
         seed("qel_wire", name, bytes([number]) + encoded)
         seed("qel_wire", f"{name}_unusual", bytes([number]) + UNUSUAL)
         seed("qel_wire_input", f"{name}_run", encoded * 2)
         seed("qel_wire_input", f"{name}_frames", 2 * (len(encoded).to_bytes(4, "big") + encoded))
         seed("qel_wire_input", f"{name}_example", bytes([len(name)]) + name.encode() + len(encoded).to_bytes(4, "big") + encoded)
         seed("qel_wire_input", f"{name}_pcap", capture(encoded))
-    session = subprocess.run([SESSION_FILE, "/dev/stdout", "1024"], input=SAID, check=True, stdout=subprocess.PIPE).stdout
-    seed("qel_wire_input", "session", session)
+    seed("testkit", "session", session_file(said))
+    seed("qel_wire_input", "session", session_file(SAID, "1024"))
     data = bytes(range(32)) + b"ab cd 12"
     for command in ("xxd", "xxd -i", "xxd -p", "hexdump -C", "hexdump", "od", "od -tx1z", "od -c", "base64"):
         dump = subprocess.run(command.split(), input=data, check=True, stdout=subprocess.PIPE).stdout
