@@ -177,19 +177,17 @@ static size_t secrets_of(const char* token, secret_t* secrets) {
 }
 
 static void remember(const char* token) {
-  const size_t size = strlen(token);
+  const size_t size = strnlen(token, LONGEST_TOKEN);
   const size_t place = recorder.login_count % TOKENS;
-  char* const kept = recorder.tokens[place];
-  for (size_t i = 0; i < TOKENS; ++i) {
+  bool is_known = size < SHORTEST_TOKEN;
+  for (size_t i = 0; i < TOKENS && !is_known; ++i) {
     const secret_t known = recorder.secrets[i];
-    if (known.size == size && memcmp(known.bytes, token, size) == 0) {
-      return;
-    }
+    is_known = known.size == size && memcmp(known.bytes, token, size) == 0;
   }
-  if (size >= SHORTEST_TOKEN) {
-    recorder.secrets[place].bytes = kept;
-    recorder.secrets[place].size = size < LONGEST_TOKEN ? size : LONGEST_TOKEN;
-    memcpy(kept, token, recorder.secrets[place].size);
+  if (!is_known) {
+    memcpy(recorder.tokens[place], token, size);
+    recorder.secrets[place].bytes = recorder.tokens[place];
+    recorder.secrets[place].size = size;
     ++recorder.login_count;
   }
 }
