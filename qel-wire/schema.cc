@@ -6,6 +6,7 @@
 #include <map>
 #include <set>
 #include <sstream>
+#include <string_view>
 #include <utility>
 
 #include "msgspec_frontend.pb.h"
@@ -77,13 +78,17 @@ std::string with_coloured_names(const std::string& text, const Colours& colours)
 }
 
 struct Function {
-  const char* name;
+  std::string_view name;
   const char* message;
-  Use use;
+
+  Use use() const {
+    constexpr std::string_view kSending = "_serialize";
+    return name.substr(name.size() - kSending.size()) == kSending ? Use::kSends : Use::kReceives;
+  }
 };
 
 constexpr Function kFunctions[] = {
-#include "interface.inc"
+#include "functions.inc"
 };
 
 struct Facts {
@@ -95,7 +100,7 @@ struct Facts {
 std::vector<Facts> all_facts() {
   std::map<std::string, Use> uses;
   for (const Function& function : kFunctions) {
-    uses[function.message] = function.use;
+    uses[function.message] = function.use();
   }
   std::vector<Facts> facts(static_cast<size_t>(schema_file().message_type_count()));
   for (size_t m = 0; m < facts.size(); ++m) {
