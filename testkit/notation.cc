@@ -7,17 +7,16 @@
 #include <google/protobuf/wire_format.h>
 
 #include <algorithm>
-#include <cctype>
 #include <limits>
+
+#include "messages.h"
 
 namespace testkit {
 namespace {
 
 using google::protobuf::Descriptor;
-using google::protobuf::DescriptorPool;
 using google::protobuf::FieldDescriptor;
 using google::protobuf::Message;
-using google::protobuf::MessageFactory;
 using google::protobuf::Reflection;
 using google::protobuf::TextFormat;
 using google::protobuf::UnknownFieldSet;
@@ -189,30 +188,48 @@ class PatternParser {
 
 // ---- Comparing
 
-std::string shown(const Message& message, const FieldDescriptor& field, int index) {
-  if (field.name() == "accessToken") {
-    return kNotShown;
-  }
-  constexpr size_t kMost = 100;  // bytes of a value, which may be a long text
-  TextFormat::Printer printer;
-  printer.SetUseUtf8StringEscaping(true);
-  printer.SetSingleLineMode(true);
-  std::string text;
-  printer.PrintFieldValueToString(message, &field, index, &text);
-  if (text.size() > kMost) {
+// The beginning of a long text, without any token. It is hidden before a part of it is cut.
+std::string shortened(const std::string& text, const Secrets& secrets) {
+  constexpr size_t kMost = 100;
+  std::string result = secrets.hidden_in(text);
+  if (result.size() > kMost) {
     size_t end = kMost;
-    while ((static_cast<unsigned char>(text[end]) & 0xc0U) == 0x80) {
+    while (end > 0 && (static_cast<unsigned char>(result[end]) & 0xc0U) == 0x80) {
       --end;
     }
-    text = text.substr(0, end) + "...";
+    result = result.substr(0, end) + "...";
   }
+  return result;
+}
+
+// A value as the text form has it. Texts of a login are not shown at all, as any of them may be the
+// token.
+std::string shown(const Message& message, const FieldDescriptor& field, int index,
+                  const Secrets& secrets) {
+  TextFormat::Printer printer;
+  std::string text;
+  if (field.cpp_type() != FieldDescriptor::CPPTYPE_STRING) {
+    printer.PrintFieldValueToString(message, &field, index, &text);
+    return text;
+  }
+  if (message.GetDescriptor() == ChannelAuthRequest::descriptor()) {
+    return "(not shown)";
+  }
+  const Reflection& fields = *message.GetReflection();
+  Result of_text;
+  of_text.set_msg(shortened(field.is_repeated() ? fields.GetRepeatedString(message, &field, index)
+                                                : fields.GetString(message, &field),
+                            secrets));
+  printer.SetUseUtf8StringEscaping(true);
+  printer.PrintFieldValueToString(of_text, Result::descriptor()->FindFieldByName("msg"), -1, &text);
   return text;
 }
 
 class Comparison {
  public:
-  Comparison(const Pattern& pattern, bool is_whole, const std::set<std::string>& ignored)
-      : pattern_(pattern), is_whole_(is_whole), ignored_(ignored) {}
+  Comparison(const Pattern& pattern, const Secrets& secrets, bool is_whole,
+             const std::set<std::string>& ignored)
+      : pattern_(pattern), secrets_(secrets), is_whole_(is_whole), ignored_(ignored) {}
 
   void compare(const Message& wanted, const Message& came, const std::string& path) {
     const Descriptor& type = *wanted.GetDescriptor();
@@ -242,9 +259,10 @@ class Comparison {
     } else if (is_wanted && field.is_repeated()) {
       compare_list(wanted, came, field, name);
     } else if (is_wanted && !is_there) {
-      found.push_back(
-          name + " is missing" +
-          (field.message_type() != nullptr ? "" : ", which should be " + shown(wanted, field, -1)));
+      found.push_back(name + " is missing" +
+                      (field.message_type() != nullptr
+                           ? ""
+                           : ", which should be " + shown(wanted, field, -1, secrets_)));
     } else if (is_wanted) {
       compare_value(wanted, came, field, -1, name);
     }
@@ -274,8 +292,8 @@ class Comparison {
     TextFormat::PrintFieldValueToString(wanted, &field, index, &wanted_value);
     TextFormat::PrintFieldValueToString(came, &field, index, &value);
     if (value != wanted_value) {
-      found.push_back(name + " is " + shown(came, field, index) + " instead of " +
-                      shown(wanted, field, index));
+      found.push_back(name + " is " + shown(came, field, index, secrets_) + " instead of " +
+                      shown(wanted, field, index, secrets_));
     }
   }
 
@@ -319,6 +337,7 @@ class Comparison {
   }
 
   const Pattern& pattern_;
+  const Secrets& secrets_;
   bool is_whole_;
   const std::set<std::string>& ignored_;
 };
@@ -339,24 +358,6 @@ void make_room(const Pattern& pattern, const Message& given, Message* message) {
 }
 
 }  // namespace
-
-const Descriptor* message_type(const std::string& name) {
-  const Descriptor* type = DescriptorPool::generated_pool()->FindMessageTypeByName(name);
-  return type != nullptr && type->file()->package().empty() ? type : nullptr;
-}
-
-std::string quoted_name(const std::string& name) {
-  constexpr size_t kMost = 63;
-  const bool is_name =
-      name.size() <= kMost && std::all_of(name.begin(), name.end(), [](unsigned char c) {
-        return std::isalnum(c) != 0 || c == '_';
-      });
-  return is_name ? "'" + name + "'" : "of other characters";
-}
-
-std::unique_ptr<Message> new_message(const Descriptor& type) {
-  return std::unique_ptr<Message>(MessageFactory::generated_factory()->GetPrototype(&type)->New());
-}
 
 // ---- Tokens
 
@@ -431,9 +432,10 @@ Pattern pattern_of(const Message& message) {
   return pattern;
 }
 
-std::vector<std::string> differences(const Pattern& pattern, const Message& message, bool is_whole,
+std::vector<std::string> differences(const Pattern& pattern, const Message& message,
+                                     const Secrets& secrets, bool is_whole,
                                      const std::set<std::string>& ignored) {
-  Comparison comparison(pattern, is_whole, ignored);
+  Comparison comparison(pattern, secrets, is_whole, ignored);
   comparison.compare(*pattern.fields, message, "");
   return comparison.found;
 }

@@ -16,6 +16,8 @@
 #include <utility>
 #include <vector>
 
+#include "report.h"
+
 namespace testkit {
 
 // In a text. Both count from 1.
@@ -29,15 +31,6 @@ struct Misread {
   Place place;
   std::string reason;
 };
-
-// Null if the schema has none.
-const google::protobuf::Descriptor* message_type(const std::string& name);
-// What stands for an access token, which is a credential.
-constexpr char kNotShown[] = "(not shown)";
-// A name for a report: in quotes, or what it is instead if it is none, and may be anything.
-std::string quoted_name(const std::string& name);
-// An empty message. The type is one that is linked.
-std::unique_ptr<google::protobuf::Message> new_message(const google::protobuf::Descriptor& type);
 
 // A message with some fields, and others of which only that much is known. Numbers outside their
 // enumeration are unknown fields, as they are in a message that was received.
@@ -90,7 +83,7 @@ Pattern pattern_of(const google::protobuf::Message& message);
 // are not compared.
 std::vector<std::string> differences(const Pattern& pattern,
                                      const google::protobuf::Message& message,
-                                     bool is_whole = false,
+                                     const Secrets& secrets, bool is_whole = false,
                                      const std::set<std::string>& ignored = {});
 
 // Gives the message the fields of the pattern instead of its own: lists are replaced as a whole,

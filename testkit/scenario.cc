@@ -1,16 +1,11 @@
 #include "scenario.h"
 
+#include "messages.h"
+
 namespace testkit {
 namespace {
 
 using google::protobuf::Descriptor;
-
-constexpr char kReply[] = "Reply";
-constexpr char kRequest[] = "Request";
-
-bool ends_with(const std::string& text, const std::string& end) {
-  return text.size() >= end.size() && text.compare(text.size() - end.size(), end.size(), end) == 0;
-}
 
 class Parser {
  public:
@@ -175,18 +170,6 @@ class Parser {
 
 void parse_scenario(const std::string& text, Scenario* scenario) {
   Parser(text, scenario).parse();
-}
-
-bool is_reply(const Descriptor& type) {
-  return ends_with(type.name(), kReply);
-}
-
-const Descriptor* reply_type(const Descriptor& type) {
-  std::string name = type.name();
-  if (ends_with(name, kRequest)) {
-    name.resize(name.size() - (sizeof kRequest - 1));
-  }
-  return message_type(name + kReply);
 }
 
 }  // namespace testkit

@@ -38,11 +38,6 @@ struct Statement {
   bool has_answer = false;
   // Of an expectation, and of kAtMost: for how many milliseconds, or negative if for ever.
   int64_t within = -1;
-  // Of a session that is replayed: the message must be the same, and what is delivered has these
-  // bytes.
-  bool is_replayed = false;
-  std::string bytes;
-
   int most = 0;  // of kAtMost
 };
 
@@ -53,11 +48,6 @@ struct Scenario {
 
 // Adds what the text says; what it says of the world replaces what was there. Throws Misread.
 void parse_scenario(const std::string& text, Scenario* scenario);
-
-// The type of the message that answers one of this type, or null.
-const google::protobuf::Descriptor* reply_type(const google::protobuf::Descriptor& type);
-
-bool is_reply(const google::protobuf::Descriptor& type);
 
 }  // namespace testkit
 

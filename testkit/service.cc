@@ -4,8 +4,7 @@
 
 #include <algorithm>
 
-#include "notation.h"
-#include "scenario.h"
+#include "messages.h"
 
 namespace testkit {
 namespace {

@@ -38,7 +38,7 @@ class Service {
   std::vector<std::string> unanswered() const;
 
   // Time passes.
-  void wait(int64_t milliseconds) { now_ += milliseconds; }
+  void set_time(int64_t milliseconds) { now_ = world_.clockmillis() + milliseconds; }
 
  private:
   bool require(bool holds, const std::string& otherwise);

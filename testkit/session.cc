@@ -4,6 +4,9 @@
 #include <cstring>
 #include <map>
 
+#include "messages.h"
+#include "report.h"
+
 namespace testkit {
 namespace {
 
@@ -18,14 +21,6 @@ constexpr uint32_t kLinkType = 147;
 constexpr size_t kHead = 12;
 enum Direction { kSent = 1, kReceived = 2 };
 constexpr unsigned kRefused = 2;
-
-// The message of each function of the C interface.
-const std::map<std::string, std::string>& messages_of_functions() {
-  static const auto* const kMessages = new std::map<std::string, std::string>{
-#include "functions.inc"
-  };
-  return *kMessages;
-}
 
 uint32_t number(std::string_view bytes, size_t at, size_t size, bool is_big_endian) {
   uint32_t result = 0;
@@ -124,30 +119,29 @@ const google::protobuf::Descriptor& type_of(const std::string& name, const std::
   return *type;
 }
 
-Statement statement_of(const Record& record, const std::string& where) {
-  Statement statement{};
-  statement.kind = record.direction == kSent ? Statement::kExpect : Statement::kPush;
-  statement.where = where;
-  statement.is_replayed = true;
-  statement.type = &type_of(record.name, where);
-  statement.bytes = std::string(record.bytes);
+Step step_of(const Record& record, const std::string& where) {
+  Step step{record.direction == kSent,
+            where,
+            &type_of(record.name, where),
+            std::string(record.bytes),
+            {}};
   if (record.is_cut) {
     throw Unreadable{where + " has a message that was cut off"};
   }
-  if (record.direction == kSent) {
-    const auto message = new_message(*statement.type);
-    if (!message->ParseFromString(statement.bytes)) {
-      throw Unreadable{where + " has no " + statement.type->name()};
+  if (step.was_sent) {
+    const auto message = new_message(*step.type);
+    if (!message->ParseFromString(step.bytes)) {
+      throw Unreadable{where + " has no " + step.type->name()};
     }
-    statement.pattern = pattern_of(*message);
+    step.message = pattern_of(*message);
   }
-  return statement;
+  return step;
 }
 
 }  // namespace
 
-std::vector<Statement> read_session(std::string_view bytes) {
-  std::vector<Statement> statements;
+std::vector<Step> read_session(std::string_view bytes) {
+  std::vector<Step> steps;
   uint32_t last = 0;
   for (const auto& [number, record] : Reader(bytes).read()) {
     const std::string where = "record " + std::to_string(number);
@@ -161,10 +155,10 @@ std::vector<Statement> read_session(std::string_view bytes) {
     const bool was_sent =
         record.direction == kReceived || (record.end != kRefused && !record.bytes.empty());
     if (was_sent) {
-      statements.push_back(statement_of(record, where));
+      steps.push_back(step_of(record, where));
     }
   }
-  return statements;
+  return steps;
 }
 
 }  // namespace testkit

@@ -1,4 +1,4 @@
-// A recorded session as a scenario.
+// A recorded session.
 #ifndef TESTKIT_SESSION_H
 #define TESTKIT_SESSION_H
 
@@ -6,7 +6,7 @@
 #include <string_view>
 #include <vector>
 
-#include "scenario.h"
+#include "notation.h"
 
 namespace testkit {
 
@@ -15,9 +15,18 @@ struct Unreadable {
   std::string reason;
 };
 
-// What the plug-in sent as expectations, and what it received as pushes. A file that is cut off
-// ends with its last whole record.
-std::vector<Statement> read_session(std::string_view bytes);
+// A message that was sent by the plug-in, or received.
+struct Step {
+  bool was_sent;
+  std::string where;  // "record 3"
+  const google::protobuf::Descriptor* type;
+  std::string bytes;
+  Pattern message;  // if it was sent
+};
+
+// What the plug-in sent and received, in that order. A file that is cut off ends with its last
+// whole record.
+std::vector<Step> read_session(std::string_view bytes);
 
 }  // namespace testkit
 

@@ -12,12 +12,14 @@
 
 #include "kit.h"
 #include "qel-testkit.h"
-#include "session.h"
+#include "replay.h"
+#include "scenario.h"
 
 struct qel_testkit {
-  std::optional<testkit::Kit> kit;  // none if there is nothing that it could play
-  std::string failure;              // why
-  testkit::Delivery delivery;       // the last
+  std::unique_ptr<testkit::Player> player;  // none if there is nothing that it could play
+  std::string failure;                      // why
+  testkit::Delivery delivery;               // the last
+  mutable std::string report;               // the last
 };
 
 namespace {
@@ -48,11 +50,11 @@ template <typename Use>
 void use(qel_testkit_t* kit, const Use& use) {
   const google::protobuf::LogSilencer silence;  // of texts that are no UTF-8
   try {
-    if (kit->kit.has_value()) {
-      use(&*kit->kit);
+    if (kit->player != nullptr) {
+      use(kit->player.get());
     }
   } catch (const std::exception&) {
-    kit->kit.reset();
+    kit->player.reset();
     kit->failure = "Out of memory.\n";  // in the string itself
   }
 }
@@ -61,7 +63,7 @@ void use(qel_testkit_t* kit, const Use& use) {
 
 qel_testkit_t* qel_testkit_new(const char* scenario) {
   return make_kit([scenario](qel_testkit_t* result) {
-    result->kit.emplace(std::string(scenario != nullptr ? scenario : ""));
+    result->player = std::make_unique<testkit::Kit>(scenario != nullptr ? scenario : "");
   });
 }
 
@@ -74,7 +76,8 @@ qel_testkit_t* qel_testkit_new_replay(const unsigned char* session, size_t size,
       names.insert(word);
     }
     const std::string_view bytes(reinterpret_cast<const char*>(session), size);
-    result->kit.emplace(testkit::read_session(bytes), std::move(names));
+    result->player =
+        std::make_unique<testkit::Replay>(testkit::read_session(bytes), std::move(names));
   });
 }
 
@@ -84,7 +87,7 @@ void qel_testkit_release(qel_testkit_t* kit) {
 
 void qel_testkit_sent(qel_testkit_t* kit, const char* message, const unsigned char* data,
                       int size) {
-  use(kit, [message, data, size](testkit::Kit* player) {
+  use(kit, [message, data, size](testkit::Player* player) {
     const bool is_empty = data == nullptr || size <= 0;
     player->sent(message, is_empty ? std::string()
                                    : std::string(reinterpret_cast<const char*>(data),
@@ -94,7 +97,7 @@ void qel_testkit_sent(qel_testkit_t* kit, const char* message, const unsigned ch
 
 bool qel_testkit_next(qel_testkit_t* kit, qel_testkit_delivery_t* delivery) {
   *delivery = {nullptr, nullptr, 0, -1};
-  use(kit, [kit, delivery](testkit::Kit* player) {
+  use(kit, [kit, delivery](testkit::Player* player) {
     if (auto next = player->next()) {
       kit->delivery = std::move(*next);
       *delivery = {kit->delivery.name.c_str(),
@@ -108,14 +111,21 @@ bool qel_testkit_next(qel_testkit_t* kit, qel_testkit_delivery_t* delivery) {
 }
 
 void qel_testkit_wait(qel_testkit_t* kit, int64_t milliseconds) {
-  use(kit, [milliseconds](testkit::Kit* player) { player->wait(milliseconds); });
+  use(kit, [milliseconds](testkit::Player* player) { player->wait(milliseconds); });
 }
 
 bool qel_testkit_end(qel_testkit_t* kit) {
-  use(kit, [](testkit::Kit* player) { player->end(); });
+  use(kit, [](testkit::Player* player) { player->end(); });
   return *qel_testkit_report(kit) == '\0';
 }
 
 const char* qel_testkit_report(const qel_testkit_t* kit) {
-  return kit->kit.has_value() ? kit->kit->report().c_str() : kit->failure.c_str();
+  try {
+    if (kit->player != nullptr) {
+      kit->report = kit->player->report();
+    }
+  } catch (const std::bad_alloc&) {
+    return "Out of memory.\n";
+  }
+  return kit->player != nullptr ? kit->report.c_str() : kit->failure.c_str();
 }

@@ -263,15 +263,15 @@ const Difference kDifferences[] = {
     {"LongText", "chatMsg: 'a'",
      "chatMsg: "
      "'0123456789012345678901234567890123456789012345678901234567890123456789012345678901234567890"
-     "123456789'",
+     "1234567890'",
      "chatMsg is "
-     "\"01234567890123456789012345678901234567890123456789012345678901234567890123456789012345678"
-     "9012345678... instead of \"a\""},
+     "\"0123456789012345678901234567890123456789012345678901234567890123456789012345678901234567890"
+     "123456789...\" instead of \"a\""},
     {"Enumeration", "msgType: MEDIA", "msgType: TEXT", "msgType is TEXT instead of MEDIA"},
     {"NumberOfNoMember", "msgType: 77", "msgType: TEXT", "msgType is not the expected one"},
     {"UnknownField", "99: 'x'", "", "the unknown field 99 is not the expected one"},
     {"AbsentValue", "msgId: 7", "", "msgId is missing, which should be 7"},
-    {"AbsentField", "msgId", "", "msgId is missing"},
+    {"AbsentField", "chatMsg", "", "chatMsg is missing"},
     {"FieldThatShouldNotBe", "!msgId", "msgId: 0", "msgId should not be there"},
     {"Several", "msgId: 7 chatMsg", "msgId: 8", "msgId is 8 instead of 7; chatMsg is missing"},
 };

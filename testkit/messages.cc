@@ -1,0 +1,68 @@
+#include "messages.h"
+
+#include <algorithm>
+
+namespace testkit {
+namespace {
+
+using google::protobuf::Descriptor;
+using google::protobuf::DescriptorPool;
+using google::protobuf::MessageFactory;
+
+constexpr char kReply[] = "Reply";
+constexpr char kRequest[] = "Request";
+constexpr char kDeserialize[] = "_deserialize";
+
+bool ends_with(const std::string& text, const std::string& end) {
+  return text.size() >= end.size() && text.compare(text.size() - end.size(), end.size(), end) == 0;
+}
+
+}  // namespace
+
+const Descriptor* message_type(const std::string& name) {
+  const Descriptor* type = DescriptorPool::generated_pool()->FindMessageTypeByName(name);
+  return type != nullptr && type->file()->package().empty() ? type : nullptr;
+}
+
+std::unique_ptr<google::protobuf::Message> new_message(const Descriptor& type) {
+  return std::unique_ptr<google::protobuf::Message>(
+      MessageFactory::generated_factory()->GetPrototype(&type)->New());
+}
+
+const std::map<std::string, std::string>& messages_of_functions() {
+  static const auto* const kMessages = new std::map<std::string, std::string>{
+#include "functions.inc"
+  };
+  return *kMessages;
+}
+
+bool is_reply(const Descriptor& type) {
+  return ends_with(type.name(), kReply);
+}
+
+const Descriptor* reply_type(const Descriptor& type) {
+  std::string name = type.name();
+  if (ends_with(name, kRequest)) {
+    name.resize(name.size() - (sizeof kRequest - 1));
+  }
+  return message_type(name + kReply);
+}
+
+bool is_push(const Descriptor& type) {
+  const auto& functions = messages_of_functions();
+  return !is_reply(type) &&
+         std::any_of(functions.begin(), functions.end(), [&type](const auto& function) {
+           return function.second == type.name() && ends_with(function.first, kDeserialize);
+         });
+}
+
+bool is_from_plugin(const Descriptor& type) {
+  if (is_reply(type)) {
+    const std::string& name = type.name();
+    const Descriptor* push = message_type(name.substr(0, name.size() - (sizeof kReply - 1)));
+    return push != nullptr && is_push(*push);
+  }
+  return &type == IsTyping::descriptor() || (reply_type(type) != nullptr && !is_push(type));
+}
+
+}  // namespace testkit

@@ -1,0 +1,38 @@
+// The messages of the schema, and who sends them.
+#ifndef TESTKIT_MESSAGES_H
+#define TESTKIT_MESSAGES_H
+
+#include <google/protobuf/descriptor.h>
+#include <google/protobuf/message.h>
+
+#include <map>
+#include <memory>
+#include <string>
+
+#include "msgspec_frontend.pb.h"
+
+namespace testkit {
+
+// Null if the schema has none of that name.
+const google::protobuf::Descriptor* message_type(const std::string& name);
+
+// An empty message. The type is one that is linked.
+std::unique_ptr<google::protobuf::Message> new_message(const google::protobuf::Descriptor& type);
+
+// The message of each function of the C interface.
+const std::map<std::string, std::string>& messages_of_functions();
+
+bool is_reply(const google::protobuf::Descriptor& type);
+
+// The type of the message that answers one of this type, or null.
+const google::protobuf::Descriptor* reply_type(const google::protobuf::Descriptor& type);
+
+// Whether the service sends it of its own accord, and a plug-in takes it.
+bool is_push(const google::protobuf::Descriptor& type);
+
+// Whether a plug-in sends it: a request, or the answer to a push.
+bool is_from_plugin(const google::protobuf::Descriptor& type);
+
+}  // namespace testkit
+
+#endif

@@ -1,0 +1,76 @@
+// What went wrong, said in sentences that never have an access token.
+#ifndef TESTKIT_REPORT_H
+#define TESTKIT_REPORT_H
+
+#include <google/protobuf/descriptor.h>
+
+#include <set>
+#include <string>
+#include <vector>
+
+namespace testkit {
+
+// The texts that are not to be shown, wherever they stand.
+class Secrets {
+ public:
+  // Of an access token. A text of fewer than 8 bytes may be a part of any sentence, and is shown.
+  void add(const std::string& token);
+  // The text with something else in the place of each token.
+  std::string hidden_in(std::string text) const;
+
+ private:
+  std::set<std::string> tokens_;
+};
+
+// A number of the plug-in's messages, and what it is.
+struct Subject {
+  int number;
+  const google::protobuf::Descriptor* type;
+};
+
+class Report {
+ public:
+  void add(const std::string& sentence);
+  // The reasons may be none: then nothing is wrong. Those that were said of this message are not
+  // said again, and a message that is wrong as one before it is only counted.
+  void add(const Subject& subject, const std::string& what,
+           const std::vector<std::string>& reasons);
+  // Of something that was said before, and is wrong again.
+  void add_another() { ++complaints_; }
+
+  // A plug-in in an endless loop comes to an end after so many.
+  bool is_full() const { return complaints_ >= kMost; }
+  // One sentence in each line.
+  std::string text() const;
+
+  Secrets secrets;
+
+ private:
+  static constexpr int kMost = 20;
+
+  struct Line {
+    std::string sentence;
+    std::string kind;  // what it has in common with others, or empty
+    int others = 0;    // of that kind, which came later
+  };
+
+  void put(Line line);
+
+  std::vector<Line> lines_;
+  int complaints_ = 0;
+  int subject_ = 0;  // the last
+  std::set<std::string> said_of_subject_;
+};
+
+// "a ChatRequest"
+std::string with_article(const std::string& name);
+
+// The same text with a capital at its beginning.
+std::string with_capital(std::string text);
+
+// In quotes, or what it is instead if it is no name, and may be anything.
+std::string quoted_name(const std::string& name);
+
+}  // namespace testkit
+
+#endif
