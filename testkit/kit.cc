@@ -1,6 +1,7 @@
 #include "kit.h"
 
 #include <algorithm>
+#include <limits>
 #include <utility>
 
 #include "messages.h"
@@ -27,138 +28,173 @@ void take_over(const char* name, const Message& request, const Pattern& pattern,
 }  // namespace
 
 Kit::Kit(const std::string& scenario) {
-  parse_scenario(kServiceScenario, &scenario_);
-  for (Statement& statement : scenario_.statements) {
-    statement.where.clear();
+  Scenario of_service;
+  parse_scenario(kServiceScenario, &of_service);
+  std::vector<Pattern> required;
+  for (Statement& statement : of_service.script) {
+    required.push_back(std::move(std::get<Always>(statement.what).pattern));
   }
+  scenario_.world = of_service.world;
   parse_scenario(scenario, &scenario_);
   wrong().secrets.add(scenario_.world.accesstoken());
-  service_.emplace(scenario_.world);
+  service_.emplace(scenario_.world, std::move(required));
+  next_ = scenario_.script.begin();
   play();
-}
-
-void Kit::check_rules(const Message& message) {
-  std::vector<std::string> reasons = service_->complaints();
-  for (Rule& rule : rules_) {
-    const Statement& statement = *rule.statement;
-    const bool is_over = statement.within >= 0 && now() - rule.since > statement.within;
-    if (statement.type != message.GetDescriptor() || is_over) {
-      continue;
-    }
-    const auto found = differences(statement.pattern, message, wrong().secrets);
-    if (statement.kind == Statement::kAtMost) {
-      count(message, found.empty(), &rule);
-    } else if (statement.where.empty()) {
-      reasons.insert(reasons.end(), found.begin(), found.end());
-    } else {
-      wrong().add(subject(message), "is not what " + statement.where + " requires", found);
-    }
-  }
-  wrong().add(subject(message), "is wrong", reasons);
-}
-
-// Of many that are too many, the first is enough.
-void Kit::count(const Message& message, bool is_counted, Rule* rule) {
-  rule->count += is_counted ? 1 : 0;
-  if (is_counted && rule->count == rule->statement->most + 1) {
-    wrong().add(subject(message), "is one too many",
-                {rule->statement->where + " allows " + std::to_string(rule->statement->most)});
-  } else if (is_counted && rule->count > rule->statement->most) {
-    wrong().add_another();
-  }
 }
 
 // ---- What the plug-in sends
 
 void Kit::take(const Message& message) {
   Messages said = service_->take(message);
+  wrong().add(subject(message), "is wrong", service_->complaints());
   check_rules(message);
   meet(message, std::move(said));
   play();
 }
 
-const Statement* Kit::expected() const {
-  return position_ < scenario_.statements.size() ? &scenario_.statements[position_] : nullptr;
+void Kit::check_rules(const Message& message) {
+  for (Rule& rule : rules_) {
+    if (const auto* always = std::get_if<Always>(&rule.statement->what)) {
+      if (&always->pattern.type() == message.GetDescriptor()) {
+        wrong().add(subject(message), "is not what " + rule.statement->where + " requires",
+                    differences(always->pattern, message, wrong().secrets));
+      }
+    } else {
+      count(message, std::get<AtMost>(rule.statement->what), &rule);
+    }
+  }
 }
 
+// Of many that are too many, the first is enough.
+void Kit::count(const Message& message, const AtMost& most, Rule* rule) {
+  const bool is_over = most.within != kNoLimit && now() - rule->since > most.within;
+  if (is_over || &most.pattern.type() != message.GetDescriptor() ||
+      !differences(most.pattern, message, wrong().secrets).empty()) {
+    return;
+  }
+  ++rule->count;
+  if (rule->count == most.count + 1) {
+    wrong().add(subject(message), "is one too many",
+                {rule->statement->where + " allows " + std::to_string(most.count)});
+  } else if (rule->count > most.count) {
+    wrong().add_another();
+  }
+}
+
+std::string Kit::expectations() const {
+  std::string text;
+  for (const Expected& expected : expected_) {
+    text += (text.empty() ? "" : ", ") + *expected.where + " expects " +
+            with_article(expected.expect->pattern.type().name());
+  }
+  return text;
+}
+
+// Of several that the message may be, it is the first that it fits, or else the first.
 void Kit::meet(const Message& message, Messages said) {
-  const Statement* statement = expected();
-  if (statement == nullptr || statement->type != message.GetDescriptor()) {
+  auto found = expected_.end();
+  std::vector<std::string> wrong_with_it;
+  for (auto it = expected_.begin(); it != expected_.end(); ++it) {
+    if (&it->expect->pattern.type() != message.GetDescriptor()) {
+      continue;
+    }
+    auto differing = differences(it->expect->pattern, message, wrong().secrets);
+    if (found == expected_.end() || differing.empty()) {
+      found = it;
+      wrong_with_it = std::move(differing);
+    }
+    if (wrong_with_it.empty()) {
+      break;
+    }
+  }
+  if (found == expected_.end()) {
     if (is_strict_) {
       wrong().add(subject(message), "is not expected",
-                  {statement == nullptr
-                       ? "the scenario is over"
-                       : statement->where + " expects " + with_article(statement->type->name())});
+                  {expected_.empty() ? "the scenario is over" : expectations()});
     }
     deliver_all(said, {});
     return;
   }
-  wrong().add(subject(message), "is not what " + statement->where + " expects",
-              differences(statement->pattern, message, wrong().secrets));
-  ++position_;
+  const Expected met = *found;
+  expected_.erase(found);
+  wrong().add(subject(message), "is not what " + *met.where + " expects", wrong_with_it);
   waiting_since_ = now();
-  was_late_ = false;
-  if (!statement->has_answer) {
+  if (scenario_.answered.count(met.expect->number) > 0) {
+    asked_[met.expect->number] = {copy_of(message), std::move(said)};
+  } else {
     deliver_all(said, {});
-    return;
   }
-  request_.reset(message.New());
-  request_->CopyFrom(message);
-  said_ = std::move(said);
+  play(met.next, met.end);
 }
 
 // ---- What it receives
 
 // Up to the next statement that waits for the plug-in.
 void Kit::play() {
-  for (const Statement* statement = expected();
-       statement != nullptr && statement->kind != Statement::kExpect; statement = expected()) {
-    switch (statement->kind) {
-      case Statement::kExpect:
-        break;
-      case Statement::kAnswer:
-        answer(*statement);
-        break;
-      case Statement::kPush:
-        push(*statement);
-        break;
-      case Statement::kAtMost:
-      case Statement::kAlways:
-        rules_.push_back({statement, now(), 0});
-        break;
-      case Statement::kStrict:
-        is_strict_ = true;
-        break;
+  const auto end = scenario_.script.end();
+  while (expected_.empty() && next_ != end) {
+    const Statement& statement = *next_++;
+    if (const auto* any_order = std::get_if<AnyOrder>(&statement.what)) {
+      for (const Script& script : any_order->scripts) {
+        expect(script.front(), script.begin() + 1, script.end());
+      }
+    } else if (std::holds_alternative<Expect>(statement.what)) {
+      expect(statement, end, end);
+    } else {
+      play(next_ - 1, next_);
     }
-    ++position_;
   }
 }
 
-void Kit::answer(const Statement& statement) {
+void Kit::expect(const Statement& first, Script::const_iterator next, Script::const_iterator end) {
+  expected_.push_back({&std::get<Expect>(first.what), &first.where, next, end});
+}
+
+void Kit::play(Script::const_iterator begin, Script::const_iterator end) {
+  for (auto it = begin; it != end; ++it) {
+    if (const auto* answer = std::get_if<Answer>(&it->what)) {
+      this->answer(*answer);
+    } else if (const auto* push = std::get_if<Push>(&it->what)) {
+      this->push(*push);
+    } else if (std::holds_alternative<Strict>(it->what)) {
+      is_strict_ = true;
+    } else {
+      rules_.push_back({&*it, now(), 0});
+    }
+  }
+}
+
+void Kit::answer(const Answer& statement) {
+  const auto asked = asked_.find(statement.request);
+  if (asked == asked_.end()) {
+    wrong().add(with_capital(statement.faults.where) + " answers a request that did not come yet.");
+    return;
+  }
+  const auto& [request, said] = asked->second;
   const Pattern& pattern = statement.pattern;
-  if (statement.type != nullptr) {
-    const auto message = new_message(*statement.type);
+  if (statement.is_another) {
+    const auto message = new_message(pattern.type());
     put(pattern, message.get());
-    take_over("requestId", *request_, pattern, message.get());
-    take_over("chatroomId", *request_, pattern, message.get());
+    take_over("requestId", *request, pattern, message.get());
+    take_over("chatroomId", *request, pattern, message.get());
     deliver(*message, statement.faults);
     return;
   }
-  if (pattern.fields == nullptr || said_.empty()) {
-    deliver_all(said_, statement.faults);
-    return;
+  const Messages messages = copies_of(said);
+  if (pattern.fields != nullptr && !messages.empty()) {
+    put(pattern, messages.front().get());
   }
-  std::unique_ptr<Message> own(said_.front()->New());  // also for another answer
-  own->CopyFrom(*said_.front());
-  put(pattern, said_.front().get());
-  deliver_all(said_, statement.faults);
-  said_.front() = std::move(own);
+  deliver_all(messages, statement.faults);
 }
 
-void Kit::push(const Statement& statement) {
-  const auto message = new_message(*statement.type);
-  const FieldDescriptor* id = statement.type->FindFieldByName("requestId");
+void Kit::push(const Push& statement) {
+  if (!service_->is_signed_in()) {
+    too_early_.push_back(&statement);
+    return;
+  }
   const Pattern& pattern = statement.pattern;
+  const auto message = new_message(pattern.type());
+  const FieldDescriptor* id = pattern.type().FindFieldByName("requestId");
   service_->number(message.get());
   if (id != nullptr && pattern.absent.count({pattern.fields.get(), id}) > 0) {
     message->GetReflection()->ClearField(message.get(), id);
@@ -177,32 +213,39 @@ void Kit::deliver_all(const Messages& messages, const Faults& faults) {
 
 void Kit::deliver(const Message& message, const Faults& faults) {
   Sent sent{{message.GetDescriptor()->name(), message.SerializeAsString()},
-            now() + faults.after,
-            nullptr};
-  Delivery& delivery = sent.delivery;
-  bool is_broken = !faults.name.empty();
-  if (is_broken) {
-    delivery.name = faults.name;
+            now() + std::min(faults.after, std::numeric_limits<int64_t>::max() - now()),
+            false};
+  sent.is_broken = break_as(faults, &sent.delivery);
+  const int copies = faults.is_twice ? 2 : 1;
+  for (int i = 0; i < copies && !faults.is_dropped; ++i) {
+    put_in_line(sent, faults.is_swapped);
   }
-  if (faults.cut_at >= 0 && static_cast<size_t>(faults.cut_at) < delivery.bytes.size()) {
-    delivery.bytes.resize(static_cast<size_t>(faults.cut_at));
-    is_broken = true;
+}
+
+// Whether it is another one now. Complains of what changes nothing.
+bool Kit::break_as(const Faults& faults, Delivery* delivery) {
+  const auto size = static_cast<int>(delivery->bytes.size());
+  std::vector<std::string> useless;
+  if (faults.cut_at >= size) {
+    useless.push_back("cuts it at " + std::to_string(faults.cut_at));
+  } else if (faults.cut_at >= 0) {
+    delivery->bytes.resize(static_cast<size_t>(faults.cut_at));
   }
-  if (faults.corrupt_byte >= 0 &&
-      static_cast<size_t>(faults.corrupt_byte) < delivery.bytes.size()) {
-    char& byte = delivery.bytes[static_cast<size_t>(faults.corrupt_byte)];
+  if (faults.corrupt_byte >= static_cast<int>(delivery->bytes.size())) {
+    useless.push_back("corrupts the byte " + std::to_string(faults.corrupt_byte));
+  } else if (faults.corrupt_byte >= 0) {
+    char& byte = delivery->bytes[static_cast<size_t>(faults.corrupt_byte)];
     byte = static_cast<char>(~static_cast<unsigned char>(byte));
-    is_broken = true;
   }
-  if (!is_broken) {
-    sent.message.reset(message.New());
-    sent.message->CopyFrom(message);
+  if (faults.name == delivery->name) {
+    useless.push_back("delivers it under its own name");
   }
-  if (!faults.is_dropped) {
-    for (int i = 0; i < (faults.is_twice ? 2 : 1); ++i) {
-      put_in_line(sent, faults.is_swapped);
-    }
+  for (const std::string& fault : useless) {
+    wrong().add(with_capital(faults.where) + " delivers " + with_article(delivery->name) + " of " +
+                std::to_string(size) + " bytes, and " + fault + ", which changes nothing.");
   }
+  delivery->name = faults.name.empty() ? delivery->name : faults.name;
+  return faults.cut_at >= 0 || faults.corrupt_byte >= 0 || !faults.name.empty();
 }
 
 void Kit::put_in_line(Sent sent, bool is_swapped) {
@@ -226,43 +269,53 @@ std::optional<Delivery> Kit::next_due() {
   if (line_.empty() || line_.front().due > now()) {
     return std::nullopt;
   }
-  const Sent sent = std::move(line_.front());
+  Sent sent = std::move(line_.front());
   line_.pop_front();
-  if (sent.message != nullptr) {
-    service_->note_delivery(*sent.message);
-  } else {
-    service_->note_broken_delivery(sent.delivery.name);
+  waiting_since_ = now();
+  service_->note_delivery(sent.delivery.name, sent.delivery.bytes, !sent.is_broken);
+  if (service_->is_signed_in()) {
+    for (const Push* statement : std::exchange(too_early_, {})) {
+      push(*statement);
+    }
   }
-  return sent.delivery;
+  return std::move(sent.delivery);
 }
 
 // ---- Time
 
+// What the plug-in has not received yet, it cannot answer.
 void Kit::time_passed() {
   service_->set_time(now());
-  const Statement* statement = expected();
-  if (statement != nullptr && statement->within >= 0 && !was_late_ &&
-      now() - waiting_since_ > statement->within) {
-    was_late_ = true;
-    wrong().add("No " + statement->type->name() + " came within " +
-                std::to_string(statement->within) + " ms, as " + statement->where + " expects.");
+  for (Expected& expected : expected_) {
+    const int64_t within = expected.expect->within;
+    if (within != kNoLimit && line_.empty() && !expected.is_late &&
+        now() - waiting_since_ > within) {
+      expected.is_late = true;
+      wrong().add("No " + expected.expect->pattern.type().name() + " came within " +
+                  std::to_string(within) + " ms, as " + *expected.where + " expects.");
+    }
   }
 }
 
 void Kit::finish() {
-  if (const Statement* statement = expected()) {
-    wrong().add(with_capital(statement->where) + " expects " +
-                with_article(statement->type->name()) + ", which never came.");
+  for (const Expected& expected : expected_) {
+    wrong().add(with_capital(*expected.where) + " expects " +
+                with_article(expected.expect->pattern.type().name()) + ", which never came.");
   }
   if (held_back_.has_value()) {
     wrong().add(with_capital(with_article(held_back_->delivery.name)) +
                 " was to be swapped with the next message, but none came.");
   }
   for (const Sent& sent : line_) {
-    if (sent.due > now()) {
-      wrong().add(with_capital(with_article(sent.delivery.name)) + " was due " +
-                  std::to_string(sent.due - now()) + " ms later, but the test was over.");
-    }
+    const std::string name = with_capital(with_article(sent.delivery.name));
+    wrong().add(sent.due > now() ? name + " was due " + std::to_string(sent.due - now()) +
+                                       " ms later, but the test was over."
+                                 : name + " was due, but the test did not take it.");
+  }
+  for (const Push* statement : too_early_) {
+    wrong().add(with_capital(statement->faults.where) + " pushes " +
+                with_article(statement->pattern.type().name()) +
+                ", but the plug-in did not sign in.");
   }
   for (const std::string& sentence : service_->unanswered()) {
     wrong().add(sentence);

@@ -6,8 +6,10 @@
 
 #include <cstdint>
 #include <deque>
+#include <map>
 #include <memory>
 #include <optional>
+#include <set>
 #include <string>
 #include <vector>
 
@@ -23,7 +25,22 @@ class Kit : public Player {
   explicit Kit(const std::string& scenario);
 
  private:
-  // A statement that holds from now on.
+  // An expectation that may be met now, and what follows when it is.
+  struct Expected {
+    const Expect* expect;
+    const std::string* where;
+    Script::const_iterator next;
+    Script::const_iterator end;
+    bool is_late = false;
+  };
+
+  // A request whose answers are statements, and what the service says to it.
+  struct Asked {
+    std::unique_ptr<google::protobuf::Message> request;
+    Messages said;
+  };
+
+  // Holds from some statement on.
   struct Rule {
     const Statement* statement;
     int64_t since;
@@ -34,8 +51,7 @@ class Kit : public Player {
   struct Sent {
     Delivery delivery;
     int64_t due;  // when, on the kit's clock
-    // What the plug-in has to answer, if it comes to it as it should.
-    std::shared_ptr<google::protobuf::Message> message;
+    bool is_broken;
   };
 
   void take(const google::protobuf::Message& message) override;
@@ -45,28 +61,30 @@ class Kit : public Player {
   void finish() override;
 
   void play();
+  void play(Script::const_iterator begin, Script::const_iterator end);
+  void expect(const Statement& first, Script::const_iterator next, Script::const_iterator end);
   void meet(const google::protobuf::Message& message, Messages said);
-  void count(const google::protobuf::Message& message, bool is_counted, Rule* rule);
+  std::string expectations() const;
   void check_rules(const google::protobuf::Message& message);
-  const Statement* expected() const;
-  void answer(const Statement& statement);
-  void push(const Statement& statement);
+  void count(const google::protobuf::Message& message, const AtMost& most, Rule* rule);
+  void answer(const Answer& statement);
+  void push(const Push& statement);
   void deliver(const google::protobuf::Message& message, const Faults& faults);
   void deliver_all(const Messages& messages, const Faults& faults);
+  bool break_as(const Faults& faults, Delivery* delivery);
   void put_in_line(Sent sent, bool is_swapped);
 
   Scenario scenario_;
   std::optional<Service> service_;
-  size_t position_ = 0;  // of the statement that waits
+  Script::const_iterator next_;     // of the statements that were not played yet
+  std::vector<Expected> expected_;  // each of them is to be met
   int64_t waiting_since_ = 0;
-  bool was_late_ = false;  // of the statement that waits
   bool is_strict_ = false;
   std::vector<Rule> rules_;
-  // The request that was expected last, and what the service says to it.
-  std::unique_ptr<google::protobuf::Message> request_;
-  Messages said_;
-  std::deque<Sent> line_;          // in the order of their times
-  std::optional<Sent> held_back_;  // until the next one
+  std::map<int, Asked> asked_;          // by the number of the expectation
+  std::vector<const Push*> too_early_;  // until the plug-in has signed in
+  std::deque<Sent> line_;               // in the order of their times
+  std::optional<Sent> held_back_;       // until the next one
 };
 
 }  // namespace testkit

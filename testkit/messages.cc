@@ -29,6 +29,20 @@ std::unique_ptr<google::protobuf::Message> new_message(const Descriptor& type) {
       MessageFactory::generated_factory()->GetPrototype(&type)->New());
 }
 
+std::unique_ptr<google::protobuf::Message> copy_of(const google::protobuf::Message& message) {
+  std::unique_ptr<google::protobuf::Message> copy(message.New());
+  copy->CopyFrom(message);
+  return copy;
+}
+
+Messages copies_of(const Messages& messages) {
+  Messages copies;
+  for (const auto& message : messages) {
+    copies.push_back(copy_of(*message));
+  }
+  return copies;
+}
+
 const std::map<std::string, std::string>& messages_of_functions() {
   static const auto* const kMessages = new std::map<std::string, std::string>{
 #include "functions.inc"

@@ -8,6 +8,7 @@
 #include <map>
 #include <memory>
 #include <string>
+#include <vector>
 
 #include "msgspec_frontend.pb.h"
 
@@ -18,6 +19,24 @@ const google::protobuf::Descriptor* message_type(const std::string& name);
 
 // An empty message. The type is one that is linked.
 std::unique_ptr<google::protobuf::Message> new_message(const google::protobuf::Descriptor& type);
+
+using Messages = std::vector<std::unique_ptr<google::protobuf::Message>>;
+
+std::unique_ptr<google::protobuf::Message> copy_of(const google::protobuf::Message& message);
+Messages copies_of(const Messages& messages);
+
+// Hands the message to the function if it is of one of the types, and as that type.
+template <typename... Types, typename Function>
+void visit(const google::protobuf::Message& message, const Function& function) {
+  const auto is_visited = [&message, &function](const auto* of_type) {
+    of_type = dynamic_cast<decltype(of_type)>(&message);
+    if (of_type != nullptr) {
+      function(*of_type);
+    }
+    return of_type != nullptr;
+  };
+  static_cast<void>((is_visited(static_cast<const Types*>(nullptr)) || ...));
+}
 
 // The message of each function of the C interface.
 const std::map<std::string, std::string>& messages_of_functions();

@@ -19,6 +19,7 @@ using google::protobuf::FieldDescriptor;
 using google::protobuf::Message;
 using google::protobuf::Reflection;
 using google::protobuf::TextFormat;
+using google::protobuf::UnknownField;
 using google::protobuf::UnknownFieldSet;
 using google::protobuf::io::Tokenizer;
 
@@ -63,9 +64,12 @@ class PatternParser {
     tokens_.expect("{");
     while (!tokens_.take("}")) {
       if (tokens_.take("!")) {
-        pattern_.absent.emplace(message, &field_of(*message));
+        const Place place = tokens_.place();
+        const FieldDescriptor& field = field_of(*message);
+        require_new(*message, field, place);
+        pattern_.absent.emplace(message, &field);
       } else if (tokens_.is_at(Tokenizer::TYPE_INTEGER)) {
-        unknown(message->GetReflection()->MutableUnknownFields(message));
+        unknown(message->GetDescriptor(), message->GetReflection()->MutableUnknownFields(message));
       } else {
         known(message);
       }
@@ -79,7 +83,7 @@ class PatternParser {
   const FieldDescriptor& field_of(const Message& message) {
     const Descriptor& type = *message.GetDescriptor();
     const Place place = tokens_.place();
-    const std::string name = tokens_.name("expected the name of a field");
+    const std::string name = tokens_.name("expected the name of a field, or '}'");
     const FieldDescriptor* field = type.FindFieldByName(name);
     if (field == nullptr) {
       throw Misread{place, type.name() + " has no field '" + name + "'"};
@@ -87,24 +91,38 @@ class PatternParser {
     return *field;
   }
 
+  void require_new(const Message& message, const FieldDescriptor& field, const Place& place) const {
+    const Pattern::Field key{&message, &field};
+    if (is_filled(message, field) || pattern_.present.count(key) > 0 ||
+        pattern_.absent.count(key) > 0) {
+      throw Misread{place, "the field '" + field.name() + "' is there twice"};
+    }
+  }
+
   void known(Message* message) {
     const Place place = tokens_.place();
     const FieldDescriptor& field = field_of(*message);
+    if (!field.is_repeated() || !is_filled(*message, field)) {
+      require_new(*message, field, place);
+    }
     const bool has_colon = tokens_.take(":");
     if (!has_colon && !tokens_.is_at("{")) {
       pattern_.present.emplace(message, &field);
-      return;
-    }
-    if (!field.is_repeated() && is_filled(*message, field)) {
-      throw Misread{place, "the field '" + field.name() + "' is there twice"};
-    }
-    if (!field.is_repeated() || !tokens_.take("[")) {
+    } else if (field.is_repeated() && tokens_.take("[")) {
+      list(message, field);
+    } else {
       value(message, field);
-      return;
     }
+  }
+
+  // An empty one is a field that is not there.
+  void list(Message* message, const FieldDescriptor& field) {
     while (!tokens_.take("]")) {
       value(message, field);
       tokens_.take(",");
+    }
+    if (!is_filled(*message, field)) {
+      pattern_.absent.emplace(message, &field);
     }
   }
 
@@ -149,11 +167,18 @@ class PatternParser {
     }
   }
 
-  void unknown(UnknownFieldSet* fields) {
+  // The type is that of the message around it, or null if the schema does not have that either.
+  void unknown(const Descriptor* type, UnknownFieldSet* fields) {
     const Place place = tokens_.place();
-    const int field = tokens_.number("expected the number of a field");
-    if (field < 1) {
-      throw Misread{place, "fields have numbers from 1"};
+    const int number = tokens_.number("expected the number of a field");
+    if (number < 1 || number > FieldDescriptor::kMaxNumber) {
+      throw Misread{place, "fields have numbers from 1 to " +
+                               std::to_string(int{FieldDescriptor::kMaxNumber})};
+    }
+    const FieldDescriptor* known = type == nullptr ? nullptr : type->FindFieldByNumber(number);
+    if (known != nullptr) {
+      throw Misread{place, "the field " + std::to_string(number) + " is known: write its name, '" +
+                               known->name() + "'"};
     }
     if (!tokens_.take(":")) {
       UnknownFieldSet inner;
@@ -162,22 +187,22 @@ class PatternParser {
       }
       tokens_.expect("{");
       while (!tokens_.take("}")) {
-        unknown(&inner);
+        unknown(nullptr, &inner);
         tokens_.take(",");
       }
       --depth_;
-      fields->AddLengthDelimited(field, bytes_of(inner));
+      fields->AddLengthDelimited(number, bytes_of(inner));
     } else if (tokens_.is_at(Tokenizer::TYPE_STRING)) {
-      Tokenizer::ParseString(tokens_.take(), fields->AddLengthDelimited(field));
+      Tokenizer::ParseString(tokens_.take(), fields->AddLengthDelimited(number));
     } else {
       google::protobuf::uint64 value = 0;
       const bool is_negative = tokens_.take("-");
       if (!tokens_.is_at(Tokenizer::TYPE_INTEGER) ||
           !Tokenizer::ParseInteger(tokens_.take(), std::numeric_limits<uint64_t>::max(), &value)) {
-        throw Misread{place, "the value of the field " + std::to_string(field) +
+        throw Misread{place, "the value of the field " + std::to_string(number) +
                                  " is no number, no text and no message"};
       }
-      fields->AddVarint(field, is_negative ? 0 - value : value);
+      fields->AddVarint(number, is_negative ? 0 - value : value);
     }
   }
 
@@ -202,27 +227,77 @@ std::string shortened(const std::string& text, const Secrets& secrets) {
   return result;
 }
 
+std::string quoted(const std::string& text, const Secrets& secrets) {
+  Result of_text;  // the runtime prints values of fields alone
+  of_text.set_msg(shortened(text, secrets));
+  TextFormat::Printer printer;
+  printer.SetUseUtf8StringEscaping(true);
+  std::string result;
+  printer.PrintFieldValueToString(of_text, Result::descriptor()->FindFieldByName("msg"), -1,
+                                  &result);
+  return result;
+}
+
 // A value as the text form has it. Texts of a login are not shown at all, as any of them may be the
 // token.
 std::string shown(const Message& message, const FieldDescriptor& field, int index,
                   const Secrets& secrets) {
-  TextFormat::Printer printer;
   std::string text;
   if (field.cpp_type() != FieldDescriptor::CPPTYPE_STRING) {
-    printer.PrintFieldValueToString(message, &field, index, &text);
+    TextFormat::PrintFieldValueToString(message, &field, index, &text);
     return text;
   }
   if (message.GetDescriptor() == ChannelAuthRequest::descriptor()) {
     return "(not shown)";
   }
   const Reflection& fields = *message.GetReflection();
-  Result of_text;
-  of_text.set_msg(shortened(field.is_repeated() ? fields.GetRepeatedString(message, &field, index)
-                                                : fields.GetString(message, &field),
-                            secrets));
-  printer.SetUseUtf8StringEscaping(true);
-  printer.PrintFieldValueToString(of_text, Result::descriptor()->FindFieldByName("msg"), -1, &text);
-  return text;
+  return quoted(field.is_repeated() ? fields.GetRepeatedString(message, &field, index)
+                                    : fields.GetString(message, &field),
+                secrets);
+}
+
+std::string shown(const UnknownField& field, const Secrets& secrets) {
+  switch (field.type()) {
+    case UnknownField::TYPE_VARINT:
+      return std::to_string(static_cast<int64_t>(field.varint()));
+    case UnknownField::TYPE_LENGTH_DELIMITED:
+      return quoted(field.length_delimited(), secrets);
+    default:
+      return "of another kind";
+  }
+}
+
+using UnknownFields = std::vector<UnknownField>;  // which are in a message
+
+UnknownFields unknown_under(const Message& message, int number) {
+  const UnknownFieldSet& fields = message.GetReflection()->GetUnknownFields(message);
+  UnknownFields result;
+  for (int i = 0; i < fields.field_count(); ++i) {
+    if (fields.field(i).number() == number) {
+      result.push_back(fields.field(i));
+    }
+  }
+  return result;
+}
+
+std::string bytes_of(const UnknownFields& fields) {
+  UnknownFieldSet set;
+  for (const UnknownField& field : fields) {
+    set.AddField(field);
+  }
+  return bytes_of(set);
+}
+
+// Those that the schema does not have.
+std::set<int> unknown_numbers(const Message& message) {
+  const UnknownFieldSet& fields = message.GetReflection()->GetUnknownFields(message);
+  std::set<int> numbers;
+  for (int i = 0; i < fields.field_count(); ++i) {
+    if (message.GetDescriptor()->FindFieldByNumber(fields.field(i).number()) == nullptr) {
+      numbers.insert(fields.field(i).number());
+    }
+  }
+  return numbers;
 }
 
 class Comparison {
@@ -238,17 +313,29 @@ class Comparison {
         compare_field(wanted, came, *type.field(i), path + type.field(i)->name());
       }
     }
-    compare_unknown(wanted.GetReflection()->GetUnknownFields(wanted),
-                    came.GetReflection()->GetUnknownFields(came), type, path);
+    const std::set<int> all_wanted = unknown_numbers(wanted);
+    for (const int number : all_wanted) {
+      compare_unknown(wanted, came, number, path + name_of(number));
+    }
+    for (const int number : unknown_numbers(came)) {
+      if (is_whole_ && all_wanted.count(number) == 0) {
+        found.push_back(path + name_of(number) + " should not be there");
+      }
+    }
   }
 
   std::vector<std::string> found;
 
  private:
+  static std::string name_of(int unknown) { return "the unknown field " + std::to_string(unknown); }
+
+  // A number of no member of an enumeration is an unknown field, but it is there.
   void compare_field(const Message& wanted, const Message& came, const FieldDescriptor& field,
                      const std::string& name) {
-    const bool is_there = is_filled(came, field);
-    const bool is_wanted = is_filled(wanted, field);
+    const bool is_odd = !unknown_under(came, field.number()).empty();
+    const bool is_odd_wanted = !unknown_under(wanted, field.number()).empty();
+    const bool is_there = is_odd || is_filled(came, field);
+    const bool is_wanted = is_odd_wanted || is_filled(wanted, field);
     const bool is_any = pattern_.present.count({&wanted, &field}) > 0;
     const bool is_unwanted =
         pattern_.absent.count({&wanted, &field}) > 0 || (is_whole_ && !is_wanted && !is_any);
@@ -258,13 +345,23 @@ class Comparison {
       found.push_back(name + " is missing");
     } else if (is_wanted && field.is_repeated()) {
       compare_list(wanted, came, field, name);
+    } else if (is_wanted && field.message_type() != nullptr) {
+      compare_message(wanted, came, field, name);
+    } else if (is_odd || is_odd_wanted) {
+      compare_unknown(wanted, came, field.number(), name);
     } else if (is_wanted && !is_there) {
-      found.push_back(name + " is missing" +
-                      (field.message_type() != nullptr
-                           ? ""
-                           : ", which should be " + shown(wanted, field, -1, secrets_)));
+      found.push_back(name + " is missing, which should be " + shown(wanted, field, -1, secrets_));
     } else if (is_wanted) {
       compare_value(wanted, came, field, -1, name);
+    }
+  }
+
+  void compare_message(const Message& wanted, const Message& came, const FieldDescriptor& field,
+                       const std::string& name) {
+    if (is_filled(came, field)) {
+      compare(message_in(wanted, field, -1), message_in(came, field, -1), name + ".");
+    } else {
+      found.push_back(name + " is missing");
     }
   }
 
@@ -277,16 +374,17 @@ class Comparison {
                       std::to_string(wanted_count));
     }
     for (int i = 0; i < std::min(count, wanted_count); ++i) {
-      compare_value(wanted, came, field, i, name + "[" + std::to_string(i) + "]");
+      const std::string element = name + "[" + std::to_string(i) + "]";
+      if (field.message_type() != nullptr) {
+        compare(message_in(wanted, field, i), message_in(came, field, i), element + ".");
+      } else {
+        compare_value(wanted, came, field, i, element);
+      }
     }
   }
 
   void compare_value(const Message& wanted, const Message& came, const FieldDescriptor& field,
                      int index, const std::string& name) {
-    if (field.message_type() != nullptr) {
-      compare(message_in(wanted, field, index), message_in(came, field, index), name + ".");
-      return;
-    }
     std::string wanted_value;
     std::string value;
     TextFormat::PrintFieldValueToString(wanted, &field, index, &wanted_value);
@@ -304,36 +402,29 @@ class Comparison {
                      : fields.GetRepeatedMessage(message, &field, index);
   }
 
-  // Each alone, as bytes.
-  static std::set<std::pair<int, std::string>> each(const UnknownFieldSet& fields) {
-    std::set<std::pair<int, std::string>> result;
-    for (int i = 0; i < fields.field_count(); ++i) {
-      UnknownFieldSet one;
-      one.AddField(fields.field(i));
-      result.emplace(fields.field(i).number(), bytes_of(one));
+  void compare_unknown(const Message& wanted, const Message& came, int number,
+                       const std::string& name) {
+    if (bytes_of(unknown_under(wanted, number)) == bytes_of(unknown_under(came, number))) {
+      return;
     }
-    return result;
+    const std::string values = all_shown(came, number);
+    found.push_back(
+        name +
+        (values.empty() ? " is missing, which should be " : " is " + values + " instead of ") +
+        all_shown(wanted, number));
   }
 
-  void compare_unknown(const UnknownFieldSet& wanted, const UnknownFieldSet& came,
-                       const Descriptor& type, const std::string& path) {
-    const auto all_wanted = each(wanted);
-    const auto all = each(came);
-    for (const auto& field : all_wanted) {
-      if (all.count(field) == 0) {
-        found.push_back(path + unknown_name(type, field.first) + " is not the expected one");
-      }
+  // The values of that number, of its field and of those that the schema does not have.
+  std::string all_shown(const Message& message, int number) const {
+    std::string values;
+    const FieldDescriptor* known = message.GetDescriptor()->FindFieldByNumber(number);
+    if (known != nullptr && is_filled(message, *known)) {
+      values = shown(message, *known, -1, secrets_);
     }
-    for (const auto& field : all) {
-      if (is_whole_ && all_wanted.count(field) == 0) {
-        found.push_back(path + unknown_name(type, field.first) + " should not be there");
-      }
+    for (const UnknownField& field : unknown_under(message, number)) {
+      values += (values.empty() ? "" : ", ") + shown(field, secrets_);
     }
-  }
-
-  static std::string unknown_name(const Descriptor& type, int number) {
-    const FieldDescriptor* field = type.FindFieldByNumber(number);
-    return field != nullptr ? field->name() : "the unknown field " + std::to_string(number);
+    return values;
   }
 
   const Pattern& pattern_;
@@ -361,8 +452,20 @@ void make_room(const Pattern& pattern, const Message& given, Message* message) {
 
 // ---- Tokens
 
-Tokens::Tokens(const std::string& text)
-    : input_(text.data(), static_cast<int>(text.size())), tokens_(&input_, this) {
+namespace {
+
+// Editors of some systems put a byte order mark before a text.
+std::string_view without_mark(std::string_view text) {
+  constexpr std::string_view kMark = "\xef\xbb\xbf";
+  return text.substr(text.substr(0, kMark.size()) == kMark ? kMark.size() : 0);
+}
+
+}  // namespace
+
+Tokens::Tokens(std::string_view text)
+    : text_(without_mark(text)),
+      input_(text_.data(), static_cast<int>(text_.size())),
+      tokens_(&input_, this) {
   tokens_.set_comment_style(Tokenizer::SH_COMMENT_STYLE);
   tokens_.set_require_space_after_number(false);  // "5s"
   tokens_.Next();
@@ -395,10 +498,12 @@ std::string Tokens::name(const char* what) {
   return take();
 }
 
+// Decimal, as 010 would be 8 otherwise.
 int Tokens::number(const char* what) {
+  const std::string& digits = token().text;
   google::protobuf::uint64 value = 0;
-  if (!is_at(Tokenizer::TYPE_INTEGER) ||
-      !Tokenizer::ParseInteger(token().text, std::numeric_limits<int>::max(), &value)) {
+  if (!is_at(Tokenizer::TYPE_INTEGER) || (digits.size() > 1 && digits[0] == '0') ||
+      !Tokenizer::ParseInteger(digits, std::numeric_limits<int>::max(), &value)) {
     fail(what);
   }
   tokens_.Next();
@@ -418,9 +523,10 @@ void Tokens::AddError(int line, int column, const std::string& reason) {
 
 // ---- Patterns
 
+Pattern::Pattern(const Descriptor& type) : fields(new_message(type)) {}
+
 Pattern parse_pattern(const Descriptor& type, Tokens* tokens) {
-  Pattern pattern;
-  pattern.fields = new_message(type);
+  Pattern pattern(type);
   PatternParser(tokens, &pattern).fields(pattern.fields.get());
   return pattern;
 }

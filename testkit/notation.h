@@ -1,6 +1,6 @@
 // Messages as scenarios write them: the text form of Protocol Buffers, and in it
 //   NAME           the field is there, whatever its value
-//   !NAME          the field is not there
+//   !NAME          the field is not there; NAME: [] is the same of a list
 //   NUMBER: VALUE  a field that the schema does not have; NUMBER { ... } if it is a message
 // A number of an enumeration need not be one of its members.
 #ifndef TESTKIT_NOTATION_H
@@ -13,6 +13,7 @@
 #include <memory>
 #include <set>
 #include <string>
+#include <string_view>
 #include <utility>
 #include <vector>
 
@@ -39,6 +40,11 @@ struct Pattern {
   using Field =
       std::pair<const google::protobuf::Message*, const google::protobuf::FieldDescriptor*>;
 
+  Pattern() = default;
+  // Any message of that type.
+  explicit Pattern(const google::protobuf::Descriptor& type);
+  const google::protobuf::Descriptor& type() const { return *fields->GetDescriptor(); }
+
   std::unique_ptr<google::protobuf::Message> fields;
   std::set<Field> present;
   std::set<Field> absent;
@@ -47,7 +53,8 @@ struct Pattern {
 // The words, numbers, texts and signs of a scenario.
 class Tokens : private google::protobuf::io::ErrorCollector {
  public:
-  explicit Tokens(const std::string& text);
+  // The text has to stay. It is not longer than an int can count.
+  explicit Tokens(std::string_view text);
 
   bool is_at_end() { return is_at(google::protobuf::io::Tokenizer::TYPE_END); }
   bool is_at(google::protobuf::io::Tokenizer::TokenType type) { return token().type == type; }
@@ -69,6 +76,7 @@ class Tokens : private google::protobuf::io::ErrorCollector {
   void AddError(int line, int column, const std::string& reason) override;
   const google::protobuf::io::Tokenizer::Token& token() { return tokens_.current(); }
 
+  std::string_view text_;
   google::protobuf::io::ArrayInputStream input_;
   google::protobuf::io::Tokenizer tokens_;
 };

@@ -42,15 +42,20 @@ std::string Secrets::hidden_in(std::string text) const {
   return text;
 }
 
-void Report::put(Line line) {
+void Report::put(const std::string& sentence, const std::string& kind) {
+  const auto same = std::find_if(lines_.begin(), lines_.end(),
+                                 [&kind](const Line& line) { return line.kind == kind; });
   ++complaints_;
-  if (complaints_ < kMost) {
-    lines_.push_back(std::move(line));
+  if (same != lines_.end()) {
+    ++same->others;
+  } else if (complaints_ < kMost) {
+    lines_.push_back({sentence, kind, 0});
   }
 }
 
 void Report::add(const std::string& sentence) {
-  put({secrets.hidden_in(sentence), "", 0});
+  const std::string shown = secrets.hidden_in(sentence);
+  put(shown, shown);
 }
 
 void Report::add(const Subject& subject, const std::string& what,
@@ -70,14 +75,7 @@ void Report::add(const Subject& subject, const std::string& what,
   }
   const std::string kind =
       with_article(subject.type->name()) + ", " + what + ": " + secrets.hidden_in(joined(news));
-  const auto same = std::find_if(lines_.begin(), lines_.end(),
-                                 [&kind](const Line& line) { return line.kind == kind; });
-  if (same != lines_.end()) {
-    ++complaints_;
-    ++same->others;
-  } else {
-    put({"Message " + std::to_string(subject.number) + " of the plug-in, " + kind + ".", kind, 0});
-  }
+  put("Message " + std::to_string(subject.number) + " of the plug-in, " + kind + ".", kind);
 }
 
 std::string Report::text() const {
@@ -85,10 +83,8 @@ std::string Report::text() const {
   for (const Line& line : lines_) {
     text += line.sentence;
     if (line.others > 0) {
-      text += " So " +
-              (line.others == 1 ? std::string("is 1 more")
-                                : "are " + std::to_string(line.others) + " more") +
-              ".";
+      text += " And " + std::to_string(line.others) +
+              (line.others == 1 ? " more time." : " more times.");
     }
     text += "\n";
   }

@@ -30,9 +30,10 @@ struct Subject {
 
 class Report {
  public:
+  // What was said before is only counted.
   void add(const std::string& sentence);
   // The reasons may be none: then nothing is wrong. Those that were said of this message are not
-  // said again, and a message that is wrong as one before it is only counted.
+  // said again.
   void add(const Subject& subject, const std::string& what,
            const std::vector<std::string>& reasons);
   // Of something that was said before, and is wrong again.
@@ -50,11 +51,11 @@ class Report {
 
   struct Line {
     std::string sentence;
-    std::string kind;  // what it has in common with others, or empty
-    int others = 0;    // of that kind, which came later
+    std::string kind;  // what it has in common with others
+    int others;        // of that kind, which came later
   };
 
-  void put(Line line);
+  void put(const std::string& sentence, const std::string& kind);
 
   std::vector<Line> lines_;
   int complaints_ = 0;

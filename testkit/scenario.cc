@@ -1,11 +1,20 @@
 #include "scenario.h"
 
+#include <limits>
+#include <map>
+#include <utility>
+
 #include "messages.h"
 
 namespace testkit {
 namespace {
 
 using google::protobuf::Descriptor;
+
+constexpr char kWords[] =
+    "expected 'expect', 'in any order', 'answer', 'push', 'at most', 'never', 'always', 'strict' "
+    "or 'world', or behind a message to deliver 'after', 'twice', 'dropped', 'swapped with the "
+    "next', 'cut at', 'corrupt byte' or 'as'";
 
 class Parser {
  public:
@@ -15,160 +24,242 @@ class Parser {
     while (!tokens_.is_at_end()) {
       if (tokens_.take("world")) {
         put(parse_pattern(*World::descriptor(), &tokens_), &scenario_.world);
+      } else if (tokens_.is_at("in")) {
+        scenario_.script.push_back(any_order());
       } else {
-        statement();
+        scenario_.script.push_back(statement());
       }
     }
   }
 
  private:
-  void statement() {
-    Statement result{};
-    const Place place = tokens_.place();
-    const std::string word = tokens_.take();
-    result.where = "line " + std::to_string(place.line);
-    if (word == "expect") {
-      result.kind = Statement::kExpect;
-      message(&result);
-      within(&result);
-      if (!is_reply(*result.type)) {
-        request_ = scenario_.statements.size();
-      }
-    } else if (word == "answer") {
-      result.kind = Statement::kAnswer;
-      answer(&result, place);
-    } else if (word == "push") {
-      result.kind = Statement::kPush;
-      message(&result);
-      require_no_bare_names(result.pattern, place);
-      faults(&result.faults);
-    } else if (word == "at") {
-      tokens_.expect("most");
-      result.kind = Statement::kAtMost;
-      result.most = tokens_.number("expected how many");
-      message(&result);
-      within(&result);
-    } else if (word == "never" || word == "always") {
-      result.kind = word == "never" ? Statement::kAtMost : Statement::kAlways;
-      message(&result);
-      if (word == "never") {
-        within(&result);
-      }
-    } else if (word == "strict") {
-      result.kind = Statement::kStrict;
-    } else {
-      throw Misread{place,
-                    "expected 'expect', 'answer', 'push', 'at most', 'never', 'always', "
-                    "'strict' or 'world', but here is '" +
-                        word + "'"};
+  Statement any_order() {
+    Statement result{where(), AnyOrder{}};
+    for (const char* word : {"in", "any", "order", "{"}) {
+      tokens_.expect(word);
     }
-    scenario_.statements.push_back(std::move(result));
+    auto& scripts = std::get<AnyOrder>(result.what).scripts;
+    while (!tokens_.take("}")) {
+      if (tokens_.is_at("expect")) {
+        scripts.emplace_back();
+      } else if (scripts.empty()) {
+        tokens_.fail("expected 'expect' or '}'");
+      }
+      scripts.back().push_back(statement());
+    }
+    return result;
+  }
+
+  Statement statement() {
+    const std::string place = where();
+    if (tokens_.take("expect")) {
+      return {place, expect()};
+    }
+    if (tokens_.is_at("answer")) {
+      return {place, answer()};
+    }
+    if (tokens_.is_at("push")) {
+      return {place, push()};
+    }
+    if (tokens_.take("at")) {
+      tokens_.expect("most");
+      return {place, at_most(tokens_.number("expected how many"))};
+    }
+    if (tokens_.take("never")) {
+      return {place, at_most(0)};
+    }
+    if (tokens_.take("always")) {
+      return {place, Always{message_of_plugin()}};
+    }
+    if (tokens_.take("strict")) {
+      return {place, Strict{}};
+    }
+    tokens_.fail(kWords);
+  }
+
+  Expect expect() {
+    Expect result;
+    result.pattern = message_of_plugin();
+    result.within = within();
+    result.number = ++expectations_;
+    if (!is_reply(result.pattern.type())) {
+      last_request_ = result.number;
+      requests_[result.number] = &result.pattern.type();
+    }
+    if (tokens_.take("called")) {
+      const Place place = tokens_.place();
+      const std::string name = tokens_.name("expected a name for the request");
+      if (!names_.emplace(name, last_request_).second || last_request_ != result.number) {
+        throw Misread{place, "the name '" + name + "' is that of another request, or of a reply"};
+      }
+    }
+    return result;
   }
 
   // The service's own, or some fields of it, or another message.
-  void answer(Statement* result, const Place& place) {
-    if (request_ == kNone) {
+  Answer answer() {
+    const Place place = tokens_.place();
+    Answer result;
+    result.faults.where = where();
+    tokens_.expect("answer");
+    result.request = tokens_.take("to") ? named_request() : last_request_;
+    if (result.request == 0) {
       throw Misread{place, "no request is expected before this answer"};
     }
-    Statement& request = scenario_.statements[request_];
-    request.has_answer = true;
-    if (tokens_.is_at("{")) {
-      result->type = reply_type(*request.type);
-      if (result->type == nullptr) {
-        tokens_.fail(request.type->name() + " has no reply, so this answer needs a name");
-      }
-      result->pattern = parse_pattern(*result->type, &tokens_);
-      result->type = nullptr;
-    } else if (tokens_.is_at_capital()) {
-      message(result);
+    scenario_.answered.insert(result.request);
+    const Descriptor& request = *requests_[result.request];
+    const Descriptor* type = reply_type(request);
+    result.is_another = tokens_.is_at_capital();
+    if (result.is_another) {
+      result.pattern = message();
+    } else if (tokens_.is_at("{") && type == nullptr) {
+      tokens_.fail(request.name() + " has no reply, so this answer needs a name");
+    } else if (tokens_.is_at("{")) {
+      result.pattern = parse_pattern(*type, &tokens_);
     }
-    require_no_bare_names(result->pattern, place);
-    faults(&result->faults);
+    require_deliverable(result.pattern, place);
+    faults(&result.faults);
+    return result;
   }
 
-  const Descriptor* message_name() {
+  int named_request() {
+    const Place place = tokens_.place();
+    const std::string name = tokens_.name("expected the name of a request");
+    const auto found = names_.find(name);
+    if (found == names_.end()) {
+      throw Misread{place, "no request before is called '" + name + "'"};
+    }
+    return found->second;
+  }
+
+  Push push() {
+    const Place place = tokens_.place();
+    Push result;
+    result.faults.where = where();
+    tokens_.expect("push");
+    result.pattern = message();
+    require_deliverable(result.pattern, place);
+    faults(&result.faults);
+    return result;
+  }
+
+  AtMost at_most(int count) {
+    AtMost result{count, message_of_plugin(), kNoLimit};
+    result.within = within();
+    return result;
+  }
+
+  const Descriptor& message_name() {
     const Place place = tokens_.place();
     const std::string name = tokens_.name("expected the name of a message");
     const Descriptor* type = message_type(name);
     if (type == nullptr) {
       throw Misread{place, "there is no message '" + name + "'"};
     }
-    return type;
+    return *type;
   }
 
-  void message(Statement* result) {
-    result->type = message_name();
-    if (tokens_.is_at("{")) {
-      result->pattern = parse_pattern(*result->type, &tokens_);
-    } else {
-      result->pattern.fields = new_message(*result->type);
+  Pattern message() {
+    const Descriptor& type = message_name();
+    return tokens_.is_at("{") ? parse_pattern(type, &tokens_) : Pattern(type);
+  }
+
+  Pattern message_of_plugin() {
+    const Place place = tokens_.place();
+    Pattern result = message();
+    if (!is_from_plugin(result.type())) {
+      throw Misread{place, "a plug-in does not send '" + result.type().name() + "'"};
     }
+    return result;
   }
 
-  static void require_no_bare_names(const Pattern& pattern, const Place& place) {
+  static void require_deliverable(const Pattern& pattern, const Place& place) {
     if (!pattern.present.empty()) {
       throw Misread{place, "the field '" + pattern.present.begin()->second->name() +
                                "' of a message to deliver needs a value"};
     }
+    if (pattern.fields != nullptr && is_from_plugin(pattern.type())) {
+      throw Misread{place, "the service does not send '" + pattern.type().name() + "'"};
+    }
   }
 
   void faults(Faults* result) {
-    while (fault(result)) {
+    std::set<std::string> words;
+    for (Place place = tokens_.place(); is_at_fault(); place = tokens_.place()) {
+      const std::string word = tokens_.take();
+      if (!words.insert(word).second) {
+        throw Misread{place, "'" + word + "' is there twice"};
+      }
+      fault(word, result);
+      if (words.count("dropped") > 0 && words.size() > 1) {
+        throw Misread{place, "nothing else can happen to a message that is dropped"};
+      }
     }
   }
 
-  bool fault(Faults* result) {
-    if (tokens_.take("after")) {
+  bool is_at_fault() {
+    for (const char* word : {"after", "twice", "dropped", "swapped", "cut", "corrupt", "as"}) {
+      if (tokens_.is_at(word)) {
+        return true;
+      }
+    }
+    return false;
+  }
+
+  void fault(const std::string& word, Faults* result) {
+    if (word == "after") {
       result->after = time();
-    } else if (tokens_.take("twice")) {
+    } else if (word == "twice") {
       result->is_twice = true;
-    } else if (tokens_.take("dropped")) {
+    } else if (word == "dropped") {
       result->is_dropped = true;
-    } else if (tokens_.take("swapped")) {
-      tokens_.expect("with");
-      tokens_.expect("the");
-      tokens_.expect("next");
+    } else if (word == "swapped") {
+      for (const char* next : {"with", "the", "next"}) {
+        tokens_.expect(next);
+      }
       result->is_swapped = true;
-    } else if (tokens_.take("cut")) {
+    } else if (word == "cut") {
       tokens_.expect("at");
       result->cut_at = tokens_.number("expected a number of bytes");
-    } else if (tokens_.take("corrupt")) {
+    } else if (word == "corrupt") {
       tokens_.expect("byte");
       result->corrupt_byte = tokens_.number("expected the index of a byte, from 0");
-    } else if (tokens_.take("as")) {
-      result->name = message_name()->name();
     } else {
-      return false;
+      result->name = message_name().name();
     }
-    return true;
   }
 
-  void within(Statement* result) {
-    if (tokens_.take("within")) {
-      result->within = time();
-    }
-  }
+  int64_t within() { return tokens_.take("within") ? time() : kNoLimit; }
 
   // In milliseconds.
   int64_t time() {
+    constexpr int64_t kSecond = 1000;
     const int64_t number = tokens_.number("expected a time such as 5s or 200ms");
     if (tokens_.take("s")) {
-      return number * 1000;
+      return number * kSecond;
     }
-    tokens_.expect("ms");
+    if (!tokens_.take("ms")) {
+      tokens_.fail("expected 's' or 'ms' behind the number");
+    }
     return number;
   }
 
-  static constexpr size_t kNone = static_cast<size_t>(-1);
+  std::string where() { return "line " + std::to_string(tokens_.place().line); }
 
   Tokens tokens_;
   Scenario& scenario_;
-  size_t request_ = kNone;  // index of the last that is expected
+  int expectations_ = 0;
+  int last_request_ = 0;                       // the number of its expectation, or 0
+  std::map<int, const Descriptor*> requests_;  // by the same number
+  std::map<std::string, int> names_;           // of requests
 };
 
 }  // namespace
 
 void parse_scenario(const std::string& text, Scenario* scenario) {
+  if (text.size() > static_cast<size_t>(std::numeric_limits<int>::max())) {
+    throw Misread{{1, 1}, "it has 2 GiB or more"};
+  }
   Parser(text, scenario).parse();
 }
 

@@ -2,10 +2,10 @@
 #ifndef TESTKIT_SCENARIO_H
 #define TESTKIT_SCENARIO_H
 
-#include <google/protobuf/descriptor.h>
-
 #include <cstdint>
+#include <set>
 #include <string>
+#include <variant>
 #include <vector>
 
 #include "notation.h"
@@ -15,6 +15,7 @@ namespace testkit {
 
 // What happens to a message on its way to the plug-in.
 struct Faults {
+  std::string where;  // of the statement: "line 3"
   int64_t after = 0;  // milliseconds
   bool is_dropped = false;
   bool is_twice = false;
@@ -24,26 +25,56 @@ struct Faults {
   std::string name;         // another message's, if it is not empty
 };
 
-struct Statement {
-  enum Kind { kExpect, kAnswer, kPush, kAtMost, kAlways, kStrict };
+// For ever.
+constexpr int64_t kNoLimit = -1;
 
-  Kind kind;
-  std::string where;  // "line 3"; empty where nobody looks
-  // Null of kStrict, and of an answer as the service gives it.
-  const google::protobuf::Descriptor* type = nullptr;
-  Pattern pattern;  // without fields, or of the type
+struct Expect {
+  Pattern pattern;
+  int64_t within = kNoLimit;  // milliseconds
+  int number = 0;             // of this expectation, from 1
+};
+
+struct Answer {
+  int request = 0;  // the number of its expectation
+  Pattern pattern;  // the fields of another message, or without any
+  bool is_another;  // whether it is that message, rather than the service's with its fields
   Faults faults;
+};
 
-  // Of an expectation: whether an answer comes behind it, rather than the service's at once.
-  bool has_answer = false;
-  // Of an expectation, and of kAtMost: for how many milliseconds, or negative if for ever.
-  int64_t within = -1;
-  int most = 0;  // of kAtMost
+struct Push {
+  Pattern pattern;
+  Faults faults;
+};
+
+struct AtMost {
+  int count = 0;
+  Pattern pattern;
+  int64_t within = kNoLimit;
+};
+
+struct Always {
+  Pattern pattern;
+};
+
+struct Strict {};
+
+struct Statement;
+using Script = std::vector<Statement>;
+
+// Each begins with an expectation, and has no other.
+struct AnyOrder {
+  std::vector<Script> scripts;
+};
+
+struct Statement {
+  std::string where;  // "line 3"
+  std::variant<Expect, Answer, Push, AtMost, Always, Strict, AnyOrder> what;
 };
 
 struct Scenario {
   World world;
-  std::vector<Statement> statements;
+  Script script;
+  std::set<int> answered;  // the numbers of expectations that a statement answers
 };
 
 // Adds what the text says; what it says of the world replaces what was there. Throws Misread.

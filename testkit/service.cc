@@ -3,8 +3,10 @@
 #include <google/protobuf/descriptor.h>
 
 #include <algorithm>
+#include <limits>
+#include <utility>
 
-#include "messages.h"
+#include "rules.h"
 
 namespace testkit {
 namespace {
@@ -42,57 +44,37 @@ void set_result(Message* reply, ResultCode code, const char* text) {
   }
 }
 
+// A reply without a result grants the request, and so does one that refuses some of its users.
+bool grants(const Message& reply) {
+  if (!has(reply, "result")) {
+    return true;
+  }
+  const auto& result = static_cast<const Result&>(
+      reply.GetReflection()->GetMessage(reply, reply.GetDescriptor()->FindFieldByName("result")));
+  return result.code() == kOk || result.has_wrongreceiverdetail();
+}
+
+void set_refused(const WrongReceiverDetail& refused, ResultCode code, const char* text,
+                 Result* result) {
+  if (refused.ByteSize() > 0) {
+    result->set_code(code);
+    result->set_msg(text);
+    result->mutable_wrongreceiverdetail()->CopyFrom(refused);
+  }
+}
+
 // Also in the messages inside it.
 bool has_unknown_fields(const Message& message) {
-  const std::unique_ptr<Message> known(message.New());
-  known->CopyFrom(message);
+  const std::unique_ptr<Message> known = copy_of(message);
   known->DiscardUnknownFields();
   return known->ByteSize() != message.ByteSize();
 }
 
-void refuse(const User* user, int64_t id, int64_t inviting, WrongReceiverDetail* detail) {
-  if (user == nullptr) {
-    detail->add_invalidreceivers(id);
-    return;
-  }
-  switch (user->refused()) {
-    case DISABLED:
-      detail->add_disabledreceivers(id);
-      break;
-    case INTERRUPTED:
-      detail->add_interruptedreceivers(id);
-      break;
-    case INVITATION_DENIED:
-      detail->add_invitationdenied(id);
-      break;
-    case DID_VIOLATION:
-      DIDViolationUser* pair = detail->add_didviolationusers();
-      pair->set_usera(inviting);
-      pair->set_userb(id);
-      break;
-  }
-}
-
-void add_member(const User& user, AllowChatReply* chatroom) {
-  ChatroomMemberStatus* member = chatroom->add_orderedchatroommemberlist();
-  member->set_userid(user.userid());
-  member->set_available(user.available());
-  member->set_name(user.name());
-  member->set_isaccepted(true);
-}
-
-bool is_member(const AllowChatReply& chatroom, int64_t id) {
-  const auto& members = chatroom.orderedchatroommemberlist();
-  return std::any_of(members.begin(), members.end(),
-                     [id](const ChatroomMemberStatus& member) { return member.userid() == id; });
-}
-
 }  // namespace
 
-Service::Service(const World& world)
-    : world_(world),
-      now_(world.clockmillis()),
-      is_signed_in_(world.issignedin()),
+Service::Service(const World& world, std::vector<Pattern> required)
+    : state_(world),
+      required_(std::move(required)),
       next_push_id_(world.firstpushid()),
       next_chatroom_id_(world.firstchatroomid()) {}
 
@@ -107,100 +89,114 @@ bool Service::require(bool holds, const std::string& otherwise) {
   return holds;
 }
 
-// ---- Every message
+void Service::set_time(int64_t milliseconds) {
+  const int64_t begin = state_.world.clockmillis();
+  state_.now = begin + std::min(milliseconds,
+                                std::numeric_limits<int64_t>::max() - std::max<int64_t>(begin, 0));
+}
+
+// ---- What the plug-in sends
 
 Messages Service::take(const Message& message) {
   require(!has_unknown_fields(message), "it has fields or values that the schema does not have");
-  if (const auto* auth = dynamic_cast<const ChannelAuthRequest*>(&message)) {
-    return authenticate(*auth);
+  for (const std::string& field : broken_texts(message)) {
+    require(false, field + " is not UTF-8");
   }
-  if (!require(is_signed_in_, "it comes before the authentication")) {
+  if (!require(is_from_plugin(*message.GetDescriptor()), "a plug-in does not send it") ||
+      !require(state_.is_signed_in || message.GetDescriptor() == ChannelAuthRequest::descriptor(),
+               "it comes before the login was granted")) {
     return {};
   }
-  require(!has(message, "userId") && !has(message, "deviceId"),
-          "it has ids of the sender, which the connection has already");
-  if (is_reply(*message.GetDescriptor())) {
-    return take_acknowledgement(message);
+  for (const Pattern& pattern : required_) {
+    if (&pattern.type() == message.GetDescriptor()) {
+      for (const std::string& reason : differences(pattern, message, {})) {
+        require(false, reason);
+      }
+    }
   }
-  if (!is_request(message)) {
-    return {};
+  return is_reply(*message.GetDescriptor()) ? take_acknowledgement(message) : take_request(message);
+}
+
+// One that is sent again as it was is the same request.
+Messages Service::take_request(const Message& message) {
+  const int64_t id = number_in(message, "requestId");
+  const auto open = open_.find(id);
+  if (open != open_.end() && open->second.request->GetDescriptor() == message.GetDescriptor() &&
+      open->second.request->SerializeAsString() == message.SerializeAsString()) {
+    return copies_of(open->second.said);
   }
-  if (const auto* typing = dynamic_cast<const IsTyping*>(&message)) {
-    Messages pushes;
-    pushes.push_back(typing_of_another(*typing));
-    return pushes;
+  require(id != 0, "it has no requestId, or 0");
+  require(id == 0 || open == open_.end(),
+          "its requestId " + std::to_string(id) +
+              " is that of another request, which has no reply yet");
+  for (const std::string& mistake : mistakes_in(message, state_)) {
+    require(false, mistake);
   }
-  Messages said;
-  said.push_back(reply_to(message));
-  if (const auto* unread = dynamic_cast<const GetAllUnreadMessageRequest*>(&message)) {
-    said.push_back(page_from(0, unread->maxcount()));
+  Messages said = say(message);
+  if (const auto* chat = dynamic_cast<const ChatRequest*>(&message)) {
+    remember(*chat);
+  }
+  if (reply_type(*message.GetDescriptor()) != nullptr) {
+    open_[id] = {copy_of(message), copies_of(said)};
   }
   return said;
 }
 
-// Complains of a requestId or a chatroom, but only a message that nobody answers is no request.
-bool Service::is_request(const Message& message) {
-  const Descriptor& type = *message.GetDescriptor();
-  if (!require(reply_type(type) != nullptr || type.name() == IsTyping::descriptor()->name(),
-               "a plug-in does not send it")) {
-    return false;
+void Service::remember(const ChatRequest& request) {
+  for (const ChatMessageParam& message : request.chatmessageparams()) {
+    const Written written{request.chatroomid(), message.chatmsg(), state_.now, false};
+    state_.written.emplace(message.msgid(), written);
+    state_.known.emplace(state_.world.userid(), message.msgid());
   }
-  if (require(has(message, "requestId"), "it has no requestId")) {
-    const int64_t id = number_in(message, "requestId");
-    require(id > last_request_id_, "its requestId " + std::to_string(id) +
-                                       " is not above the one before, which was " +
-                                       std::to_string(last_request_id_));
-    last_request_id_ = id;
-  }
-  if (has(message, "chatroomId")) {
-    const int64_t id = number_in(message, "chatroomId");
-    require(chatroom_with(id) != nullptr,
-            "there is no chatroom " + std::to_string(id) + ", or the user has left it");
-  }
-  return true;
-}
-
-Messages Service::authenticate(const ChannelAuthRequest& request) {
-  require(!is_signed_in_, "the connection is authenticated already");
-  is_request(request);
-  is_signed_in_ = require(request.accesstoken() == world_.accesstoken(),
-                          "it has another access token than the service");
-
-  Messages said;
-  said.push_back(reply_to(request));
-  if (is_signed_in_) {
-    set_result(said.front().get(), kOk, "welcome");
-  } else {
-    set_result(said.front().get(), kBadToken, "access token refused");
-  }
-  return said;
 }
 
 Messages Service::take_acknowledgement(const Message& message) {
   const int64_t id = number_in(message, "requestId");
-  const Descriptor& type = *message.GetDescriptor();
-  const auto found = pushes_.find({type.name(), id});
-  const bool is_of_broken = std::any_of(broken_.begin(), broken_.end(), [&type](const auto& name) {
-    return reply_type(*message_type(name)) == &type;
-  });
-  if (found == pushes_.end() && is_of_broken) {
-    return {};
-  }
-  if (!require(found != pushes_.end(), "it answers nothing: no such message with the requestId " +
+  const auto found = pushed_.find({message.GetDescriptor()->name(), id});
+  if (!require(found != pushed_.end(), "it answers nothing: no such message with the requestId " +
                                            std::to_string(id) + " was sent")) {
     return {};
   }
-  Push& push = found->second;
-  const bool is_first = !push.is_answered;
-  push.is_answered = true;
+  Pushed& push = found->second;
+  const auto* online = dynamic_cast<const ForwardOnlineMessage*>(push.message.get());
+  require(online == nullptr || !online->skipreply(),
+          "the message with the requestId " + std::to_string(id) + " wants no answer");
+  ++push.answers;
+  require(push.answers <= push.deliveries,
+          "the message with the requestId " + std::to_string(id) + " was answered before");
+  require(online == nullptr || number_in(message, "chatroomId") == online->chatroomid(),
+          "its chatroomId is not that of the message");
 
+  const auto* page = dynamic_cast<const ForwardUnreadMessage*>(push.message.get());
+  if (page == nullptr || push.answers > 1) {
+    return {};
+  }
+  for (const InboxEntry& entry : page->inboxentries()) {
+    read_.insert(entry.msgid());
+  }
+  const auto& answer = static_cast<const ForwardUnreadMessageReply&>(message);
+  const auto next = pages_.find(answer.nextpaginationkey());
   Messages said;
-  const auto* page = dynamic_cast<const ForwardUnreadMessageReply*>(&message);
-  if (page != nullptr && page->has_nextpaginationkey() &&
-      require(page->nextpaginationkey() == push.key,
+  if (answer.has_nextpaginationkey() &&
+      require(answer.nextpaginationkey() == page->nextpaginationkey(),
               "its nextPaginationKey is not that of the page") &&
-      is_first && pages_.count(push.key) > 0) {
-    said.push_back(page_from(pages_[push.key], page->maxcount()));
+      next != pages_.end()) {
+    said.push_back(page_from(next->second, answer.maxcount()));
+  }
+  return said;
+}
+
+// ---- What the service says
+
+Messages Service::say(const Message& request) {
+  Messages said;
+  if (const auto* typing = dynamic_cast<const IsTyping*>(&request)) {
+    said.push_back(typing_of_another(*typing));
+    return said;
+  }
+  said.push_back(reply_to(request));
+  if (const auto* unread = dynamic_cast<const GetAllUnreadMessageRequest*>(&request)) {
+    said.push_back(page_from(0, unread->maxcount()));
   }
   return said;
 }
@@ -215,158 +211,34 @@ std::unique_ptr<Message> Service::reply_to(const Message& request) {
   set_result(reply.get(), kOk, "ok");
   for (const char* time :
        {"currentTimeMillis", "createTimeMillis", "changeTimeMillis", "sentTime"}) {
-    set_number(reply.get(), time, now_);
+    set_number(reply.get(), time, state_.now);
   }
-  completed(request, reply.get(), &Service::create_chatroom) ||
-      completed(request, reply.get(), &Service::describe_chatroom) ||
-      completed(request, reply.get(), &Service::change_chatroom) ||
-      completed(request, reply.get(), &Service::invite) ||
-      completed(request, reply.get(), &Service::end_chats) ||
-      completed(request, reply.get(), &Service::record);
+  visit<ChannelAuthRequest, CreateChatroomRequest, AllowChatRequest, InviteRequest, ChatRequest>(
+      request, [this, &reply](const auto& of_type) { complete(of_type, reply.get()); });
   return reply;
 }
 
-template <typename Request, typename Reply>
-bool Service::completed(const Message& request, Message* reply,
-                        void (Service::*complete)(const Request&, Reply*)) {
-  const auto* wanted = dynamic_cast<const Request*>(&request);
-  if (wanted != nullptr) {
-    (this->*complete)(*wanted, static_cast<Reply*>(reply));
-  }
-  return wanted != nullptr;
-}
-
-// ---- Pushes
-
-void Service::number(Message* push) {
-  set_number(push, "requestId", next_push_id_++);
-}
-
-void Service::note_delivery(const Message& message) {
-  const Descriptor& type = *message.GetDescriptor();
-  const Descriptor* answer = is_reply(type) ? nullptr : reply_type(type);
-  const auto* online = dynamic_cast<const ForwardOnlineMessage*>(&message);
-  if (answer == nullptr || (online != nullptr && online->skipreply())) {
-    return;
-  }
-  Push& push = pushes_[{answer->name(), number_in(message, "requestId")}];
-  push.type = type.name();
-  if (const auto* page = dynamic_cast<const ForwardUnreadMessage*>(&message)) {
-    push.key = page->nextpaginationkey();
+void Service::complete(const ChannelAuthRequest& request, Message* reply) {
+  if (request.accesstoken() == state_.world.accesstoken()) {
+    set_result(reply, kOk, "welcome");
+  } else {
+    set_result(reply, kBadToken, "access token refused");
   }
 }
 
-std::vector<std::string> Service::unanswered() const {
-  std::vector<std::string> result;
-  for (const auto& [answer, push] : pushes_) {
-    if (!push.is_answered) {
-      result.push_back("The " + push.type + " with the requestId " + std::to_string(answer.second) +
-                       " was not answered by a " + answer.first + ".");
-    }
-  }
-  return result;
+void Service::complete(const CreateChatroomRequest& request, Message* message) {
+  auto* reply = static_cast<CreateChatroomReply*>(message);
+  AllowChatReply chatroom = new_chatroom(state_, next_chatroom_id_++);
+  set_refused(bring(request.receivers(), state_, &chatroom), kSomeRefused,
+              "some receivers were refused", reply->mutable_result());
+  reply->set_chatroomid(chatroom.chatroomid());
+  reply->set_owneruserid(chatroom.owneruserid());
+  reply->set_msgttl(chatroom.msgttl());
 }
 
-std::unique_ptr<Message> Service::typing_of_another(const IsTyping& request) {
-  auto push = std::make_unique<TypingUpdated>();
-  number(push.get());
-  push->set_chatroomid(request.chatroomid());
-  const AllowChatReply* chatroom = chatroom_with(request.chatroomid());
-  if (chatroom != nullptr) {
-    for (const ChatroomMemberStatus& member : chatroom->orderedchatroommemberlist()) {
-      if (member.userid() != world_.userid()) {
-        push->set_sender(member.userid());
-        break;
-      }
-    }
-  }
-  push->set_state(request.state());
-  push->set_contenttype(request.contenttype());
-  push->set_refresh(request.refresh());
-  return push;
-}
-
-std::unique_ptr<Message> Service::page_from(size_t first, int most) {
-  auto page = std::make_unique<ForwardUnreadMessage>();
-  number(page.get());
-  const auto count = static_cast<size_t>(world_.stored_size());
-  const size_t end = most > 0 ? std::min(count, first + static_cast<size_t>(most)) : count;
-  for (size_t i = first; i < end; ++i) {
-    page->add_inboxentries()->CopyFrom(world_.stored(static_cast<int>(i)));
-  }
-  if (end < count || world_.hasendlesspages()) {
-    const std::string key = "page " + std::to_string(pages_.size() + 2);
-    pages_[key] = end < count ? end : 0;
-    page->set_nextpaginationkey(key);
-  }
-  return page;
-}
-
-// ---- Chatrooms
-
-const User* Service::user_with(int64_t id) const {
-  for (const User& user : world_.users()) {
-    if (user.userid() == id) {
-      return &user;
-    }
-  }
-  return nullptr;
-}
-
-AllowChatReply* Service::chatroom_with(int64_t id) {
-  for (AllowChatReply& chatroom : *world_.mutable_chatrooms()) {
-    if (chatroom.chatroomid() == id) {
-      return &chatroom;
-    }
-  }
-  return nullptr;
-}
-
-// Makes the users members. If some are refused, the result says so, and why.
-template <typename Users>
-void Service::bring(const Users& users, AllowChatReply* chatroom, Result* result, int code,
-                    const char* text) {
-  WrongReceiverDetail detail;
-  for (const int64_t id : users) {
-    const User* user = user_with(id);
-    if (is_member(*chatroom, id)) {
-      detail.add_existing(id);
-    } else if (user == nullptr || user->has_refused()) {
-      refuse(user, id, world_.userid(), &detail);
-    } else {
-      add_member(*user, chatroom);
-    }
-  }
-  if (detail.ByteSize() > 0) {
-    result->set_code(code);
-    result->set_msg(text);
-    result->mutable_wrongreceiverdetail()->CopyFrom(detail);
-  }
-}
-
-void Service::create_chatroom(const CreateChatroomRequest& request, CreateChatroomReply* reply) {
-  const int64_t id = next_chatroom_id_++;
-  AllowChatReply* chatroom = chatroom_with(id);
-  if (chatroom == nullptr) {
-    chatroom = world_.add_chatrooms();
-    chatroom->set_chatroomid(id);
-  }
-  chatroom->set_owneruserid(world_.userid());
-  chatroom->set_title(request.chatroomtitle());
-  chatroom->set_msgttl(world_.msgttl());
-  chatroom->clear_orderedchatroommemberlist();
-  if (const User* user = user_with(world_.userid())) {
-    add_member(*user, chatroom);
-  }
-  bring(request.receivers(), chatroom, reply->mutable_result(), kSomeRefused,
-        "some receivers were refused");
-  reply->set_chatroomid(id);
-  reply->set_owneruserid(chatroom->owneruserid());
-  reply->set_msgttl(chatroom->msgttl());
-}
-
-void Service::describe_chatroom(const AllowChatRequest& request, AllowChatReply* reply) {
-  const AllowChatReply* chatroom = chatroom_with(request.chatroomid());
+void Service::complete(const AllowChatRequest& request, Message* message) {
+  auto* reply = static_cast<AllowChatReply*>(message);
+  const AllowChatReply* chatroom = state_.chatroom_with(request.chatroomid());
   if (chatroom == nullptr) {
     return;
   }
@@ -385,43 +257,145 @@ void Service::describe_chatroom(const AllowChatRequest& request, AllowChatReply*
   }
 }
 
-void Service::change_chatroom(const ChangeChatroomMetaRequest& request,
-                              ChangeChatroomMetaReply* /*reply*/) {
-  require(request.has_title() != request.has_msgttl(),
-          "it should change the title or the lifetime, one of them");
-  AllowChatReply* chatroom = chatroom_with(request.chatroomid());
-  if (chatroom != nullptr && request.has_title()) {
-    chatroom->set_title(request.title());
-  }
-  if (chatroom != nullptr && request.has_msgttl()) {
-    chatroom->set_msgttl(request.msgttl());
+void Service::complete(const InviteRequest& request, Message* reply) {
+  if (const AllowChatReply* chatroom = state_.chatroom_with(request.chatroomid())) {
+    AllowChatReply with_invited = *chatroom;
+    set_refused(bring(request.invitingmembers(), state_, &with_invited), kSomeNotInvited,
+                "some members were not invited",
+                static_cast<InviteReply*>(reply)->mutable_result());
   }
 }
 
-void Service::invite(const InviteRequest& request, InviteReply* reply) {
-  if (AllowChatReply* chatroom = chatroom_with(request.chatroomid())) {
-    bring(request.invitingmembers(), chatroom, reply->mutable_result(), kSomeNotInvited,
-          "some members were not invited");
+void Service::complete(const ChatRequest& request, Message* reply) {
+  for (const ChatMessageParam& message : request.chatmessageparams()) {
+    ProcessedMessageEntry* entry = static_cast<ChatReply*>(reply)->add_processedmessageentries();
+    entry->set_msgid(message.msgid());
+    entry->set_senttime(state_.now);
   }
 }
 
-void Service::end_chats(const EndChatRequest& request, EndChatReply* /*reply*/) {
-  for (const EndChatEntry& entry : request.endchatentries()) {
-    auto& chatrooms = *world_.mutable_chatrooms();
-    for (int i = chatrooms.size() - 1; i >= 0; --i) {
-      if (chatrooms.Get(i).chatroomid() == entry.chatroomid()) {
-        chatrooms.SwapElements(i, chatrooms.size() - 1);
-        chatrooms.RemoveLast();
+std::unique_ptr<Message> Service::typing_of_another(const IsTyping& request) {
+  auto push = std::make_unique<TypingUpdated>();
+  number(push.get());
+  push->set_chatroomid(request.chatroomid());
+  const AllowChatReply* chatroom = state_.chatroom_with(request.chatroomid());
+  if (chatroom != nullptr) {
+    for (const ChatroomMemberStatus& member : chatroom->orderedchatroommemberlist()) {
+      if (member.userid() != state_.world.userid()) {
+        push->set_sender(member.userid());
+        break;
       }
     }
   }
+  push->set_state(request.state());
+  push->set_contenttype(request.contenttype());
+  push->set_refresh(request.refresh());
+  return push;
 }
 
-void Service::record(const ChatRequest& request, ChatReply* reply) {
-  for (const ChatMessageParam& param : request.chatmessageparams()) {
-    ProcessedMessageEntry* entry = reply->add_processedmessageentries();
-    entry->set_msgid(param.msgid());
-    entry->set_senttime(now_);
+// So many unread messages at most, from that index on. Pages without end come again and again.
+std::unique_ptr<Message> Service::page_from(int first, int most) {
+  const auto is_unread = [this](const InboxEntry& entry) {
+    return state_.world.hasendlesspages() || read_.count(entry.msgid()) == 0;
+  };
+  const auto& stored = state_.world.stored();
+  auto page = std::make_unique<ForwardUnreadMessage>();
+  number(page.get());
+  auto next = stored.begin() + first;
+  for (; next != stored.end() && (most <= 0 || page->inboxentries_size() < most); ++next) {
+    if (is_unread(*next)) {
+      page->add_inboxentries()->CopyFrom(*next);
+    }
+  }
+  const bool has_more = std::any_of(next, stored.end(), is_unread);
+  if (has_more || state_.world.hasendlesspages()) {
+    const std::string key = "page " + std::to_string(pages_.size() + 2);
+    pages_[key] = has_more ? static_cast<int>(next - stored.begin()) : 0;
+    page->set_nextpaginationkey(key);
+  }
+  return page;
+}
+
+// ---- What the plug-in gets
+
+void Service::number(Message* push) {
+  set_number(push, "requestId", next_push_id_++);
+}
+
+void Service::note_delivery(const std::string& name, const std::string& bytes, bool is_intact) {
+  std::unique_ptr<Message> message = new_message(*message_type(name));
+  if (!message->ParseFromString(bytes)) {
+    return;
+  }
+  if (!is_reply(*message->GetDescriptor())) {
+    note_push(std::move(message), is_intact);
+  } else if (is_intact) {
+    note_reply(*message);
+  }
+}
+
+void Service::note_push(std::unique_ptr<Message> message, bool is_intact) {
+  const Descriptor* answer = reply_type(*message->GetDescriptor());
+  if (const auto* page = dynamic_cast<const ForwardUnreadMessage*>(message.get())) {
+    for (const InboxEntry& entry : page->inboxentries()) {
+      state_.known.emplace(entry.sender(), entry.msgid());
+    }
+  }
+  const auto* online = dynamic_cast<const ForwardOnlineMessage*>(message.get());
+  if (online != nullptr) {
+    state_.known.emplace(online->inboxentry().sender(), online->inboxentry().msgid());
+  }
+  if (answer == nullptr) {
+    return;
+  }
+  Pushed& pushed = pushed_[{answer->name(), number_in(*message, "requestId")}];
+  ++pushed.deliveries;
+  pushed.needs_answer =
+      pushed.needs_answer || (is_intact && (online == nullptr || !online->skipreply()));
+  pushed.message = std::move(message);
+}
+
+std::vector<std::string> Service::unanswered() const {
+  std::vector<std::string> result;
+  for (const auto& [answer, pushed] : pushed_) {
+    if (pushed.needs_answer && pushed.answers == 0) {
+      result.push_back("The " + pushed.message->GetDescriptor()->name() + " with the requestId " +
+                       std::to_string(answer.second) + " was not answered by a " + answer.first +
+                       ".");
+    }
+  }
+  return result;
+}
+
+void Service::note_reply(const Message& reply) {
+  const auto open = open_.find(number_in(reply, "requestId"));
+  if (open == open_.end() ||
+      reply_type(*open->second.request->GetDescriptor()) != reply.GetDescriptor()) {
+    return;
+  }
+  const std::unique_ptr<Message> request = std::move(open->second.request);
+  open_.erase(open);
+  if (const auto* chat = dynamic_cast<const ChatRequest*>(request.get())) {
+    for (const ChatMessageParam& message : chat->chatmessageparams()) {
+      state_.written.at(message.msgid()).is_answered = true;
+    }
+  }
+  if (grants(reply)) {
+    grant(*request, reply);
+  }
+}
+
+void Service::grant(const Message& request, const Message& reply) {
+  if (const auto* create = dynamic_cast<const CreateChatroomRequest*>(&request)) {
+    state_.create_chatroom(*create, number_in(reply, "chatroomId"));
+  } else if (const auto* change = dynamic_cast<const ChangeChatroomMetaRequest*>(&request)) {
+    state_.change_chatroom(*change);
+  } else if (const auto* invited = dynamic_cast<const InviteRequest*>(&request)) {
+    state_.invite(*invited);
+  } else if (const auto* ended = dynamic_cast<const EndChatRequest*>(&request)) {
+    state_.end_chats(*ended);
+  } else if (request.GetDescriptor() == ChannelAuthRequest::descriptor()) {
+    state_.is_signed_in = true;
   }
 }
 

@@ -12,16 +12,18 @@
 #include <utility>
 #include <vector>
 
-#include "msgspec_frontend.pb.h"
-#include "world.pb.h"
+#include "messages.h"
+#include "notation.h"
+#include "state.h"
 
 namespace testkit {
 
-using Messages = std::vector<std::unique_ptr<google::protobuf::Message>>;
-
+// What a request changes is changed once the plug-in has got a reply that grants it: one that is
+// lost, broken or replaced changes nothing.
 class Service {
  public:
-  explicit Service(const World& world);
+  // Of each message, the fields of its pattern have to be there.
+  Service(const World& world, std::vector<Pattern> required);
 
   // What the service says to the plug-in's message, the reply first.
   Messages take(const google::protobuf::Message& message);
@@ -30,58 +32,59 @@ class Service {
 
   // Gives a push its requestId.
   void number(google::protobuf::Message* push);
-  // The plug-in gets the message now. If it is a push, it has to be answered.
-  void note_delivery(const google::protobuf::Message& message);
-  // The plug-in gets broken bytes as a message of that name, whose answer may be any.
-  void note_broken_delivery(const std::string& name) { broken_.insert(name); }
+  // The plug-in gets the message now. If it is a push, it has to be answered, unless it is broken.
+  void note_delivery(const std::string& name, const std::string& bytes, bool is_intact);
   // The pushes that were not answered.
   std::vector<std::string> unanswered() const;
 
-  // Time passes.
-  void set_time(int64_t milliseconds) { now_ = world_.clockmillis() + milliseconds; }
+  bool is_signed_in() const { return state_.is_signed_in; }
+
+  // In milliseconds from the beginning.
+  void set_time(int64_t milliseconds);
 
  private:
+  // A request that the plug-in has no reply to, and what the service says.
+  struct Open {
+    std::unique_ptr<google::protobuf::Message> request;
+    Messages said;
+  };
+
+  // What was delivered under a requestId, and is answered.
+  struct Pushed {
+    std::unique_ptr<google::protobuf::Message> message;
+    bool needs_answer = false;  // rather than may have one
+    int deliveries = 0;
+    int answers = 0;
+  };
+
   bool require(bool holds, const std::string& otherwise);
-  bool is_request(const google::protobuf::Message& message);
-  Messages authenticate(const ChannelAuthRequest& request);
+  Messages take_request(const google::protobuf::Message& message);
   Messages take_acknowledgement(const google::protobuf::Message& message);
+  void remember(const ChatRequest& request);
+
+  Messages say(const google::protobuf::Message& request);
   std::unique_ptr<google::protobuf::Message> reply_to(const google::protobuf::Message& request);
-
-  // These change what the service knows, and complete the reply that all requests get.
-  void create_chatroom(const CreateChatroomRequest& request, CreateChatroomReply* reply);
-  void describe_chatroom(const AllowChatRequest& request, AllowChatReply* reply);
-  void change_chatroom(const ChangeChatroomMetaRequest& request, ChangeChatroomMetaReply* reply);
-  void invite(const InviteRequest& request, InviteReply* reply);
-  void end_chats(const EndChatRequest& request, EndChatReply* reply);
-  void record(const ChatRequest& request, ChatReply* reply);
-  // Whether the request and its reply are the function's, which has completed the reply.
-  template <typename Request, typename Reply>
-  bool completed(const google::protobuf::Message& request, google::protobuf::Message* reply,
-                 void (Service::*complete)(const Request&, Reply*));
-
-  const User* user_with(int64_t id) const;
-  AllowChatReply* chatroom_with(int64_t id);
-  template <typename Users>
-  void bring(const Users& users, AllowChatReply* chatroom, Result* result, int code,
-             const char* text);
-  std::unique_ptr<google::protobuf::Message> page_from(size_t first, int most);
+  // These complete the reply that all requests get.
+  void complete(const ChannelAuthRequest& request, google::protobuf::Message* reply);
+  void complete(const CreateChatroomRequest& request, google::protobuf::Message* reply);
+  void complete(const AllowChatRequest& request, google::protobuf::Message* reply);
+  void complete(const InviteRequest& request, google::protobuf::Message* reply);
+  void complete(const ChatRequest& request, google::protobuf::Message* reply);
+  std::unique_ptr<google::protobuf::Message> page_from(int first, int most);
   std::unique_ptr<google::protobuf::Message> typing_of_another(const IsTyping& request);
 
-  World world_;
-  int64_t now_;
-  bool is_signed_in_;
-  int64_t last_request_id_ = 0;  // the plug-in's
+  void note_reply(const google::protobuf::Message& reply);
+  void grant(const google::protobuf::Message& request, const google::protobuf::Message& reply);
+  void note_push(std::unique_ptr<google::protobuf::Message> message, bool is_intact);
+
+  State state_;
+  std::vector<Pattern> required_;
   int64_t next_push_id_;
   int64_t next_chatroom_id_;
-  std::map<std::string, size_t> pages_;  // by key: the index of the first message
-  // The pushes that were delivered: by type and requestId of their answers.
-  struct Push {
-    std::string type;
-    std::string key;  // of the next page, or empty
-    bool is_answered = false;
-  };
-  std::map<std::pair<std::string, int64_t>, Push> pushes_;
-  std::set<std::string> broken_;
+  std::map<int64_t, Open> open_;      // by requestId
+  std::map<std::string, int> pages_;  // by key: the index of the first message
+  std::set<int64_t> read_;            // the stored messages that were acknowledged
+  std::map<std::pair<std::string, int64_t>, Pushed> pushed_;  // by type and requestId of the answer
   std::vector<std::string> complaints_;
 };
 

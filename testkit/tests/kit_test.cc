@@ -2,9 +2,12 @@
 
 #include <google/protobuf/descriptor.h>
 #include <google/protobuf/message.h>
+#include <google/protobuf/stubs/common.h>
 #include <google/protobuf/text_format.h>
 #include <gtest/gtest.h>
 
+#include <cstdint>
+#include <cstring>
 #include <memory>
 #include <string>
 #include <vector>
@@ -45,6 +48,7 @@ class TestKit : public ::testing::Test {
                      static_cast<int>(bytes.size()));
   }
   void send(const char* name, const std::string& fields) {
+    const google::protobuf::LogSilencer silence;  // of texts that are no UTF-8
     const auto message = message_named(name);
     ASSERT_TRUE(TextFormat::ParseFromString(fields, message.get())) << fields;
     send_bytes(name, message->SerializeAsString());
@@ -75,7 +79,9 @@ class TestKit : public ::testing::Test {
   }
 
   std::string report() { return qel_testkit_report(kit_); }
+  // When all that is due was taken.
   std::string end() {
+    received_bytes();
     const bool is_good = qel_testkit_end(kit_);
     EXPECT_EQ(is_good, report().empty());
     return report();
@@ -91,12 +97,14 @@ TEST_F(TestKit, ServiceAlone_AnswersEachRequest) {
   start(nullptr);
   send("ChannelAuthRequest",
        "requestId: 1 userId: 5001 deviceId: 7 appId: 'a' accessToken: 'example-access-token'");
+  EXPECT_EQ(received(),
+            (Lines{"ChannelAuthReply: requestId: 1 result { code: 0 msg: \"welcome\" }"}));
   send("CurrentTimeRequest", "requestId: 2");
-  send("UnsealMessageRequest", "requestId: 3 chatroomId: 42 sender: 1 msgId: 2 msgDetail: ''");
+  send("UnsealMessageRequest",
+       "requestId: 3 chatroomId: 42 sender: 6001 msgId: 8001 msgDetail: ''");
   send("GetAllReadAckRequest", "requestId: 4");
   EXPECT_EQ(received(),
-            (Lines{"ChannelAuthReply: requestId: 1 result { code: 0 msg: \"welcome\" }",
-                   "CurrentTimeReply: requestId: 2 result { code: 0 msg: \"ok\" } "
+            (Lines{"CurrentTimeReply: requestId: 2 result { code: 0 msg: \"ok\" } "
                    "currentTimeMillis: 1700000100000",
                    "UnsealMessageReply: requestId: 3 chatroomId: 42 result { code: 0 msg: \"ok\" }",
                    "GetAllReadAckReply: requestId: 4 result { code: 0 msg: \"ok\" }"}));
@@ -113,7 +121,8 @@ TEST_F(TestKit, Service_TellsTheTimeThatHasPassed) {
 
 TEST_F(TestKit, WrongToken_IsRefusedAndNotShown) {
   start(nullptr);
-  send("ChannelAuthRequest", "requestId: 1 userId: 1 deviceId: 7 appId: 'a' accessToken: 'secret'");
+  send("ChannelAuthRequest",
+       "requestId: 1 userId: 5001 deviceId: 7 appId: 'a' accessToken: 'secret'");
   EXPECT_EQ(received(),
             (Lines{"ChannelAuthReply: requestId: 1 result { code: 2001 msg: \"access token "
                    "refused\" }"}));
@@ -126,10 +135,11 @@ TEST_F(TestKit, NewChatroom_CanBeEnteredAndLeft) {
   start_signed_in("world { firstChatroomId: 50 }");
   send("CreateChatroomRequest",
        "requestId: 1 chatType: GROUP receivers: 6001 chatroomTitle: 'New'");
+  received();
   send("AllowChatRequest",
        "requestId: 2 chatroomId: 50 needOrderedChatroomMemberList: true needChatroomMeta: true");
-  send("EndChatRequest", "requestId: 3 endChatEntries { chatroomId: 50 denyInvitation: true }");
-  EXPECT_EQ(received()[1],
+  send("EndChatRequest", "requestId: 3 endChatEntries { chatroomId: 50 }");
+  EXPECT_EQ(received()[0],
             "AllowChatReply: requestId: 2 chatroomId: 50 result { code: 0 msg: \"ok\" } "
             "ownerUserId: 5001 orderedChatroomMemberList { userId: 5001 available: true name: "
             "\"Ana\" isAccepted: true } orderedChatroomMemberList { userId: 6001 available: true "
@@ -212,17 +222,56 @@ struct Complaint {
 };
 
 const Complaint kComplaints[] = {
-    {"NoRequestId", "CurrentTimeRequest", "", "it has no requestId"},
+    {"NoRequestId", "CurrentTimeRequest", "", "it has no requestId, or 0"},
     {"UnknownChatroom", "UnsealMessageRequest",
-     "requestId: 1 chatroomId: 43 sender: 1 msgId: 2 msgDetail: ''",
+     "requestId: 1 chatroomId: 43 sender: 6001 msgId: 8001 msgDetail: ''",
      "there is no chatroom 43, or the user has left it"},
-    {"SendersIds", "CurrentTimeRequest", "requestId: 1 deviceId: 7",
-     "it has ids of the sender, which the connection has already"},
     {"NoRequest", "TypingUpdated", "requestId: 1", "a plug-in does not send it"},
     {"AnswerToNothing", "ClientEchoReply", "requestId: 3",
      "it answers nothing: no such message with the requestId 3 was sent"},
+    {"EchoOfItsOwn", "ClientEcho", "requestId: 1", "a plug-in does not send it"},
+    {"MessageZero", "ChatRequest",
+     "requestId: 1 chatroomId: 42 chatMessageParams { msgId: 0 msgType: TEXT chatMsg: 'x' }",
+     "its msgId is 0, which is that of no message"},
+    {"EmptyText", "ChatRequest",
+     "requestId: 1 chatroomId: 42 chatMessageParams { msgId: 1 msgType: TEXT chatMsg: '' }",
+     "its text is empty"},
+    {"NegativeLifetimeOfAMessage", "ChatRequest",
+     "requestId: 1 chatroomId: 42 chatMessageParams { msgId: 1 msgType: TEXT chatMsg: 'x' msgTtl: "
+     "-1 }",
+     "its msgTtl is negative"},
+    {"NegativeLifetime", "ChangeChatroomMetaRequest", "requestId: 1 chatroomId: 42 msgTtl: -1",
+     "its msgTtl is negative"},
+    {"TitleAndLifetime", "ChangeChatroomMetaRequest",
+     "requestId: 1 chatroomId: 42 title: 'x' msgTtl: 1",
+     "it should change the title or the lifetime, one of them"},
+    {"ReceiptOfAnUnknownMessage", "ReadMessageRequest",
+     "requestId: 1 chatroomId: 42 inboxEntry { msgId: 8001 sender: 6002 sentTime: 1 }",
+     "there is no message 8001 of the user 6002"},
+    {"UnsealingAnUnknownMessage", "UnsealMessageRequest",
+     "requestId: 1 chatroomId: 42 sender: 8001 msgId: 6001",
+     "there is no message 6001 of the user 8001"},
+    {"CallOfOthers", "SaveCallLogRequest",
+     "requestId: 1 chatroomId: 42 callId: 'c' callLogType: 'v' sender: 6001 receiver: 6002 "
+     "conversationSeconds: 1",
+     "the user has to be the call's sender or its receiver"},
+    {"CallOfTheUserAlone", "SaveCallLogRequest",
+     "requestId: 1 chatroomId: 42 callId: 'c' callLogType: 'v' sender: 5001 receiver: 5001 "
+     "conversationSeconds: 1",
+     "the user has to be the call's sender or its receiver"},
+    {"InvitingNobody", "InviteRequest", "requestId: 1 chatroomId: 42 invitingMembers: [6007, 0]",
+     "it has the user 0, which is the id of nobody"},
+    {"CreatingWithNobody", "CreateChatroomRequest", "requestId: 1 chatType: GROUP receivers: 0",
+     "it has the user 0, which is the id of nobody"},
+    {"LeavingAnUnknownChatroom", "EndChatRequest", "requestId: 1 endChatEntries { chatroomId: 7 }",
+     "there is no chatroom 7, or the user has left it"},
+    {"LeavingNoChatroom", "EndChatRequest", "requestId: 1 endChatEntries { }",
+     "an entry has no chatroomId"},
+    {"TextThatIsNoUtf8", "ChatRequest",
+     "requestId: 1 chatroomId: 42 chatMessageParams { msgId: 1 msgType: TEXT chatMsg: '\\377' }",
+     "chatMessageParams.chatMsg is not UTF-8"},
     {"TwoComplaints", "InviteRequest", "chatroomId: 42",
-     "it has no requestId; invitingMembers is missing"},
+     "invitingMembers is missing; it has no requestId, or 0"},
     {"SecondLogin", "ChannelAuthRequest",
      "requestId: 1 userId: 1 deviceId: 7 appId: 'a' accessToken: 'example-access-token'",
      "the connection is authenticated already"},
@@ -235,8 +284,175 @@ TEST_P(Service, ComplainsOfWhatAPluginShouldNotSend) {
   send(GetParam().message, GetParam().fields);
   const std::string type = GetParam().message;
   EXPECT_EQ(report(), std::string("Message 1 of the plug-in, ") +
-                          (type[0] == 'I' || type[0] == 'U' ? "an " : "a ") + type +
+                          (std::strchr("EIU", type[0]) != nullptr ? "an " : "a ") + type +
                           ", is wrong: " + GetParam().reason + ".\n");
+}
+
+TEST_F(TestKit, DeniedInvitation_IsThatOfAnyChatroom) {
+  start_signed_in("");
+  send("EndChatRequest", "requestId: 1 endChatEntries { chatroomId: 7 denyInvitation: true }");
+  EXPECT_EQ(end(), "");
+}
+
+struct WrongLogin {
+  const char* name;
+  const char* fields;
+  const char* reason;
+};
+
+const WrongLogin kWrongLogins[] = {
+    {"OtherUser", "userId: 6001 appId: 'a'", "its userId is 6001, but the service's user is 5001"},
+    {"EmptyAppId", "userId: 5001 appId: ''", "its appId is empty"},
+};
+
+class Login : public TestKit, public ::testing::WithParamInterface<WrongLogin> {};
+
+TEST_P(Login, ThatIsWrong_IsReported) {
+  start(nullptr);
+  send("ChannelAuthRequest",
+       std::string("requestId: 1 deviceId: 7 accessToken: 'example-access-token' ") +
+           GetParam().fields);
+  EXPECT_EQ(end(), std::string("Message 1 of the plug-in, a ChannelAuthRequest, is wrong: ") +
+                       GetParam().reason + ".\n");
+}
+
+INSTANTIATE_TEST_SUITE_P(Each, Login, ::testing::ValuesIn(kWrongLogins),
+                         [](const auto& row) { return row.param.name; });
+
+const char kChat[] = "chatroomId: 42 chatMessageParams { msgType: TEXT ";
+
+TEST_F(TestKit, MsgIdOfAnotherMessage_IsReported) {
+  start_signed_in("");
+  send("ChatRequest", std::string(kChat) + "msgId: 1 chatMsg: 'x' } requestId: 1");
+  send("ChatRequest", std::string(kChat) + "msgId: 1 chatMsg: 'y' } requestId: 2");
+  EXPECT_EQ(end(),
+            "Message 2 of the plug-in, a ChatRequest, is wrong: its msgId 1 is that of another "
+            "message.\n");
+}
+
+TEST_F(TestKit, MessageThatIsSentAgain_IsTheSame) {
+  start_signed_in("expect ChatRequest answer dropped");
+  send("ChatRequest", std::string(kChat) + "msgId: 1 chatMsg: 'x' } requestId: 1");
+  qel_testkit_wait(kit_, 5000);
+  send("ChatRequest", std::string(kChat) + "msgId: 1 chatMsg: 'x' } requestId: 2");
+  EXPECT_EQ(end(), "");
+}
+
+TEST_F(TestKit, MessageThatIsSentAgainAsAnother_IsReported) {
+  start_signed_in("expect ChatRequest answer dropped");
+  send("ChatRequest", std::string(kChat) + "msgId: 1 chatMsg: 'x' } requestId: 1");
+  qel_testkit_wait(kit_, 1000);
+  send("ChatRequest", std::string(kChat) + "msgId: 2 chatMsg: 'x' } requestId: 2");
+  EXPECT_EQ(end(),
+            "Message 2 of the plug-in, a ChatRequest, is wrong: it has the text of the message 1, "
+            "which is not answered yet, but another msgId.\n");
+}
+
+TEST_F(TestKit, SameTextSoonOrOnceItIsAnswered_IsAnotherMessage) {
+  start_signed_in("");
+  send("ChatRequest", std::string(kChat) + "msgId: 1 chatMsg: 'x' } requestId: 1");
+  send("ChatRequest", std::string(kChat) + "msgId: 2 chatMsg: 'x' } requestId: 2");
+  received();
+  qel_testkit_wait(kit_, 1000);
+  send("ChatRequest", std::string(kChat) + "msgId: 3 chatMsg: 'x' } requestId: 3");
+  EXPECT_EQ(end(), "");
+}
+
+TEST_F(TestKit, RequestIdOfAnOpenRequest_IsReported) {
+  start_signed_in("");
+  send("CurrentTimeRequest", "requestId: 7");
+  send("GetAllReadAckRequest", "requestId: 7");
+  EXPECT_EQ(
+      end(),
+      "Message 2 of the plug-in, a GetAllReadAckRequest, is wrong: its requestId 7 is that of "
+      "another request, which has no reply yet.\n");
+}
+
+TEST_F(TestKit, RequestIdsInAnyOrder_AreFine) {
+  start_signed_in("");
+  for (const char* id : {"requestId: 7", "requestId: 3", "requestId: -5"}) {
+    send("CurrentTimeRequest", id);
+  }
+  received();
+  send("CurrentTimeRequest", "requestId: 7");
+  EXPECT_EQ(end(), "");
+}
+
+TEST_F(TestKit, RepeatedRequest_IsAnsweredAgainAsTheSame) {
+  start_signed_in("");
+  send("CreateChatroomRequest", "requestId: 7 chatType: GROUP receivers: 6001");
+  send("CreateChatroomRequest", "requestId: 7 chatType: GROUP receivers: 6001");
+  const Lines replies = received();
+  ASSERT_EQ(replies.size(), 2U);
+  EXPECT_EQ(replies[0], replies[1]);
+  EXPECT_EQ(end(), "");
+}
+
+// ---- What changes
+
+TEST_F(TestKit, RequestBeforeTheLoginsReply_IsReported) {
+  start(nullptr);
+  send("ChannelAuthRequest",
+       "requestId: 1 userId: 5001 deviceId: 7 appId: 'a' accessToken: 'example-access-token'");
+  send("CurrentTimeRequest", "requestId: 2");
+  EXPECT_EQ(end(),
+            "Message 2 of the plug-in, a CurrentTimeRequest, is wrong: it comes before the login "
+            "was granted.\n");
+}
+
+TEST_F(TestKit, LoginWhoseReplyIsLost_CanBeRepeated) {
+  start("expect ChannelAuthRequest answer dropped");
+  for (const char* id : {"1", "2"}) {
+    send("ChannelAuthRequest", std::string("userId: 5001 deviceId: 7 appId: 'a' accessToken: "
+                                           "'example-access-token' requestId: ") +
+                                   id);
+    received();
+  }
+  send("CurrentTimeRequest", "requestId: 3");
+  EXPECT_EQ(end(), "");
+}
+
+struct Refusal {
+  const char* name;
+  const char* answer;
+};
+
+const Refusal kRefusals[] = {
+    {"Failure", "{ result { code: 5 } }"},
+    {"AnotherRequest", "{ requestId: 9 }"},
+    {"AnotherMessage", "InviteReply"},
+    {"Dropped", "dropped"},
+    {"Broken", "cut at 2"},
+};
+
+class RefusedRequest : public TestKit, public ::testing::WithParamInterface<Refusal> {};
+
+TEST_P(RefusedRequest, ChangesNothing) {
+  start_signed_in(std::string("expect EndChatRequest answer ") + GetParam().answer);
+  send("EndChatRequest", "requestId: 1 endChatEntries { chatroomId: 42 }");
+  received_bytes();
+  send("AllowChatRequest", "requestId: 2 chatroomId: 42");
+  EXPECT_EQ(end(), "");
+}
+
+INSTANTIATE_TEST_SUITE_P(Each, RefusedRequest, ::testing::ValuesIn(kRefusals),
+                         [](const auto& row) { return row.param.name; });
+
+TEST_F(TestKit, CreatedChatroom_HasTheIdOfTheReply) {
+  start_signed_in("expect CreateChatroomRequest answer { chatroomId: 60 }");
+  send("CreateChatroomRequest", "requestId: 1 chatType: GROUP receivers: 6001");
+  received();
+  send("AllowChatRequest", "requestId: 2 chatroomId: 60");
+  EXPECT_EQ(end(), "");
+}
+
+TEST_F(TestKit, UnreadMessagesThatWereAcknowledged_DoNotComeAgain) {
+  start_signed_in("world { stored { msgId: 1 } stored { msgId: 2 } }");
+  send("GetAllUnreadMessageRequest", "requestId: 1 maxCount: 1");
+  received();
+  send("ForwardUnreadMessageReply", "requestId: 700001");
+  send("GetAllUnreadMessageRequest", "requestId: 2 maxCount: 1");
+  EXPECT_EQ(received()[1], "ForwardUnreadMessage: requestId: 700002 inboxEntries { msgId: 2 }");
 }
 
 INSTANTIATE_TEST_SUITE_P(Each, Service, ::testing::ValuesIn(kComplaints),
@@ -268,8 +484,8 @@ const Difference kDifferences[] = {
      "\"0123456789012345678901234567890123456789012345678901234567890123456789012345678901234567890"
      "123456789...\" instead of \"a\""},
     {"Enumeration", "msgType: MEDIA", "msgType: TEXT", "msgType is TEXT instead of MEDIA"},
-    {"NumberOfNoMember", "msgType: 77", "msgType: TEXT", "msgType is not the expected one"},
-    {"UnknownField", "99: 'x'", "", "the unknown field 99 is not the expected one"},
+    {"NumberOfNoMember", "msgType: 77", "msgType: TEXT", "msgType is TEXT instead of 77"},
+    {"UnknownField", "99: 'x'", "", "the unknown field 99 is missing, which should be \"x\""},
     {"AbsentValue", "msgId: 7", "", "msgId is missing, which should be 7"},
     {"AbsentField", "chatMsg", "", "chatMsg is missing"},
     {"FieldThatShouldNotBe", "!msgId", "msgId: 0", "msgId should not be there"},
@@ -324,6 +540,21 @@ TEST_F(TestKit, AccessTokenInAnotherPlace_IsNotReportedEither) {
             "title is \"my (not shown)!\" instead of \"x\".\n");
 }
 
+TEST_F(TestKit, AccessTokenInTheFieldOfAnother_IsNotReportedEither) {
+  start("expect ChannelAuthRequest { appId: 'x' }");
+  send("ChannelAuthRequest",
+       "requestId: 1 userId: 5001 deviceId: 7 appId: 'the_real_token' accessToken: 'my app'");
+  EXPECT_NE(end().find("appId is (not shown) instead of (not shown)"), std::string::npos);
+}
+
+TEST_F(TestKit, AccessTokenThatIsCutOrEscaped_IsNotReportedEither) {
+  start_signed_in(
+      "world { accessToken: '\\n8\\177xxxxxxxx' } expect ChangeChatroomMetaRequest { title: 'x' }");
+  send("ChangeChatroomMetaRequest",
+       "requestId: 1 chatroomId: 42 title: '" + std::string(95, 'a') + "\\n8\\177xxxxxxxx'");
+  EXPECT_NE(end().find("aaaa(not ...\" instead of"), std::string::npos) << report();
+}
+
 TEST_F(TestKit, AccessTokenOfThePlugin_IsNotReportedEither) {
   start(nullptr);
   send("ChannelAuthRequest",
@@ -370,17 +601,128 @@ TEST_F(TestKit, ExpectationThatIsMetTooLate_IsReportedOnce) {
 }
 
 TEST_F(TestKit, EachExpectation_HasATimeOfItsOwn) {
-  start_signed_in("expect CurrentTimeRequest within 1s expect CurrentTimeRequest within 1s");
+  start_signed_in("expect CurrentTimeRequest within 1s\nexpect CurrentTimeRequest within 1s");
   qel_testkit_wait(kit_, 1001);
   qel_testkit_wait(kit_, -1001);
   send("CurrentTimeRequest", "requestId: 1");
+  received();
   qel_testkit_wait(kit_, 1000);
   EXPECT_EQ(report(), "No CurrentTimeRequest came within 1000 ms, as line 1 expects.\n");
   qel_testkit_wait(kit_, 1);
   send("CurrentTimeRequest", "requestId: 2");
   EXPECT_EQ(end(),
             "No CurrentTimeRequest came within 1000 ms, as line 1 expects.\n"
-            "No CurrentTimeRequest came within 1000 ms, as line 1 expects.\n");
+            "No CurrentTimeRequest came within 1000 ms, as line 2 expects.\n");
+}
+
+TEST_F(TestKit, Time_CountsFromWhatCameToThePlugin) {
+  start_signed_in(
+      "expect CurrentTimeRequest answer after 3s expect GetAllReadAckRequest within 1s");
+  send("CurrentTimeRequest", "requestId: 1");
+  qel_testkit_wait(kit_, 5000);
+  received();
+  qel_testkit_wait(kit_, 1000);
+  EXPECT_EQ(report(), "");
+  qel_testkit_wait(kit_, 1);
+  EXPECT_EQ(report(), "No GetAllReadAckRequest came within 1000 ms, as line 1 expects.\n");
+}
+
+TEST_F(TestKit, TimeWithoutEnd_Stops) {
+  start_signed_in("world { clockMillis: 9223372036854775807 } push TypingUpdated after 2s");
+  qel_testkit_wait(kit_, INT64_MAX);
+  qel_testkit_wait(kit_, INT64_MAX);
+  send("CurrentTimeRequest", "requestId: 1");
+  EXPECT_NE(received()[1].find("currentTimeMillis: 9223372036854775807"), std::string::npos);
+}
+
+TEST_F(TestKit, InAnyOrder_TakesTheMessagesAsTheyCome) {
+  start_signed_in(
+      "in any order { expect CurrentTimeRequest answer { requestId: 9 } "
+      "expect GetAllReadAckRequest }\nexpect GetAllUnreadMessageRequest");
+  send("GetAllReadAckRequest", "requestId: 1");
+  EXPECT_EQ(received(), (Lines{"GetAllReadAckReply: requestId: 1 result { code: 0 msg: \"ok\" }"}));
+  send("CurrentTimeRequest", "requestId: 2");
+  EXPECT_EQ(received(), (Lines{"CurrentTimeReply: requestId: 9 result { code: 0 msg: \"ok\" } "
+                               "currentTimeMillis: 1700000100000"}));
+  EXPECT_EQ(end(), "Line 2 expects a GetAllUnreadMessageRequest, which never came.\n");
+}
+
+TEST_F(TestKit, InAnyOrder_PrefersWhatFits) {
+  start_signed_in(
+      "in any order { expect InviteRequest { invitingMembers: 6001 } expect InviteRequest { "
+      "invitingMembers: 6007 } }");
+  send("InviteRequest", "requestId: 1 chatroomId: 42 invitingMembers: 6007");
+  EXPECT_EQ(report(), "");
+  send("InviteRequest", "requestId: 2 chatroomId: 42 invitingMembers: 6002");
+  EXPECT_EQ(end(),
+            "Message 2 of the plug-in, an InviteRequest, is not what line 1 expects: "
+            "invitingMembers[0] is 6002 instead of 6001.\n");
+}
+
+TEST_F(TestKit, InAnyOrder_WhatIsMissingIsReported) {
+  start_signed_in(
+      "strict in any order {\nexpect CurrentTimeRequest\nexpect GetAllReadAckRequest }");
+  send("IsTyping", "requestId: 1 chatroomId: 42 state: 'x'");
+  send("CurrentTimeRequest", "requestId: 2");
+  EXPECT_EQ(end(),
+            "Message 1 of the plug-in, an IsTyping, is not expected: line 2 expects a "
+            "CurrentTimeRequest, line 3 expects a GetAllReadAckRequest.\n"
+            "Line 3 expects a GetAllReadAckRequest, which never came.\n");
+}
+
+TEST_F(TestKit, AnswerToAnEarlierRequest_BelongsToIt) {
+  start_signed_in(
+      "expect CurrentTimeRequest called clock expect GetAllReadAckRequest answer answer to clock "
+      "{ !result }");
+  send("CurrentTimeRequest", "requestId: 1");
+  send("GetAllReadAckRequest", "requestId: 2");
+  EXPECT_EQ(received(), (Lines{"GetAllReadAckReply: requestId: 2 result { code: 0 msg: \"ok\" }",
+                               "CurrentTimeReply: requestId: 1 currentTimeMillis: 1700000100000"}));
+}
+
+TEST_F(TestKit, AnswerToARequestThatDidNotCome_IsReported) {
+  start_signed_in(
+      "in any order { expect CurrentTimeRequest called clock\n"
+      "expect GetAllReadAckRequest answer to clock }");
+  send("GetAllReadAckRequest", "requestId: 2");
+  EXPECT_EQ(report(), "Line 2 answers a request that did not come yet.\n");
+}
+
+TEST_F(TestKit, EmptyList_IsOneThatIsNotThere) {
+  start_signed_in(
+      "push ForwardUnreadMessage { inboxEntries: [] } expect EndChatRequest { endChatEntries: [] "
+      "}");
+  EXPECT_EQ(received(), (Lines{"ForwardUnreadMessage: requestId: 700001"}));
+  send("EndChatRequest", "requestId: 1 endChatEntries { chatroomId: 42 }");
+  EXPECT_EQ(report(),
+            "Message 1 of the plug-in, an EndChatRequest, is not what line 1 expects: "
+            "endChatEntries should not be there.\n");
+}
+
+TEST_F(TestKit, ManyDifferences_AreCounted) {
+  start_signed_in("expect InviteRequest { invitingMembers: [1, 2, 3, 4, 5, 6, 7] }");
+  send("InviteRequest",
+       "requestId: 1 chatroomId: 42 invitingMembers: [11, 12, 13, 14, 15, 16, 17]");
+  EXPECT_NE(report().find("invitingMembers[4] is 15 instead of 5; and 2 more.\n"),
+            std::string::npos)
+      << report();
+}
+
+TEST_F(TestKit, SameMistake_IsSaidOnce) {
+  start_signed_in("always CurrentTimeRequest { !requestId }");
+  for (const char* id : {"requestId: 1", "requestId: 2", "requestId: 3"}) {
+    send("CurrentTimeRequest", id);
+  }
+  EXPECT_EQ(end(),
+            "Message 1 of the plug-in, a CurrentTimeRequest, is not what line 1 requires: "
+            "requestId should not be there. And 2 more times.\n");
+}
+
+TEST_F(TestKit, WhatSeveralRequire_IsSaidOnce) {
+  start_signed_in("always AllowChatRequest { chatroomId } expect AllowChatRequest { chatroomId }");
+  send("AllowChatRequest", "requestId: 1");
+  EXPECT_EQ(end(),
+            "Message 1 of the plug-in, an AllowChatRequest, is wrong: chatroomId is missing.\n");
 }
 
 TEST_F(TestKit, BytesThatAreNoSuchMessage_AreReported) {
@@ -505,6 +847,76 @@ TEST_F(TestKit, PushThatIsNotAnswered_IsReported) {
   EXPECT_EQ(end(), "The ClientEcho with the requestId 5 was not answered by a ClientEchoReply.\n");
 }
 
+TEST_F(TestKit, PushThatIsAnsweredTwice_IsReported) {
+  start_signed_in("push ClientEcho { requestId: 5 }");
+  received();
+  send("ClientEchoReply", "requestId: 5");
+  EXPECT_EQ(report(), "");
+  send("ClientEchoReply", "requestId: 5");
+  EXPECT_EQ(end(),
+            "Message 2 of the plug-in, a ClientEchoReply, is wrong: the message with the requestId "
+            "5 was answered before.\n");
+}
+
+TEST_F(TestKit, PushThatComesTwice_MayBeAnsweredTwice) {
+  start_signed_in("push ClientEcho { requestId: 5 } twice");
+  received();
+  send("ClientEchoReply", "requestId: 5");
+  send("ClientEchoReply", "requestId: 5");
+  EXPECT_EQ(end(), "");
+}
+
+TEST_F(TestKit, AnswerWithAnotherChatroom_IsReported) {
+  start_signed_in("push ForwardOnlineMessage { requestId: 5 chatroomId: 43 }");
+  received();
+  send("ForwardOnlineMessageReply", "requestId: 5 chatroomId: 42");
+  EXPECT_EQ(
+      end(),
+      "Message 1 of the plug-in, a ForwardOnlineMessageReply, is wrong: its chatroomId is not "
+      "that of the message.\n");
+}
+
+TEST_F(TestKit, PushThatWantsNoAnswer_HasNone) {
+  start_signed_in("push ForwardOnlineMessage { requestId: 5 chatroomId: 42 skipReply: true }");
+  received();
+  EXPECT_EQ(report(), "");
+  send("ForwardOnlineMessageReply", "requestId: 5 chatroomId: 42");
+  EXPECT_EQ(end(),
+            "Message 1 of the plug-in, a ForwardOnlineMessageReply, is wrong: the message with the "
+            "requestId 5 wants no answer.\n");
+}
+
+TEST_F(TestKit, BrokenPush_MayBeAnsweredAsItCanBeRead) {
+  start_signed_in("push ClientEcho { requestId: 5 } corrupt byte 1");
+  received_bytes();
+  EXPECT_EQ(report(), "");
+  send_bytes("ClientEchoReply", "\x08\x7a");  // with one more byte, which is another number
+  EXPECT_NE(report().find("it answers nothing"), std::string::npos);
+}
+
+TEST_F(TestKit, PushThatCannotBeRead_IsNotAnswered) {
+  start_signed_in("push ClientEcho { requestId: 5 } cut at 1");
+  received_bytes();
+  send("ClientEchoReply", "requestId: 0");
+  EXPECT_EQ(end(),
+            "Message 1 of the plug-in, a ClientEchoReply, is wrong: it answers nothing: no such "
+            "message with the requestId 0 was sent.\n");
+}
+
+TEST_F(TestKit, PushBeforeTheLogin_ComesBehindItsReply) {
+  start("push ClientEcho expect ChannelAuthRequest");
+  EXPECT_EQ(received(), Lines{});
+  send("ChannelAuthRequest",
+       "requestId: 1 userId: 5001 deviceId: 7 appId: 'a' accessToken: 'example-access-token'");
+  EXPECT_EQ(received(), (Lines{"ChannelAuthReply: requestId: 1 result { code: 0 msg: \"welcome\" }",
+                               "ClientEcho: requestId: 700001"}));
+}
+
+TEST_F(TestKit, PushWithoutALogin_IsReported) {
+  start("push ClientEcho");
+  EXPECT_EQ(end(), "Line 1 pushes a ClientEcho, but the plug-in did not sign in.\n");
+}
+
 TEST_F(TestKit, NumbersOutsideAnEnumerationAndUnknownFields_AreDelivered) {
   start_signed_in(
       "push ForwardOnlineMessage { skipReply: true inboxEntry { msgType: 77 98 { 1: 5 } } "
@@ -531,7 +943,6 @@ const Fault kFaults[] = {
     {"Twice", "twice", {"\x08\x05", "\x08\x05"}},
     {"Dropped", "dropped", {}},
     {"Cut", "cut at 1", {"\x08"}},
-    {"CutBehindTheEnd", "cut at 3", {"\x08\x05"}},
     {"Corrupt", "corrupt byte 1", {"\x08\xfa"}},
     {"CutAndTwice", "cut at 1 twice", {"\x08", "\x08"}},
 };
@@ -545,6 +956,37 @@ TEST_P(FaultOfADelivery, ChangesWhatThePluginReceives) {
 
 INSTANTIATE_TEST_SUITE_P(Each, FaultOfADelivery, ::testing::ValuesIn(kFaults),
                          [](const auto& row) { return row.param.name; });
+
+struct UselessFault {
+  const char* name;
+  const char* fault;
+  const char* what;
+};
+
+const UselessFault kUselessFaults[] = {
+    {"CutBehindTheEnd", "cut at 2", "cuts it at 2"},
+    {"CorruptBehindTheEnd", "corrupt byte 2", "corrupts the byte 2"},
+    {"CorruptBehindTheCut", "cut at 1 corrupt byte 1", "corrupts the byte 1"},
+    {"ItsOwnName", "as ClientEcho", "delivers it under its own name"},
+};
+
+class FaultThatChangesNothing : public TestKit,
+                                public ::testing::WithParamInterface<UselessFault> {};
+
+TEST_P(FaultThatChangesNothing, IsReported) {
+  start_signed_in(std::string("push ClientEcho { requestId: 5 } ") + GetParam().fault);
+  EXPECT_EQ(report(), std::string("Line 1 delivers a ClientEcho of 2 bytes, and ") +
+                          GetParam().what + ", which changes nothing.\n");
+}
+
+INSTANTIATE_TEST_SUITE_P(Each, FaultThatChangesNothing, ::testing::ValuesIn(kUselessFaults),
+                         [](const auto& row) { return row.param.name; });
+
+TEST_F(TestKit, MessageThatIsNotTaken_IsReported) {
+  start_signed_in("push TypingUpdated");
+  EXPECT_FALSE(qel_testkit_end(kit_));
+  EXPECT_EQ(report(), "A TypingUpdated was due, but the test did not take it.\n");
+}
 
 TEST_F(TestKit, LateMessage_ComesWhenItsTimeHasCome) {
   start_signed_in("push ClientEcho after 5s push TypingUpdated after 200ms");
@@ -604,9 +1046,9 @@ struct Misread {
 
 const Misread kMisread[] = {
     {"Word", "expekt ChatRequest",
-     "line 1, column 1: expected 'expect', 'answer', 'push', 'at most', 'never', 'always', "
-     "'strict' "
-     "or 'world', but here is 'expekt'"},
+     "line 1, column 1: expected 'expect', 'in any order', 'answer', 'push', 'at most', 'never', "
+     "'always', 'strict' or 'world', or behind a message to deliver 'after', 'twice', 'dropped', "
+     "'swapped with the next', 'cut at', 'corrupt byte' or 'as', but here is 'expekt'"},
     {"MessageName", "# one\n  expect ChatRequests",
      "line 2, column 10: there is no message "
      "'ChatRequests'"},
@@ -623,7 +1065,7 @@ const Misread kMisread[] = {
      "line 1, column 35: this is no value of the field 'contentType': Unknown enumeration value of "
      "\"TEXT\" for field \"contentType\""},
     {"Brace", "expect ChatRequest { chatroomId: 1",
-     "line 1, column 35: expected the name of a field, but the text ends"},
+     "line 1, column 35: expected the name of a field, or '}', but the text ends"},
     {"FieldTwice", "expect ChatRequest { chatroomId: 1 chatroomId: 2 }",
      "line 1, column 36: the field 'chatroomId' is there twice"},
     {"AnswerToNothing", "push ClientEcho answer",
@@ -633,7 +1075,44 @@ const Misread kMisread[] = {
      "line 1, column 24: IsTyping has no reply, so this answer needs a name, but here is '{'"},
     {"NoValueToDeliver", "push ClientEcho { requestId }",
      "line 1, column 1: the field 'requestId' of a message to deliver needs a value"},
-    {"Time", "push ClientEcho after 5", "line 1, column 24: expected 'ms', but the text ends"},
+    {"Time", "push ClientEcho after 5",
+     "line 1, column 24: expected 's' or 'ms' behind the number, but the text ends"},
+    {"TimeWithAPoint", "push ClientEcho after 1.5s",
+     "line 1, column 23: expected a time such as 5s or 200ms, but here is '1.5'"},
+    {"TimeInMinutes", "push ClientEcho after 2m",
+     "line 1, column 24: expected 's' or 'ms' behind the number, but here is 'm'"},
+    {"OctalNumber", "push ClientEcho cut at 010",
+     "line 1, column 24: expected a number of bytes, but here is '010'"},
+    {"FaultTwice", "push ClientEcho twice after 1s twice",
+     "line 1, column 32: 'twice' is there twice"},
+    {"DroppedAndMore", "push ClientEcho twice dropped",
+     "line 1, column 23: nothing else can happen to a message that is dropped"},
+    {"AbsentAndPresent", "expect ChatRequest { !chatroomId chatroomId: 5 }",
+     "line 1, column 34: the field 'chatroomId' is there twice"},
+    {"PresentAndAbsent", "expect InviteRequest { invitingMembers: 5 !invitingMembers }",
+     "line 1, column 44: the field 'invitingMembers' is there twice"},
+    {"FieldNumberOfTheSchema", "push ClientEcho { 1: 5 }",
+     "line 1, column 19: the field 1 is known: write its name, 'requestId'"},
+    {"FieldNumberTooLarge", "push ClientEcho { 536870912: 5 }",
+     "line 1, column 19: fields have numbers from 1 to 536870911"},
+    {"FieldNumberZero", "push ClientEcho { 0: 5 }",
+     "line 1, column 19: fields have numbers from 1 to 536870911"},
+    {"MessageOfTheService", "expect ChatReply",
+     "line 1, column 8: a plug-in does not send 'ChatReply'"},
+    {"NeverOfTheService", "never ClientEcho",
+     "line 1, column 7: a plug-in does not send 'ClientEcho'"},
+    {"MessageOfThePlugin", "push ChatRequest",
+     "line 1, column 1: the service does not send 'ChatRequest'"},
+    {"NameTwice", "expect ChatRequest called a expect ChatRequest called a",
+     "line 1, column 55: the name 'a' is that of another request, or of a reply"},
+    {"NameOfNothing", "expect ChatRequest answer to a",
+     "line 1, column 30: no request before is called 'a'"},
+    {"AnyOrderWithoutExpectations", "in any order { push ClientEcho }",
+     "line 1, column 16: expected 'expect' or '}', but here is 'push'"},
+    {"AnyOrderInAnother", "in any order { expect ChatRequest in any order { } }",
+     "line 1, column 35: expected 'expect', 'in any order', 'answer', 'push', 'at most', 'never', "
+     "'always', 'strict' or 'world', or behind a message to deliver 'after', 'twice', 'dropped', "
+     "'swapped with the next', 'cut at', 'corrupt byte' or 'as', but here is 'in'"},
     {"Quote", "push TypingUpdated { state: 'x", "line 1, column 31: Unexpected end of string"},
 };
 
@@ -654,6 +1133,11 @@ TEST_F(TestKit, ScenarioOfManyMessagesInEachOther_IsRefused) {
   }
   start(scenario.c_str());
   EXPECT_NE(report().find("too many messages in each other"), std::string::npos);
+}
+
+TEST_F(TestKit, ScenarioWithAByteOrderMark_IsRead) {
+  start("\xef\xbb\xbfworld { isSignedIn: true } push TypingUpdated");
+  EXPECT_EQ(received().size(), 1U);
 }
 
 TEST_F(TestKit, KitWithoutAScenario_DoesNothing) {
