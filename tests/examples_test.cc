@@ -296,24 +296,12 @@ const PluginMistake kPluginMistakes[] = {
     {"UnknownField", false, "ChannelAuthRequest", auth().number(1000, 1),
      "Message 1 of the plug-in, a ChannelAuthRequest, is wrong: it has fields or values that the "
      "schema does not have."},
-    {"Imei", false, "ChannelAuthRequest", auth().text(4, "1"),
-     "Message 1 of the plug-in, a ChannelAuthRequest, is wrong: IMEI should not be there."},
     {"WrongToken", false, "ChannelAuthRequest", auth().text(6, "wrong"),
      "Message 1 of the plug-in, a ChannelAuthRequest, is wrong: it has another access token than "
      "the service."},
     {"RequestBeforeAuthentication", false, "CurrentTimeRequest", Fields().number(11, 1),
-     "Message 1 of the plug-in, a CurrentTimeRequest, is wrong: it comes before the "
-     "authentication."},
-    {"RequestIdAgain", true, "CurrentTimeRequest", Fields().number(11, 1),
-     "Message 2 of the plug-in, a CurrentTimeRequest, is wrong: its requestId 1 is not above the "
-     "one before, which was 1."},
-    {"ChatMessageWithoutLifetime", true, "ChatRequest",
-     Fields().number(11, 2).number(12, 42).message(13,
-                                                   Fields().number(1, 3).number(2, 0).text(3, "x")),
-     "Message 2 of the plug-in, a ChatRequest, is wrong: chatMessageParams[0].msgTtl is missing."},
-    {"SendersIds", true, "CurrentTimeRequest", Fields().number(1, 5001).number(11, 2),
-     "Message 2 of the plug-in, a CurrentTimeRequest, is wrong: it has ids of the sender, which "
-     "the connection has already."},
+     "Message 1 of the plug-in, a CurrentTimeRequest, is wrong: it comes before the login "
+     "was granted."},
     {"AnotherChatroom", true, "IsTyping", Fields().number(11, 2).number(12, 43).text(13, "typing"),
      "Message 2 of the plug-in, an IsTyping, is wrong: there is no chatroom 43, or the user has "
      "left it."},
@@ -321,14 +309,8 @@ const PluginMistake kPluginMistakes[] = {
      Fields().number(11, 2).number(12, 42).text(13, "x").number(16, 1),
      "Message 2 of the plug-in, a ChangeChatroomMetaRequest, is wrong: it should change the title "
      "or the lifetime, one of them."},
-    {"TextOfAReadMessage", true, "ReadMessageRequest",
-     Fields().number(11, 2).number(12, 42).message(
-         13, Fields().number(1, 1).number(2, 0).number(3, 6001).number(5, 1).text(6, "x")),
-     "Message 2 of the plug-in, a ReadMessageRequest, is wrong: inboxEntry.chatMsg should not be "
-     "there."},
     {"MessageOfTheService", true, "ChatReply", Fields(),
-     "Message 2 of the plug-in, a ChatReply, is wrong: it answers nothing: no such message with "
-     "the requestId 0 was sent."},
+     "Message 2 of the plug-in, a ChatReply, is wrong: a plug-in does not send it."},
 };
 
 class FrontEndWithMistake : public FrontEnd, public ::testing::WithParamInterface<PluginMistake> {};
