@@ -98,7 +98,8 @@ void qel_testkit_wait(qel_testkit_t* kit, int64_t milliseconds);
 bool qel_testkit_end(qel_testkit_t* kit);
 
 /**
- * What went wrong so far: a sentence in each line, "" if nothing. It never has the access token.
+ * What went wrong so far: a sentence in each line, "" if nothing. It never has an access token,
+ * unless that is shorter than 8 bytes.
  *
  * @return a text that is valid until the next call with the kit
  */
