@@ -22,7 +22,9 @@ struct Spoken {
 class Play {
  public:
   // The kit is the play's.
-  Play(qel_testkit_t* kit, bug_t bug) : kit_(kit) {
+  explicit Play(qel_testkit_t* kit, bug_t bug = BUG_NONE, manner_t manner = ONE_BY_ONE)
+      : kit_(kit) {
+    plugin_.manner = manner;
     plugin_.bug = bug;
     plugin_.context = this;
     plugin_.send = [](void* play, const char* message, const unsigned char* data, int size) {
@@ -41,7 +43,7 @@ class Play {
       if (qel_testkit_next(kit_, &delivery)) {
         note(false, delivery.message, delivery.data, delivery.size);
         plugin_receive(&plugin_, delivery.message, delivery.data, delivery.size);
-      } else if (plugin_.timer > 0 || delivery.after_ms > 0) {
+      } else if (plugin_timer(&plugin_) > 0 || delivery.after_ms > 0) {
         wait(delivery.after_ms);
       } else {
         break;
@@ -67,8 +69,9 @@ class Play {
 
   // Until something comes, or the plug-in has waited long enough.
   void wait(int64_t after_ms) {
-    const bool is_plugin_first = plugin_.timer > 0 && (after_ms < 0 || plugin_.timer < after_ms);
-    const int64_t milliseconds = is_plugin_first ? plugin_.timer : after_ms;
+    const int timer = plugin_timer(&plugin_);
+    const bool is_plugin_first = timer > 0 && (after_ms < 0 || timer < after_ms);
+    const int64_t milliseconds = is_plugin_first ? timer : after_ms;
     qel_testkit_wait(kit_, milliseconds);
     plugin_wait(&plugin_, static_cast<int>(milliseconds));
   }
