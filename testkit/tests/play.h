@@ -22,10 +22,12 @@ struct Spoken {
 class Play {
  public:
   // The kit is the play's.
-  explicit Play(qel_testkit_t* kit, bug_t bug = BUG_NONE, manner_t manner = ONE_BY_ONE)
+  explicit Play(qel_testkit_t* kit, bug_t bug = BUG_NONE, manner_t manner = ONE_BY_ONE,
+                int left_out = 0)
       : kit_(kit) {
     plugin_.manner = manner;
     plugin_.bug = bug;
+    plugin_.left_out = left_out;
     plugin_.context = this;
     plugin_.send = [](void* play, const char* message, const unsigned char* data, int size) {
       static_cast<Play*>(play)->send(message, data, size);

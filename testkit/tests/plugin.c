@@ -533,6 +533,7 @@ static void make_mistake(plugin_t* plugin, const char* message, const unsigned c
 
 void plugin_start(plugin_t* plugin) {
   plugin->next_id = manners[plugin->manner].first_id;
+  plugin->begun = plugin->settled = plugin->left_out;
   go_on(plugin);
 }
 

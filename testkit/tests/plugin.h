@@ -93,10 +93,11 @@ enum {
 typedef struct plugin {
   manner_t manner;
   bug_t bug;
+  int left_out; /* steps: a bit for each, as in all sets of them */
   void (*send)(void* context, const char* message, const unsigned char* data, int size);
   void* context;
 
-  int begun, settled, repeated;    /* a bit for each step */
+  int begun, settled, repeated;
   int64_t request_ids[STEP_COUNT]; /* each step's last */
   int timers[STEP_COUNT];          /* milliseconds until it is given up; 0: never */
   int64_t next_id;
@@ -105,7 +106,7 @@ typedef struct plugin {
   qel_message_inboxentry_t pushed; /* the last, without its text */
 } plugin_t;
 
-/* Of a plug-in that is zeroed, but for its first four members. */
+/* Of a plug-in that is zeroed, but for its first five members. */
 void plugin_start(plugin_t* plugin);
 void plugin_receive(plugin_t* plugin, const char* message, const unsigned char* data, int size);
 void plugin_wait(plugin_t* plugin, int milliseconds);

@@ -22,7 +22,8 @@ std::string report_of(const std::string& scenario, bug_t bug, manner_t manner = 
   std::ifstream file(QEL_SCENARIOS "/" + scenario + ".scenario");
   EXPECT_TRUE(file.good()) << scenario;
   const std::string text{std::istreambuf_iterator<char>(file), {}};
-  return Play(qel_testkit_new(text.c_str()), bug, manner).run();
+  const int left_out = scenario == "count-without-array" ? 1 << STEP_INVITE : 0;
+  return Play(qel_testkit_new(text.c_str()), bug, manner, left_out).run();
 }
 
 std::vector<std::string> all_scenarios() {
@@ -63,7 +64,7 @@ struct Mistake {
 };
 
 const Mistake kMistakes[] = {
-    {BUG_SAME_ID_AGAIN, "late-answer",
+    {BUG_SAME_ID_AGAIN, "unanswered",
      "ChatRequest, is wrong: its requestId 5 is that of another request"},
     {BUG_WAITS_FOR_EVER, "unanswered", "expects an EndChatRequest, which never came"},
     {BUG_USER_AND_DEVICE_SWAPPED, "connection", "its userId is 77"},
