@@ -15,38 +15,6 @@
 namespace qel_wire {
 namespace {
 
-constexpr char kVersion = 1;
-
-uint32_t number_in(std::string_view bytes, size_t offset, size_t size) {
-  uint32_t number = 0;
-  for (size_t i = size; i > 0; --i) {
-    number = number << 8U | static_cast<unsigned char>(bytes[offset + i - 1]);
-  }
-  return number;
-}
-
-// Nothing if the packet is no record, or one whose name is cut.
-std::optional<Record> record_in(std::string_view packet) {
-  constexpr size_t kHead = 12;
-  if (packet.size() < kHead || packet.substr(0, 4) != std::string("qel") + kVersion) {
-    return std::nullopt;
-  }
-  const uint32_t direction = number_in(packet, 8, 1);
-  const uint32_t outcome = number_in(packet, 9, 1);
-  const size_t begin = kHead + number_in(packet, 10, 2);
-  Record record;
-  record.number = number_in(packet, 4, 4);
-  if (record.number == 0 || direction < 1 || direction > 2 || outcome > 3 ||
-      packet.size() < begin) {
-    return std::nullopt;
-  }
-  record.use = direction == 1 ? Use::kSends : Use::kReceives;
-  record.outcome = static_cast<Outcome>(outcome);
-  record.name = packet.substr(kHead, begin - kHead);
-  record.bytes = packet.substr(begin);
-  return record;
-}
-
 // Reads section after section. Behind a place that cannot be read, the next section is looked for.
 class Reading {
  public:
@@ -86,15 +54,17 @@ class Reading {
   }
 
   void take(const pcap_pkthdr& header, std::string_view packet) {
-    std::optional<Record> record = record_in(packet);
+    const std::optional<session_file::Record> record = session_file::record_in(packet);
     if (!record.has_value()) {
       ++others_;
       is_of_other_version_ = packet.substr(0, 3) == "qel" && packet.substr(3, 1) != "\1";
       return;
     }
-    record->time = time_of(header.ts);
-    record->missing = header.len - header.caplen;
-    recording_.records.push_back(std::move(*record));
+    recording_.records.push_back(
+        {record->number,
+         record->direction == session_file::Direction::kSent ? Use::kSends : Use::kReceives,
+         record->outcome, time_of(header.ts), std::string(record->name),
+         std::string(record->message), header.len - header.caplen});
   }
 
   // Goes to the next section that can be opened. What lies before it cannot be read for that

@@ -8,12 +8,12 @@
 #include <string>
 #include <vector>
 
+#include "qel-trace/record.h"
 #include "schema.h"
 
 namespace qel_wire {
 
-// How the call ended that made a message or took one.
-enum class Outcome { kNotEnded, kDone, kRefused, kNotKnown };
+using session_file::Outcome;
 
 struct Record {
   uint32_t number = 0;  // from 1, but the file may have lost the first ones
