@@ -1,10 +1,10 @@
 #include "session.h"
 
 #include <cstdint>
-#include <cstring>
 #include <map>
 
 #include "messages.h"
+#include "qel-trace/record.h"
 #include "report.h"
 
 namespace testkit {
@@ -17,10 +17,8 @@ constexpr uint32_t kInterface = 1;
 constexpr uint32_t kPacket = 6;
 constexpr uint32_t kLinkType = 147;
 
-// Of a record.
-constexpr size_t kHead = 12;
-enum Direction { kSent = 1, kReceived = 2 };
-constexpr unsigned kRefused = 2;
+using session_file::Direction;
+using session_file::Outcome;
 
 uint32_t number(std::string_view bytes, size_t at, size_t size, bool is_big_endian) {
   uint32_t result = 0;
@@ -31,26 +29,32 @@ uint32_t number(std::string_view bytes, size_t at, size_t size, bool is_big_endi
   return result;
 }
 
-struct Record {
-  unsigned direction;
-  unsigned end;
+bool has_order(std::string_view section, bool is_big_endian) {
+  return section.size() >= 12 && number(section, 8, 4, is_big_endian) == kByteOrder;
+}
+
+bool is_section(std::string_view bytes) {
+  return (has_order(bytes, false) || has_order(bytes, true)) &&
+         number(bytes, 0, 4, false) == kSection;
+}
+
+struct Packet {
+  session_file::Record record;
   bool is_cut;
-  std::string name;
-  std::string_view bytes;
 };
 
 // The records by their numbers: a ring's file has them in another order.
 class Reader {
  public:
-  explicit Reader(std::string_view bytes) : rest_(bytes) {}
+  explicit Reader(std::string_view bytes) : bytes_(bytes), rest_(bytes) {}
 
-  std::map<uint32_t, Record> read() {
-    if (rest_.size() < 12 || number(rest_, 0, 4, false) != kSection) {
+  std::map<uint32_t, Packet> read() {
+    if (!is_section(rest_)) {
       throw Unreadable{"it is no pcapng file"};
     }
     while (block()) {
     }
-    return std::move(records_);
+    return std::move(packets_);
   }
 
  private:
@@ -59,19 +63,18 @@ class Reader {
     if (rest_.size() < 12) {
       return false;
     }
-    if (number(rest_, 0, 4, false) == kSection) {
-      is_big_endian_ = number(rest_, 8, 4, false) != kByteOrder;
-      if (number(rest_, 8, 4, is_big_endian_) != kByteOrder) {
-        throw Unreadable{"it is no pcapng file"};
-      }
+    if (is_section(rest_)) {
+      is_big_endian_ = has_order(rest_, true);
     }
     const uint32_t type = word(0);
     const uint32_t length = word(4);
-    if (length < 12 || length % 4 != 0) {
-      throw Unreadable{"a block has a wrong length"};
-    }
-    if (length > rest_.size()) {
+    const bool is_cut_off = length > rest_.size() && !has_later_section();
+    if (is_cut_off) {
       return false;
+    }
+    if (length < 12 || length % 4 != 0 || length > rest_.size()) {
+      throw Unreadable{"the bytes from offset " + std::to_string(bytes_.size() - rest_.size()) +
+                       " on cannot be read"};
     }
     if (type == kInterface && length >= 20 && number(rest_, 8, 2, is_big_endian_) != kLinkType) {
       throw Unreadable{"it is a capture of something else"};
@@ -88,25 +91,29 @@ class Reader {
     if (captured > block_length - 32) {
       throw Unreadable{"a packet is longer than its block"};
     }
-    const std::string_view data = rest_.substr(28, captured);
-    if (data.size() < kHead || data.substr(0, 4) != std::string_view("qel\1", 4)) {
-      throw Unreadable{"a record is not of this format"};
+    const auto record = session_file::record_in(rest_.substr(28, captured));
+    if (!record.has_value()) {
+      throw Unreadable{"a packet is no record of this format"};
     }
-    const size_t name_end = kHead + number(data, 10, 2, false);
-    if (name_end > data.size()) {
-      throw Unreadable{"a record is shorter than its name"};
+    if (!packets_.emplace(record->number, Packet{*record, captured < word(24)}).second) {
+      throw Unreadable{"there are two records " + std::to_string(record->number)};
     }
-    records_[number(data, 4, 4, false)] = {static_cast<unsigned char>(data[8]),
-                                           static_cast<unsigned char>(data[9]), captured < word(24),
-                                           std::string(data.substr(kHead, name_end - kHead)),
-                                           data.substr(name_end)};
+  }
+
+  bool has_later_section() const {
+    size_t at = 0;
+    do {
+      at = rest_.find("\n\r\r\n", at + 1);
+    } while (at != std::string_view::npos && !is_section(rest_.substr(at)));
+    return at != std::string_view::npos;
   }
 
   uint32_t word(size_t at) const { return number(rest_, at, 4, is_big_endian_); }
 
+  std::string_view bytes_;
   std::string_view rest_;
   bool is_big_endian_ = false;
-  std::map<uint32_t, Record> records_;
+  std::map<uint32_t, Packet> packets_;
 };
 
 const google::protobuf::Descriptor& type_of(const std::string& name, const std::string& where) {
@@ -119,13 +126,14 @@ const google::protobuf::Descriptor& type_of(const std::string& name, const std::
   return *type;
 }
 
-Step step_of(const Record& record, const std::string& where) {
-  Step step{record.direction == kSent,
+Step step_of(const Packet& packet, const std::string& where) {
+  const session_file::Record& record = packet.record;
+  Step step{record.direction == Direction::kSent,
             where,
-            &type_of(record.name, where),
-            std::string(record.bytes),
+            &type_of(std::string(record.name), where),
+            std::string(record.message),
             {}};
-  if (record.is_cut) {
+  if (packet.is_cut) {
     throw Unreadable{where + " has a message that was cut off"};
   }
   if (step.was_sent) {
@@ -138,25 +146,29 @@ Step step_of(const Record& record, const std::string& where) {
   return step;
 }
 
+// A refused request was not sent.
+bool has_message(const session_file::Record& record) {
+  return record.direction == Direction::kReceived ||
+         (record.outcome != Outcome::kRefused && !record.message.empty());
+}
+
 }  // namespace
 
 std::vector<Step> read_session(std::string_view bytes) {
   std::vector<Step> steps;
   uint32_t last = 0;
-  for (const auto& [number, record] : Reader(bytes).read()) {
+  for (const auto& [number, packet] : Reader(bytes).read()) {
     const std::string where = "record " + std::to_string(number);
     if (number != last + 1) {
       throw Unreadable{"the records before " + where + " are lost"};
     }
     last = number;
-    if (record.direction != kSent && record.direction != kReceived) {
-      throw Unreadable{where + " has no direction"};
+    if (has_message(packet.record)) {
+      steps.push_back(step_of(packet, where));
     }
-    const bool was_sent =
-        record.direction == kReceived || (record.end != kRefused && !record.bytes.empty());
-    if (was_sent) {
-      steps.push_back(step_of(record, where));
-    }
+  }
+  if (steps.empty()) {
+    throw Unreadable{"it has no messages"};
   }
   return steps;
 }

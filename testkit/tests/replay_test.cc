@@ -167,6 +167,7 @@ TEST_F(Replay, FunctionsOfTheInterface_AreTheirMessages) {
 TEST_F(Replay, RefusedCall_HasSentNothing) {
   SessionFile file;
   file.record(1, kSent, kRefused, "chat_request_serialize", "");
+  file.record(2, kReceived, kDone, "ClientEcho", "");
   start(file);
   EXPECT_EQ(end(), "");
 }
@@ -203,6 +204,53 @@ TEST_F(Replay, LostRecords_AreSaid) {
   file.record(7, kReceived, kDone, "ClientEcho", "a");
   start(file);
   EXPECT_EQ(end(), "The session cannot be replayed: the records before record 7 are lost.\n");
+}
+
+TEST_F(Replay, RecordsOfOneNumber_AreSaid) {
+  SessionFile file;
+  file.record(1, kReceived, kDone, "ClientEcho", "a");
+  file.record(1, kReceived, kDone, "ClientEcho", "b");
+  start(file);
+  EXPECT_EQ(end(), "The session cannot be replayed: there are two records 1.\n");
+}
+
+TEST_F(Replay, SessionWithoutMessages_IsSaid) {
+  SessionFile file;
+  file.record(1, kSent, kRefused, "chat_request_serialize", "");
+  start(file);
+  EXPECT_EQ(end(), "The session cannot be replayed: it has no messages.\n");
+}
+
+TEST_F(Replay, BlockThatBreaksOffBeforeALaterSection_IsSaid) {
+  SessionFile file;
+  file.record(kReceived, "ClientEcho", "a");
+  const size_t broken = file.bytes.size();
+  file.record(kReceived, "ClientEcho", "b");
+  file.bytes[broken + 6] = 1;  // its length
+  start(file);
+  EXPECT_EQ(end(), "") << "it could be the end";
+  file.section();
+  start(file);
+  EXPECT_EQ(end(), "The session cannot be replayed: the bytes from offset " +
+                       std::to_string(broken) + " on cannot be read.\n");
+}
+
+TEST_F(Replay, BlockOfNoWholeLength_IsSaid) {
+  SessionFile file;
+  file.record(kReceived, "ClientEcho", "a");
+  const size_t broken = file.bytes.size();
+  file.record(kReceived, "ClientEcho", "b");
+  file.bytes[broken + 4] = 8;  // its length
+  start(file);
+  EXPECT_EQ(end(), "The session cannot be replayed: the bytes from offset " +
+                       std::to_string(broken) + " on cannot be read.\n");
+}
+
+TEST_F(Replay, PacketThatIsNoRecord_IsSaid) {
+  SessionFile file;
+  file.record(1, 3, kDone, "ClientEcho", "a");
+  start(file);
+  EXPECT_EQ(end(), "The session cannot be replayed: a packet is no record of this format.\n");
 }
 
 TEST_F(Replay, MessageThatWasCutOff_IsSaid) {
