@@ -7,6 +7,8 @@ namespace {
 
 using google::protobuf::Descriptor;
 using google::protobuf::DescriptorPool;
+using google::protobuf::FieldDescriptor;
+using google::protobuf::Message;
 using google::protobuf::MessageFactory;
 
 constexpr char kReply[] = "Reply";
@@ -24,13 +26,12 @@ const Descriptor* message_type(const std::string& name) {
   return type != nullptr && type->file()->package().empty() ? type : nullptr;
 }
 
-std::unique_ptr<google::protobuf::Message> new_message(const Descriptor& type) {
-  return std::unique_ptr<google::protobuf::Message>(
-      MessageFactory::generated_factory()->GetPrototype(&type)->New());
+std::unique_ptr<Message> new_message(const Descriptor& type) {
+  return std::unique_ptr<Message>(MessageFactory::generated_factory()->GetPrototype(&type)->New());
 }
 
-std::unique_ptr<google::protobuf::Message> copy_of(const google::protobuf::Message& message) {
-  std::unique_ptr<google::protobuf::Message> copy(message.New());
+std::unique_ptr<Message> copy_of(const Message& message) {
+  std::unique_ptr<Message> copy(message.New());
   copy->CopyFrom(message);
   return copy;
 }
@@ -41,6 +42,23 @@ Messages copies_of(const Messages& messages) {
     copies.push_back(copy_of(*message));
   }
   return copies;
+}
+
+bool has(const Message& message, const char* name) {
+  const FieldDescriptor* field = message.GetDescriptor()->FindFieldByName(name);
+  return field != nullptr && message.GetReflection()->HasField(message, field);
+}
+
+int64_t number_in(const Message& message, const char* name) {
+  const FieldDescriptor* field = message.GetDescriptor()->FindFieldByName(name);
+  return field == nullptr ? 0 : message.GetReflection()->GetInt64(message, field);
+}
+
+void set_number(Message* message, const char* name, int64_t number) {
+  const FieldDescriptor* field = message->GetDescriptor()->FindFieldByName(name);
+  if (field != nullptr) {
+    message->GetReflection()->SetInt64(message, field, number);
+  }
 }
 
 const std::map<std::string, std::string>& messages_of_functions() {

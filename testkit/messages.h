@@ -5,6 +5,7 @@
 #include <google/protobuf/descriptor.h>
 #include <google/protobuf/message.h>
 
+#include <cstdint>
 #include <map>
 #include <memory>
 #include <string>
@@ -37,6 +38,11 @@ void visit(const google::protobuf::Message& message, const Function& function) {
   };
   static_cast<void>((is_visited(static_cast<const Types*>(nullptr)) || ...));
 }
+
+// A field of any message, by its name. Where there is none, nothing is there, or 0, or set.
+bool has(const google::protobuf::Message& message, const char* name);
+int64_t number_in(const google::protobuf::Message& message, const char* name);
+void set_number(google::protobuf::Message* message, const char* name, int64_t number);
 
 // The message of each function of the C interface.
 const std::map<std::string, std::string>& messages_of_functions();

@@ -55,13 +55,14 @@ qel_testkit_t* qel_testkit_new(const char* scenario);
 
 /**
  * A service that repeats a recorded session: it expects the messages that were sent then, in the
- * same order, and delivers the bytes that were received then, at once. All fields are compared, but
- * an access token that the recorder has masked is any.
+ * same order, and delivers the bytes that were received then, at once. All fields are compared. Two
+ * may differ: the requestId of a request, which the recorded replies to it come with then, and an
+ * access token that the recorder has masked.
  *
  * @param session  the bytes of a session file, which are copied. Its end may be missing.
  * @param size     how many
  * @param ignored  names of fields that are not compared, wherever they stand in a message, with
- *                 blanks between them, for example "clientTime msgId"; NULL for none
+ *                 blanks between them, for example "sentTime msgId"; NULL for none
  * @return as of qel_testkit_new()
  */
 qel_testkit_t* qel_testkit_new_replay(const unsigned char* session, size_t size,

@@ -26,7 +26,6 @@ std::string joined(const std::vector<std::string>& parts) {
 }  // namespace
 
 void Secrets::add(const std::string& token) {
-  constexpr size_t kLeast = 8;
   if (token.size() >= kLeast) {
     tokens_.insert(token);
   }
@@ -54,8 +53,7 @@ void Report::put(const std::string& sentence, const std::string& kind) {
 }
 
 void Report::add(const std::string& sentence) {
-  const std::string shown = secrets.hidden_in(sentence);
-  put(shown, shown);
+  put(sentence, sentence);
 }
 
 void Report::add(const Subject& subject, const std::string& what,
@@ -73,8 +71,7 @@ void Report::add(const Subject& subject, const std::string& what,
   if (news.empty()) {
     return;
   }
-  const std::string kind =
-      with_article(subject.type->name()) + ", " + what + ": " + secrets.hidden_in(joined(news));
+  const std::string kind = with_article(subject.type->name()) + ", " + what + ": " + joined(news);
   put("Message " + std::to_string(subject.number) + " of the plug-in, " + kind + ".", kind);
 }
 
@@ -88,7 +85,8 @@ std::string Report::text() const {
     }
     text += "\n";
   }
-  return text + (is_full() ? "There is more, and nothing is delivered any longer.\n" : "");
+  text += is_full() ? "There is more, and nothing is delivered any longer.\n" : "";
+  return secrets.hidden_in(text);  // also a token that came later
 }
 
 std::string with_article(const std::string& name) {

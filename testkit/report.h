@@ -4,6 +4,7 @@
 
 #include <google/protobuf/descriptor.h>
 
+#include <cstddef>
 #include <set>
 #include <string>
 #include <vector>
@@ -13,7 +14,10 @@ namespace testkit {
 // The texts that are not to be shown, wherever they stand.
 class Secrets {
  public:
-  // Of an access token. A text of fewer than 8 bytes may be a part of any sentence, and is shown.
+  // A text of fewer bytes may be a part of any sentence, and is shown.
+  static constexpr size_t kLeast = 8;
+
+  // Of an access token.
   void add(const std::string& token);
   // The text with something else in the place of each token.
   std::string hidden_in(std::string text) const;

@@ -17,24 +17,6 @@ using google::protobuf::Message;
 
 enum ResultCode { kOk = 0, kSomeRefused = 1001, kBadToken = 2001, kSomeNotInvited = 3003 };
 
-bool has(const Message& message, const char* name) {
-  const FieldDescriptor* field = message.GetDescriptor()->FindFieldByName(name);
-  return field != nullptr && message.GetReflection()->HasField(message, field);
-}
-
-int64_t number_in(const Message& message, const char* name) {
-  const FieldDescriptor* field = message.GetDescriptor()->FindFieldByName(name);
-  return field == nullptr ? 0 : message.GetReflection()->GetInt64(message, field);
-}
-
-// If the message has such a field.
-void set_number(Message* message, const char* name, int64_t number) {
-  const FieldDescriptor* field = message->GetDescriptor()->FindFieldByName(name);
-  if (field != nullptr) {
-    message->GetReflection()->SetInt64(message, field, number);
-  }
-}
-
 void set_result(Message* reply, ResultCode code, const char* text) {
   const FieldDescriptor* field = reply->GetDescriptor()->FindFieldByName("result");
   if (field != nullptr) {

@@ -1,8 +1,11 @@
 // Recorded sessions that are played again.
 
+#include <google/protobuf/descriptor.h>
+#include <google/protobuf/message.h>
 #include <gtest/gtest.h>
 
 #include <cstdint>
+#include <memory>
 #include <string>
 #include <vector>
 
@@ -64,6 +67,16 @@ class SessionFile {
   uint32_t last_ = 0;
 };
 
+std::string field(int number, const std::string& text) {
+  return static_cast<char>(number << 3 | 2) + std::string(1, static_cast<char>(text.size())) + text;
+}
+std::string title(const std::string& text) {
+  return field(13, text);
+}
+std::string chat(const std::string& text) {
+  return field(13, field(3, text));
+}
+
 class Replay : public ::testing::Test {
  protected:
   ~Replay() override { qel_testkit_release(kit_); }
@@ -113,29 +126,98 @@ TEST_F(Replay, Session_IsExpectedAndDeliveredInItsOrder) {
 
 TEST_F(Replay, OtherFieldsAndMessages_AreReported) {
   SessionFile file;
-  file.record(kSent, "CurrentTimeRequest", "\x58\x01");
-  file.record(kSent, "CurrentTimeRequest", "\x58\x02");
-  file.record(kSent, "CurrentTimeRequest", "\x58\x03");
+  file.record(kSent, "CurrentTimeRequest", "\x10\x01");
+  file.record(kSent, "CurrentTimeRequest", "\x10\x02");
+  file.record(kSent, "CurrentTimeRequest", "\x10\x03");
   start(file);
   send("ClientEchoReply", "");
-  send("CurrentTimeRequest", "\x58\x05");
-  send("CurrentTimeRequest", "\x08\x05\x58\x02\x98\x06\x01");
+  send("CurrentTimeRequest", "\x08\x05\x10\x01\x98\x06\x01");
+  send("CurrentTimeRequest", "\x10\x05");
   EXPECT_EQ(end(),
             "Message 1 of the plug-in, a ClientEchoReply, is not expected: record 1 expects a "
             "CurrentTimeRequest.\n"
-            "Message 2 of the plug-in, a CurrentTimeRequest, is not what record 1 expects: "
-            "requestId is 5 instead of 1.\n"
-            "Message 3 of the plug-in, a CurrentTimeRequest, is not what record 2 expects: userId "
+            "Message 2 of the plug-in, a CurrentTimeRequest, is not what record 1 expects: userId "
             "should not be there; the unknown field 99 should not be there.\n"
+            "Message 3 of the plug-in, a CurrentTimeRequest, is not what record 2 expects: "
+            "deviceId is 5 instead of 2.\n"
             "Record 3 expects a CurrentTimeRequest, which never came.\n");
 }
 
 TEST_F(Replay, IgnoredFields_MayDiffer) {
   SessionFile file;
-  file.record(kSent, "CurrentTimeRequest", "\x08\x07\x58\x01");
+  file.record(kSent, "ClientEchoReply", "\x08\x07");
   start(file, "deviceId  requestId userId");
-  send("CurrentTimeRequest", "\x58\x05");
+  send("ClientEchoReply", "\x08\x05");
   EXPECT_EQ(end(), "");
+}
+
+TEST_F(Replay, IgnoredNameOfNoField_IsSaid) {
+  SessionFile file;
+  file.record(kSent, "ClientEchoReply", "\x08\x07");
+  start(file, "deviceId sendTime");
+  EXPECT_EQ(end(), "The session cannot be replayed: there is no field 'sendTime'.\n");
+}
+
+TEST_F(Replay, RequestOfAnotherId_IsAnsweredWithItsOwn) {
+  SessionFile file;
+  file.record(kSent, "CurrentTimeRequest", "\x58\x01");
+  file.record(kSent, "InviteRequest", "\x58\x02");
+  file.record(kReceived, "InviteReply", "\x58\x02");
+  file.record(kReceived, "CurrentTimeReply", "\x58\x01");
+  start(file);
+  send("CurrentTimeRequest", "\x58\x0b");
+  send("InviteRequest", "\x58\x0c");
+  EXPECT_EQ(received(), "InviteReply \x58\x0c\nCurrentTimeReply \x58\x0b\n");
+  EXPECT_EQ(end(), "");
+}
+
+TEST_F(Replay, RepliesToOtherRequests_KeepTheirIds) {
+  SessionFile file;
+  file.record(kSent, "CurrentTimeRequest", "\x58\x01");
+  file.record(kReceived, "CurrentTimeReply", "\x58\x03");
+  file.record(kReceived, "InviteReply", "\x58\x01");
+  start(file);
+  send("CurrentTimeRequest", "\x58\x0b");
+  EXPECT_EQ(received(), "CurrentTimeReply \x58\x03\nInviteReply \x58\x01\n");
+}
+
+TEST_F(Replay, ReplyToTheSameId_HasTheBytesOfThen) {
+  SessionFile file;
+  file.record(kSent, "CurrentTimeRequest", "\x58\x01");
+  file.record(kReceived, "CurrentTimeReply", "\x58\x05\x58\x01");
+  start(file);
+  send("CurrentTimeRequest", "\x58\x01");
+  EXPECT_EQ(received(), "CurrentTimeReply \x58\x05\x58\x01\n");
+}
+
+TEST_F(Replay, BrokenReply_IsDeliveredAsItWas) {
+  SessionFile file;
+  file.record(kSent, "CurrentTimeRequest", "\x58\x01");
+  file.record(kReceived, "CurrentTimeReply", "\x58\x01\x58");
+  start(file);
+  send("CurrentTimeRequest", "\x58\x0b");
+  EXPECT_EQ(received(), "CurrentTimeReply \x58\x01\x58\n");
+}
+
+TEST_F(Replay, RequestWithoutAnId_IsReported) {
+  SessionFile file;
+  file.record(kSent, "CurrentTimeRequest", "\x58\x01");
+  start(file);
+  send("CurrentTimeRequest", "");
+  EXPECT_EQ(end(),
+            "Message 1 of the plug-in, a CurrentTimeRequest, is not what record 1 expects: "
+            "requestId is missing, which should be 1.\n");
+}
+
+TEST_F(Replay, AnswerToAPush_HasTheIdOfThen) {
+  SessionFile file;
+  file.record(kReceived, "ClientEcho", "\x08\x07");
+  file.record(kSent, "ClientEchoReply", "\x08\x07");
+  start(file);
+  send("ClientEchoReply", "\x08\x05");
+  EXPECT_EQ(end(),
+            "Message 1 of the plug-in, a ClientEchoReply, is not what record 2 expects: requestId "
+            "is 5 instead of 7.\n");
 }
 
 TEST_F(Replay, MaskedToken_StandsForAny) {
@@ -144,6 +226,70 @@ TEST_F(Replay, MaskedToken_StandsForAny) {
   start(file);
   send("ChannelAuthRequest", "\x08\x01\x32\x06secret");
   EXPECT_EQ(end(), "");
+}
+
+TEST_F(Replay, MaskInALaterMessage_StandsForTheTokenAlone) {
+  SessionFile file;
+  file.record(kSent, "ChannelAuthRequest", "\x2a\x0c(**********)\x32\x0a**********");
+  file.record(kSent, "ChangeChatroomMetaRequest", title("**********, **********"));
+  file.record(kSent, "ChangeChatroomMetaRequest", title("**********"));
+  start(file);
+  send("ChannelAuthRequest", "\x2a\x0a(my-token)\x32\x08my-token");
+  send("ChangeChatroomMetaRequest", title("my-token, my-token"));
+  send("ChangeChatroomMetaRequest", title("its-name, my-token"));
+  EXPECT_EQ(end(),
+            "Message 3 of the plug-in, a ChangeChatroomMetaRequest, is not what record 3 expects: "
+            "title is \"its-name, **********\" instead of \"**********\".\n");
+}
+
+TEST_F(Replay, MaskInAMessageInsideAnother_StandsForTheToken) {
+  SessionFile file;
+  file.record(kSent, "ChannelAuthRequest", "\x32\x0a**********");
+  file.record(kSent, "ChatRequest", chat("**********"));
+  start(file);
+  send("ChannelAuthRequest", "\x32\x08my-token");
+  send("ChatRequest", chat("my-token"));
+  EXPECT_EQ(end(), "");
+}
+
+TEST_F(Replay, ShortToken_IsAnyWordElsewhere) {
+  SessionFile file;
+  file.record(kSent, "ChannelAuthRequest", "\x32\x0a**********");
+  file.record(kSent, "ChangeChatroomMetaRequest", title("token"));
+  start(file);
+  send("ChannelAuthRequest", "\x32\x02to");
+  send("ChangeChatroomMetaRequest", title("token"));
+  EXPECT_EQ(end(), "");
+}
+
+TEST_F(Replay, Tokens_AreInNoReport) {
+  SessionFile file;  // of another tool than the recorder
+  file.record(kSent, "ChannelAuthRequest", "\x32\x0aThen-token");
+  file.record(kSent, "ChangeChatroomMetaRequest", title("Then-token"));
+  file.record(kSent, "ChangeChatroomMetaRequest", title("Then-token"));
+  start(file);
+  send("ChannelAuthRequest", "\x32\x09Now-token");
+  send("ChangeChatroomMetaRequest", title("Now-token"));
+  send("ChangeChatroomMetaRequest", title("nothing"));
+  EXPECT_EQ(end(),
+            "Message 1 of the plug-in, a ChannelAuthRequest, is not what record 1 expects: "
+            "accessToken is (not shown) instead of (not shown).\n"
+            "Message 2 of the plug-in, a ChangeChatroomMetaRequest, is not what record 2 expects: "
+            "title is \"(not shown)\" instead of \"(not shown)\".\n"
+            "Message 3 of the plug-in, a ChangeChatroomMetaRequest, is not what record 3 expects: "
+            "title is \"nothing\" instead of \"(not shown)\".\n");
+}
+
+TEST_F(Replay, TokenThatIsSaidBeforeTheLogin_IsInNoReport) {
+  SessionFile file;
+  file.record(kSent, "ChangeChatroomMetaRequest", title("nothing"));
+  file.record(kSent, "ChannelAuthRequest", "\x32\x02**");
+  start(file);
+  send("ChangeChatroomMetaRequest", title("my-token"));
+  send("ChannelAuthRequest", "\x32\x08my-token");
+  EXPECT_EQ(end(),
+            "Message 1 of the plug-in, a ChangeChatroomMetaRequest, is not what record 1 expects: "
+            "title is \"(not shown)\" instead of \"nothing\".\n");
 }
 
 TEST_F(Replay, MissingToken_IsExpectedToBeMissing) {
@@ -290,18 +436,53 @@ TEST_F(Replay, EachPrefixAndEachChangedByte_IsReadOrRefused) {
   }
 }
 
-TEST_F(Replay, WholeDay_GivesEqualMessages) {
-  Play day(qel_testkit_new(nullptr), BUG_NONE);
-  EXPECT_EQ(day.run(), "");
-  SessionFile file;
-  for (const Spoken& spoken : day.spoken()) {
-    file.record(spoken.was_sent ? kSent : kReceived, spoken.message, spoken.bytes);
+// The ids of the plug-in's requests are small numbers. Here they are others.
+std::string with_another_id(const Spoken& spoken) {
+  using google::protobuf::DescriptorPool;
+  const auto& type = *DescriptorPool::generated_pool()->FindMessageTypeByName(spoken.message);
+  const std::unique_ptr<google::protobuf::Message> message(
+      google::protobuf::MessageFactory::generated_factory()->GetPrototype(&type)->New());
+  const auto& fields = *message->GetReflection();
+  const auto* id = type.FindFieldByName("requestId");
+  message->ParseFromString(spoken.bytes);
+  if (fields.GetInt64(*message, id) < 1000) {
+    fields.SetInt64(message.get(), id, fields.GetInt64(*message, id) + 1000);
   }
-  const auto* bytes = reinterpret_cast<const unsigned char*>(file.bytes.data());
-  Play again(qel_testkit_new_replay(bytes, file.bytes.size(), nullptr), BUG_NONE);
-  EXPECT_EQ(again.run(), "");
-  EXPECT_GT(day.spoken().size(), 20U);
-  EXPECT_TRUE(again.spoken() == day.spoken());
+  return message->SerializeAsString();
+}
+
+class RecordedDay : public ::testing::Test {
+ protected:
+  RecordedDay() : day_(qel_testkit_new(nullptr)) { EXPECT_EQ(day_.run(), ""); }
+
+  void record(const Spoken& spoken, const std::string& bytes) {
+    file_.record(spoken.was_sent ? kSent : kReceived, spoken.message, bytes);
+  }
+  void expect_the_same_again() {
+    Play again(qel_testkit_new_replay(reinterpret_cast<const unsigned char*>(file_.bytes.data()),
+                                      file_.bytes.size(), nullptr));
+    EXPECT_EQ(again.run(), "");
+    EXPECT_GT(day_.spoken().size(), 20U);
+    EXPECT_TRUE(again.spoken() == day_.spoken());
+  }
+
+  Play day_;
+  SessionFile file_;
+};
+
+TEST_F(RecordedDay, Again_HasEqualMessages) {
+  for (const Spoken& spoken : day_.spoken()) {
+    record(spoken, spoken.bytes);
+  }
+  expect_the_same_again();
+}
+
+TEST_F(RecordedDay, OfOtherRequestIds_HasTheOnesOfNow) {
+  for (const Spoken& spoken : day_.spoken()) {
+    record(spoken, with_another_id(spoken));
+  }
+  EXPECT_NE(file_.bytes.find("\x58\xea\x07"), std::string::npos);  // 1002
+  expect_the_same_again();
 }
 
 }  // namespace
