@@ -1,6 +1,6 @@
 #!/usr/bin/env bats
 # The program qel-testkit. SOURCE is the repository, BUILT the folder of the program, EXAMPLES that of
-# the demo's programs, RECORDER the recorder.
+# the demo's programs, RECORDER the recorder, EMULATOR what runs them, if this machine does not.
 # shellcheck disable=SC2034,SC2154 # variables of bats
 bats_require_minimum_version 1.5.0
 BATS_PRINT_OUTPUT_ON_FAILURE=1
@@ -8,27 +8,31 @@ export LC_ALL=C DLOG_STANDIN_PRIORITY=S
 
 setup() { cd "$BATS_TEST_TMPDIR" || exit; }
 
-testkit() { "$BUILT/qel-testkit" "$@"; }
+testkit() { ${EMULATOR:+"$EMULATOR"} "$BUILT/qel-testkit" "$@"; }
 
 # serve OPTION...: lets the demo's plug-in talk to the program. Its report goes to the file report,
 # what the plug-in says to the file said.
 serve() {
   local served=0 line port
-  coproc TESTKIT { exec "$BUILT/qel-testkit" --listen 0 --timeout 5 "$@" 2>report 3>&-; }
+  coproc TESTKIT { exec ${EMULATOR:+"$EMULATOR"} "$BUILT/qel-testkit" --listen 0 --timeout 5 "$@" 2>report 3>&-; }
   local pid=$TESTKIT_PID
   read -r line <&"${TESTKIT[0]}"
   port=${line##*:}
-  env "${plugin_environment[@]}" "$EXAMPLES/plugin_session" "$port" --timeout 2 \
+  env "${plugin_environment[@]}" ${EMULATOR:+"$EMULATOR"} "$EXAMPLES/plugin_session" "$port" --timeout 2 \
     "${plugin_options[@]}" >said 2>&1 || true
   wait "$pid" || served=$?
   return "$served"
 }
 
-# A session file of the demo's plug-in, by the recorder.
-record_demo() {
+# record FILE OPTION...: serve, with a session file of the demo's plug-in, by the recorder.
+record() {
   [ -e "$RECORDER" ] || skip 'there is no recorder'
-  local plugin_environment=(LD_PRELOAD="$RECORDER" QEL_TRACE_FILE=session)
-  serve --scenario "$SOURCE/examples/day.scenario"
+  local plugin_environment=("${EMULATOR:+QEMU_SET_ENV=}LD_PRELOAD=$RECORDER" QEL_TRACE_FILE="$1")
+  serve "${@:2}"
+}
+
+record_demo() {
+  record session --scenario "$SOURCE/examples/day.scenario"
   mv said demo
 }
 
@@ -99,8 +103,11 @@ TXT
 @test "the demo's session, recorded and replayed, gives equal outputs" {
   record_demo
   grep -x 'plug-in: session complete' demo
-  serve --replay session
+  record again --replay session
   diff demo said
+  messages="$SOURCE/qel-trace/tests/session.py"
+  [ "$("$messages" session | wc -l)" -gt 30 ]
+  diff <("$messages" session) <("$messages" again)
 }
 
 @test "a plug-in that says something else than in the recorded session is found" {
