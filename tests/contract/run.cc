@@ -238,10 +238,10 @@ Json CaseRun::outputs() const {
   return comparable(call_.outputs(&shows));
 }
 
-// If the recorder stands before the library, a requestId is written when the call returns.
+// If the recorder stands before the library, a requestId is written when the call ends.
 Json CaseRun::comparable(Json outputs) const {
   static const bool is_recorded = std::getenv("QEL_TRACE_FILE") != nullptr;
-  if (is_recorded && !has_returned_) {
+  if (is_recorded && is_under_way_) {
     outputs.erase("requestId");
   }
   return outputs;
@@ -405,13 +405,14 @@ bool CaseRun::on_new() {
       break;
     }
   }
+  const Json now = model_;
   model_ = before;
   if (!fits && !(is_done() && course_.end.contains("throws"))) {
     problem("operator new is called where nothing is parsed or copied, the outputs being\n  " +
             got.dump());
   }
   if (news_ == refused_new_) {
-    thrown_at_ = got;
+    thrown_at_ = now;
     return false;
   }
   return true;
@@ -506,14 +507,15 @@ void CaseRun::execute() {
   {
     const Observation observation(this);
     is_called_ = true;
+    is_under_way_ = true;
     try {
       status = invocation();
       is_called_ = false;
-      has_returned_ = true;
     } catch (const std::exception& exception) {
       is_called_ = false;
       thrown = exception.what();
     }
+    is_under_way_ = false;
   }
   if (!problems_.empty()) {
     return;

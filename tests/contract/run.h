@@ -117,10 +117,10 @@ class CaseRun : public Observer {
   size_t next_ = 0;                       // step
   Json model_;                            // of the outputs
   bool is_called_ = false;
-  bool has_returned_ = false;
+  bool is_under_way_ = false;  // until it returns or throws
   int news_ = 0;
   bool has_copied_ = false;
-  std::optional<Json> thrown_at_;  // the outputs when operator new refused
+  std::optional<Json> thrown_at_;  // what the outputs held when operator new refused
   struct Progress {
     int steps;  // lines and blocks that were as they should be
     int problems;
