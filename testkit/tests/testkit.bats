@@ -59,17 +59,59 @@ TXT
 }
 
 @test "lines that mean nothing end it with status 2" {
-  for line in 'ChatRequest 0' 'ChatRequest xx' 'wait long' 'wait -1' 'wait' 'ChatRequest 08 07' ''; do
+  for line in 'ChatRequest 0' 'ChatRequest xx' 'wait long' 'wait -1' 'wait' 'ChatRequest 08 07'; do
     run -2 testkit <<<"$line"
   done
 }
 
+@test "lines: a control character is part of none" {
+  for line in 'wait 1\0' 'wait\t1' 'wait 1\r' 'ChatRequest\0 08'; do
+    # shellcheck disable=SC2059 # its escapes are meant
+    printf "$line\n" >lines
+    run -2 testkit <lines
+  done
+}
+
+@test "lines: a problem has its line's number" {
+  run --separate-stderr -2 testkit <<<$'wait 1\n\nwait long'
+  [ "$stderr" = 'qel-testkit: line 3: no number of milliseconds' ]
+}
+
+@test "lines: a blank one is ignored" {
+  run --separate-stderr -0 testkit <<<$'\n  '
+  [ "$output" = 'next never' ]
+}
+
+@test "lines: the last one needs no end" {
+  run --separate-stderr -0 testkit < <(printf 'wait 1')
+  diff - <(printf '%s\n' 'next never' 'next never') <<<"$output"
+}
+
+@test "lines: none is read if there is nothing to play" {
+  echo 'expekt' >scenario
+  { testkit --scenario scenario 2>report || cat; } <<<'wait 1' >output
+  diff - output <<<'wait 1'
+}
+
 @test "wrong calls end it with status 2" {
-  for options in '--scenario' '--unknown x' '--listen x' '--scenario a --replay b' \
-    '--scenario none' '--timeout 0'; do
+  echo 'strict' >scenario
+  for options in '--scenario' '--unknown x' '--listen x' '--scenario scenario --replay scenario' \
+    '--scenario none' '--scenario .' '--listen 0 --timeout 0' '--timeout 1' '--ignore title' 'word'; do
     # shellcheck disable=SC2086 # several words
     run -2 testkit $options </dev/null
   done
+}
+
+@test "the empty name is that of no file" {
+  for option in --scenario --replay; do
+    run -2 testkit "$option" '' </dev/null
+  done
+}
+
+@test "a scenario with a byte of 0 is refused" {
+  printf 'strict\0expekt' >scenario
+  run -1 testkit --scenario scenario </dev/null
+  [ "$output" = 'qel-testkit: scenario is no text: a byte is 0' ]
 }
 
 @test "a text that is no scenario ends it with status 1, also before anybody connects" {
