@@ -24,6 +24,29 @@ serve() {
   return "$served"
 }
 
+# listen SCENARIO: lets this shell be the plug-in, which sends and receives by the descriptor $plugin.
+listen() {
+  local line
+  echo "world { isSignedIn: true } $1" >scenario
+  coproc TESTKIT { exec "$BUILT/qel-testkit" --listen 0 --timeout 1 --scenario scenario 2>report 3>&-; }
+  served=$TESTKIT_PID
+  read -r line <&"${TESTKIT[0]}"
+  exec {plugin}<>"/dev/tcp/127.0.0.1/${line##*:}"
+}
+
+# ends_with STATUS: the program that 'listen' has begun.
+ends_with() {
+  local ended=0
+  wait "$served" || ended=$?
+  [ "$ended" -eq "$1" ]
+}
+
+# ask_for_time TIMES: the plug-in's request.
+ask_for_time() {
+  local id
+  for id in $(seq "$1"); do printf '\22CurrentTimeRequest\0\0\0\2X%b' "\\x$id" >&"$plugin"; done
+}
+
 # A session file of the demo's plug-in, by the recorder.
 record_demo() {
   [ -e "$RECORDER" ] || skip 'there is no recorder'
@@ -136,6 +159,50 @@ TXT
   sed '/^expect ChannelAuthRequest/a answer after 200ms' "$SOURCE/examples/day.scenario" >scenario
   serve --scenario scenario
   grep -x 'plug-in: session complete' said
+}
+
+@test "TCP: a plug-in that says no more when the scenario is over need not close the connection" {
+  listen 'expect CurrentTimeRequest'
+  ask_for_time 1
+  ends_with 0
+}
+
+@test "TCP: what is missing when the plug-in falls silent is reported, and nothing else" {
+  listen 'expect CurrentTimeRequest'
+  ends_with 1
+  diff - report <<<'Line 1 expects a CurrentTimeRequest, which never came.'
+}
+
+@test "TCP: what is due is waited for, beyond the time of silence too" {
+  listen 'expect CurrentTimeRequest answer after 1500ms'
+  ask_for_time 1
+  read -r -N 17 -u "$plugin" name
+  [ "$name" = $'\20CurrentTimeReply' ]
+  ends_with 0
+}
+
+@test "TCP: a plug-in that closes the connection before the last message is found" {
+  listen 'push ClientEcho after 10s'
+  exec {plugin}>&-
+  ends_with 1
+  diff - <(sed 's/[0-9][0-9]*/N/' report) <<<'A ClientEcho was due N ms later, but the test was over.'
+}
+
+@test "TCP: a plug-in may close the connection without reading its answer" {
+  listen 'expect CurrentTimeRequest'
+  ask_for_time 1
+  until read -r -t 0 -u "$plugin"; do :; done
+  exec {plugin}>&-
+  ends_with 0
+}
+
+@test "TCP: a plug-in may close the connection before its answers are sent" {
+  listen ''
+  kill -STOP "$served" # so that it finds all of them, and the end
+  ask_for_time 7
+  exec {plugin}>&-
+  kill -CONT "$served"
+  ends_with 0
 }
 
 @test "the demo's session, recorded and replayed, gives equal outputs" {
