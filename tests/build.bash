@@ -85,6 +85,12 @@ compile_with_cmake() {
   cmake --build built
 }
 
+# first_test: writes first.c and what it says of a mistake, as docs/testing.md has them.
+first_test() {
+  awk '/^```/ { on = !on; block += on; next }
+    on && block == 1 { print >"first.c" } on && block == 3 { print >"mistake" }' "$SOURCE/docs/testing.md"
+}
+
 # prints TEXT TREE PROGRAM [ARGUMENT...]: what the program prints.
 prints() {
   local emulator=()
