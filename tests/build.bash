@@ -85,10 +85,14 @@ compile_with_cmake() {
   cmake --build built
 }
 
-# first_test: writes first.c and what it says of a mistake, as docs/testing.md has them.
-first_test() {
+# take_examples: writes what docs/testing.md has to files: first.c, what is said of its mistake, the lines
+# that qel-testkit reads, and its answers.
+take_examples() {
   awk '/^```/ { on = !on; block += on; next }
-    on && block == 1 { print >"first.c" } on && block == 3 { print >"mistake" }' "$SOURCE/docs/testing.md"
+    on && block == 1 { print >"first.c" }
+    on && block == 3 { print >"mistake" }
+    on && sub(/^< /, "") { print >"lines" }
+    on && sub(/^> /, "") { print >"answers" }' "$SOURCE/docs/testing.md"
 }
 
 # prints TEXT TREE PROGRAM [ARGUMENT...]: what the program prints.

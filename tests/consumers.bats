@@ -196,7 +196,7 @@ install_testkit() {
 
 @test "the first test of docs/testing.md is good, and finds the mistake that the page makes" {
   install_testkit qel-message-testkit
-  first_test
+  take_examples
   "$CC" first.c "${flags[@]}" -o first
   prints good tree ./first
   sed 's/echo\.requestId/1/' first.c >second.c
@@ -207,7 +207,7 @@ install_testkit() {
 
 @test "a test of a plug-in compiles by the CMake package" {
   install_testkit qel-message-testkit
-  first_test
+  take_examples
   configure 'find_package(qel-message-protosvc REQUIRED COMPONENTS testkit)
     add_executable(first first.c)
     target_link_libraries(first PRIVATE qel-message-protosvc::testkit)' -DCMAKE_PREFIX_PATH="$PWD/tree"
@@ -224,7 +224,7 @@ install_testkit() {
 
 @test "a test of a plug-in needs a C compiler, and nothing of Protocol Buffers" {
   install_testkit qel-message-testkit
-  first_test
+  take_examples
   "$CC" -H first.c "${flags[@]}" -o first 2>&1 | sed -n 's/^\.\.* //p' | xargs -d '\n' realpath |
     grep -v '^/usr/' | sed 's/.*\///' |
     diff - <(printf '%s\n' qel-message.h qel-message-serialize.h qel-testkit.h)
@@ -254,5 +254,7 @@ TXT
 @test "the scenarios and the program are installed" {
   install_testkit qel-message-testkit
   diff <(ls "$SOURCE/testkit/scenarios") <(ls tree/share/qel-message-protosvc/scenarios)
-  tree/bin/qel-testkit --scenario tree/share/qel-message-protosvc/service.scenario </dev/null
+  take_examples
+  tree/bin/qel-testkit --scenario tree/share/qel-message-protosvc/scenarios/connection.scenario <lines >said
+  diff answers said
 }
