@@ -19,11 +19,10 @@ class LongText {
  public:
   LongText() : file_(memfd_create("blanks", MFD_CLOEXEC)) {
     const std::string blanks(kPiece, ' ');
-    if (begin_ == MAP_FAILED || write(file_, blanks.data(), kPiece) != kPiece) {
-      return;
-    }
-    for (size_t i = 0; i < kPieces; ++i) {
-      mmap(text() + i * kPiece, kPiece, PROT_READ, MAP_PRIVATE | MAP_FIXED, file_, 0);
+    is_there_ = begin_ != MAP_FAILED && write(file_, blanks.data(), kPiece) == kPiece;
+    for (size_t i = 0; is_there_ && i < kPieces; ++i) {
+      is_there_ = mmap(text() + i * kPiece, kPiece, PROT_READ, MAP_PRIVATE | MAP_FIXED, file_, 0) !=
+                  MAP_FAILED;
     }
   }
   ~LongText() {
@@ -33,7 +32,7 @@ class LongText {
   LongText(const LongText&) = delete;
   LongText& operator=(const LongText&) = delete;
 
-  bool is_there() const { return begin_ != MAP_FAILED; }
+  bool is_there() const { return is_there_; }
   char* text() const { return static_cast<char*>(begin_); }
 
  private:
@@ -43,6 +42,7 @@ class LongText {
 
   int file_;
   void* begin_ = mmap(nullptr, kSize, PROT_READ, MAP_PRIVATE | MAP_ANONYMOUS, -1, 0);
+  bool is_there_ = false;
 };
 
 TEST(TestKitFunctions, New_WhenTheScenarioHas2GiB_RefusesIt) {
