@@ -36,9 +36,13 @@ In the beginning, and after each of them, it writes to standard output:
              the plug-in sends something before
   next never if none is due until the plug-in sends something
 
-The test is over with the input or, with --listen, when the plug-in closes the
-connection, or sends nothing for --timeout while nothing is due. Then the report
-goes to standard error: a sentence in each line of what went wrong, or nothing.
+With --listen, messages come and go in frames as those of the example, whose
+framing.h describes them, and time passes by itself.
+
+The test is over with the input or, with --listen, at the first mistake, when
+the plug-in closes the connection, or when it sends nothing for --timeout while
+nothing is due. Then the report goes to standard error: a sentence in each line
+of what went wrong, or nothing.
 
 Exits with 0 if everything went as expected; with 1 and a report if not, if the
 scenario or the session cannot be read, or if the connection fails; with 2 if it

@@ -28,7 +28,7 @@ serve() {
 listen() {
   local line
   echo "world { isSignedIn: true } $1" >scenario
-  coproc TESTKIT { exec "$BUILT/qel-testkit" --listen 0 --timeout 1 --scenario scenario 2>report 3>&-; }
+  coproc TESTKIT { exec "$BUILT/qel-testkit" --listen 0 --timeout 2 --scenario scenario 2>report 3>&-; }
   served=$TESTKIT_PID
   read -r line <&"${TESTKIT[0]}"
   exec {plugin}<>"/dev/tcp/127.0.0.1/${line##*:}"
@@ -174,10 +174,11 @@ TXT
 }
 
 @test "TCP: what is due is waited for, beyond the time of silence too" {
-  listen 'expect CurrentTimeRequest answer after 1500ms'
+  listen 'expect CurrentTimeRequest answer after 2500ms'
   ask_for_time 1
   read -r -N 17 -u "$plugin" name
   [ "$name" = $'\20CurrentTimeReply' ]
+  exec {plugin}>&-
   ends_with 0
 }
 
