@@ -40,7 +40,7 @@ def sources():
     """The sources in the reference: the headers, and the examples."""
     with open("docs/examples.dox", encoding="utf-8") as file:
         examples = re.findall(r"@example (\S+)", file.read())
-    return [RECORDS, FUNCTIONS] + [f"examples/{name}" for name in examples]
+    return [RECORDS, FUNCTIONS, "testkit/qel-testkit.h", "testkit/qel-testlog.h"] + [f"examples/{name}" for name in examples]
 
 
 def link(match, page):

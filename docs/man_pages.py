@@ -14,8 +14,10 @@ import sys
 
 def include(name):
     """The line that brings what has this name."""
-    below = name.endswith("serialize") or name.startswith("qel_message_")
-    header = "qel\\-message\\-serialize.h" if below else "qel\\-message.h"
+    below = "serialize" in name or name.startswith("qel_message_")
+    tests = re.match(r"qel[-_](test[a-z]+)", name)
+    header = (f"qel\\-{tests[1]}.h" if tests else
+              "qel\\-message\\-serialize.h" if below else "qel\\-message.h")
     return f".nf\n.B #include <{header}>\n.fi\n"
 
 
@@ -41,12 +43,13 @@ def description(body):
 def functions(page):
     """Name and page of each function on a section's page."""
     version, project = re.match(r'\.TH ".*?" 3 ".*?" "Version (.*?)" "(.*?)"', page).groups()
-    blocks = re.split(r'^\.SS "(?:\\fB)?\w+(?:\\fP)? (\w+) .*"\n', page, flags=re.M)
+    blocks = re.split(r'^\.SS ".*?(\w+) \(.*"\n', page, flags=re.M)
     for name, body in zip(blocks[1::2], blocks[2::2]):
         result, arguments, brief = re.search(
-            rf'^\.RI "(?:\\fB)?(\w+)(?:\\fP)? \\fB{name}\\fP \((.*)\)"\n'
+            rf'^\.RI "(.*) \\fB{name}\\fP \((.*)\)"\n'
             r'\.br\n\.RI "(.*?)(?:\\&\.)? "', page, re.M
         ).groups()
+        result = re.sub(r"\\f[BP]", "", result)
         arguments = arguments.replace(" ", r"\ ").replace(r",\ ", ", ")  # break at commas only
         yield name, (
             f'.TH "{name}" 3 "" "{project} {version}" " "\n.ad l\n.nh\n'

@@ -92,25 +92,41 @@ std::string side_by_side(const std::string& fields) {
   return text;
 }
 
-// The message's fields; the access token is a credential and is not shown.
-std::string text_form(const Message& message) {
-  std::unique_ptr<Message> shown(message.New());
-  shown->CopyFrom(message);
-  if (auto* auth = dynamic_cast<ChannelAuthRequest*>(shown.get())) {
-    if (auth->has_accesstoken()) {
-      auth->set_accesstoken("(not shown)");
-    }
-  }
+// Prints both directions, without the access token, which is a credential.
+class Transcript {
+ public:
+  // A message that is wrong may have the token anywhere, so its fields are not printed.
+  void print(const Shown& shown, bool is_wrong);
+
+ private:
+  std::string text_form(const Message& message);
+
+  std::string token_;  // of the login, as the text form has it
+};
+
+std::string Transcript::text_form(const Message& message) {
+  constexpr char kHidden[] = "(not shown)";
   google::protobuf::TextFormat::Printer printer;
   printer.SetUseUtf8StringEscaping(true);
+  const auto* auth = dynamic_cast<const ChannelAuthRequest*>(&message);
+  if (auth != nullptr && auth->has_accesstoken()) {
+    printer.PrintFieldValueToString(*auth,
+                                    ChannelAuthRequest::descriptor()->FindFieldByNumber(
+                                        ChannelAuthRequest::kAccessTokenFieldNumber),
+                                    -1, &token_);
+    token_ = token_.substr(1, token_.size() - 2);  // without quotes
+  }
   printer.SetInitialIndentLevel(2);
   std::string text;
-  printer.PrintToString(*shown, &text);
+  printer.PrintToString(message, &text);
+  for (size_t at = 0; !token_.empty() && (at = text.find(token_, at)) != std::string::npos;) {
+    text.replace(at, token_.size(), kHidden);
+    at += sizeof kHidden - 1;
+  }
   return side_by_side(text);
 }
 
-// One that the schema does not have, or that is broken, has no fields to print.
-void print_message(const Shown& shown) {
+void Transcript::print(const Shown& shown, bool is_wrong) {
   const std::string name = shown.name;
   std::ostringstream text;  // printed in one piece, as the plug-in prints too
   for (const auto& request : kRequests) {
@@ -118,11 +134,11 @@ void print_message(const Shown& shown) {
       text << "\n== " << request.title << "\n";
     }
   }
-  text << (shown.is_from_plugin ? "plug-in -> service" : "service -> plug-in") << "  " << name
-       << ", " << shown.size << " bytes\n";
   const auto* type =
       google::protobuf::DescriptorPool::generated_pool()->FindMessageTypeByName(name);
-  if (type != nullptr) {
+  text << (shown.is_from_plugin ? "plug-in -> service" : "service -> plug-in") << "  "
+       << (type != nullptr ? name : "no message of the schema") << ", " << shown.size << " bytes\n";
+  if (type != nullptr && !is_wrong) {
     const std::unique_ptr<Message> message(
         google::protobuf::MessageFactory::generated_factory()->GetPrototype(type)->New());
     message->ParsePartialFromArray(shown.data, shown.size);
@@ -194,20 +210,24 @@ void serve(const Options& options) {
   const std::unique_ptr<qel_testkit_t, decltype(&qel_testkit_release)> kit(
       qel_testkit_new(scenario.c_str()), &qel_testkit_release);
   require(kit != nullptr, "out of memory");
+  const auto report = [&kit] { return std::string(qel_testkit_report(kit.get())); };
+  require(report().empty(), report());
   const int listener = listen_on(options.port);
   std::printf("service: its front end listens on 127.0.0.1:%d\n", port_of(listener));
   if (!options.port_file.empty()) {
     write_port_file(options.port_file, port_of(listener));
   }
+  Transcript transcript;
   int chat_messages = 0;
-  serve_one(listener, options.timeout_seconds, kit.get(), [&chat_messages](const Shown& shown) {
+  const auto show = [&](const Shown& shown) {
     chat_messages += shown.name == ChatRequest::descriptor()->name() ? 1 : 0;
-    print_message(shown);
-  });
+    transcript.print(shown, shown.is_from_plugin && !report().empty());
+  };
+  require(serve_one(listener, options.timeout_seconds, kit.get(), show),
+          "the connection broke or fell silent");
   // What else is missing after a mistake does not matter.
-  const bool is_wrong = *qel_testkit_report(kit.get()) != '\0' || !qel_testkit_end(kit.get());
-  const std::string report = qel_testkit_report(kit.get());
-  require(!is_wrong, report.substr(0, report.find('\n')));
+  const bool is_good = report().empty() && qel_testkit_end(kit.get());
+  require(is_good, report().substr(0, report().find('\n')));
   std::printf("service: session complete, %d chat messages\n", chat_messages);
 }
 

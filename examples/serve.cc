@@ -42,40 +42,46 @@ int accept_one(int listener, int timeout_seconds) {
   return connection;
 }
 
-// Sends what is due. Returns after how many milliseconds something else is, or -1.
+// Sends what is due. Returns after how many milliseconds something else is, or -1. What a plug-in
+// does not receive because it has gone, the kit misses if it needs an answer.
 int64_t send_due(int socket, qel_testkit_t* kit, const Show& show) {
   qel_testkit_delivery_t delivery;
   while (qel_testkit_next(kit, &delivery)) {
     show({false, delivery.message, delivery.data, delivery.size});
-    require(frame_send(socket, delivery.message, delivery.data, delivery.size) == 0,
+    errno = 0;
+    require(frame_send(socket, delivery.message, delivery.data, delivery.size) == 0 ||
+                errno == EPIPE || errno == ECONNRESET,
             "a message could not be sent");
   }
   return delivery.after_ms;
 }
 
-// Waits so long at most, and tells the kit how long it was. Returns whether something came.
-bool wait_for_plugin(int socket, qel_testkit_t* kit, int64_t milliseconds) {
+// Waits so long at most, and tells the kit how long it was. Returns what poll() does: 1 if
+// something came, 0 if nothing did, -1 if a signal ended the wait.
+int wait_for_plugin(int socket, qel_testkit_t* kit, int64_t milliseconds) {
   using std::chrono::steady_clock;
   const auto begin = steady_clock::now();
   pollfd waiting{socket, POLLIN, 0};
-  const bool came = poll(&waiting, 1, static_cast<int>(milliseconds)) == 1;
+  const int came = poll(&waiting, 1, static_cast<int>(std::min<int64_t>(milliseconds, INT32_MAX)));
   const auto passed =
       std::chrono::duration_cast<std::chrono::milliseconds>(steady_clock::now() - begin);
   qel_testkit_wait(kit, passed.count());
   return came;
 }
 
-// False at the connection's end.
-bool receive(int socket, qel_testkit_t* kit, const Show& show) {
+// Also if it was closed before the plug-in had read everything, which breaks it.
+bool is_closed(int socket) {
+  char byte = 0;
+  return recv(socket, &byte, 1, MSG_PEEK) <= 0;
+}
+
+void receive(int socket, qel_testkit_t* kit, const Show& show) {
   frame_t frame;
   const int status = frame_receive(socket, &frame);
   const std::unique_ptr<unsigned char, decltype(&std::free)> bytes(frame.message, &std::free);
-  require(status >= 0, "the connection broke or fell silent");
-  if (status == 1) {
-    show({true, frame.name, bytes.get(), frame.size});
-    qel_testkit_sent(kit, frame.name, bytes.get(), frame.size);
-  }
-  return status == 1;
+  require(status == 1, "the connection broke or fell silent");
+  qel_testkit_sent(kit, frame.name, bytes.get(), frame.size);
+  show({true, frame.name, bytes.get(), frame.size});
 }
 
 }  // namespace
@@ -102,7 +108,7 @@ int listen_on(int port) {
   if (bind(listener, reinterpret_cast<sockaddr*>(&address), sizeof address) != 0 ||
       listen(listener, 1) != 0) {
     require(errno != EADDRINUSE, "port " + std::to_string(port) +
-                                     " is taken: choose another with --port, or leave --port out");
+                                     " is taken: choose another, or 0 for any that is free");
     throw WrongExchange(system_error("cannot listen on port " + std::to_string(port)));
   }
   return listener;
@@ -116,20 +122,24 @@ int port_of(int listener) {
   return ntohs(address.sin_port);
 }
 
-void serve_one(int listener, int timeout_seconds, qel_testkit_t* kit, const Show& show) {
-  if (*qel_testkit_report(kit) != '\0') {
-    return;  // there is nothing that it could play
-  }
+bool serve_one(int listener, int timeout_seconds, qel_testkit_t* kit, const Show& show) {
   const Connection connection(accept_one(listener, timeout_seconds));
   const int socket = connection.socket();
-  const int64_t timeout = int64_t{timeout_seconds} * 1000;
-  bool is_open = true;
   close(listener);
-  while (is_open && *qel_testkit_report(kit) == '\0') {
+  while (*qel_testkit_report(kit) == '\0') {
     const int64_t after = send_due(socket, kit, show);
-    const bool came = wait_for_plugin(socket, kit, after < 0 ? timeout : std::min(after, timeout));
-    require(came || (after >= 0 && after <= timeout), "the connection broke or fell silent");
-    is_open = !came || receive(socket, kit, show);
+    const int came =
+        wait_for_plugin(socket, kit, after < 0 ? int64_t{timeout_seconds} * 1000 : after);
+    if (came == 0 && after < 0) {
+      return false;
+    }
+    if (came == 1) {
+      if (is_closed(socket)) {
+        return true;
+      }
+      receive(socket, kit, show);
+    }
   }
   send_due(socket, kit, show);  // such as a refusal
+  return true;
 }

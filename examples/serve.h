@@ -22,16 +22,19 @@ std::string system_error(const std::string& what);
 int listen_on(int port);
 int port_of(int listener);
 
-// Waits for one connection, and serves it until the plug-in closes it or something went wrong.
-// Shows every message. Waits so long for the plug-in to come, and for each message. Throws
-// WrongExchange if the connection fails; what went wrong otherwise, the kit knows.
+// A message that the kit has taken or handed out.
 struct Shown {
   bool is_from_plugin;
   const char* name;
   const unsigned char* data;
   int size;
 };
-void serve_one(int listener, int timeout_seconds, qel_testkit_t* kit,
+
+// Waits for one connection, and serves it until the plug-in closes it or something went wrong,
+// which the kit knows. Shows every message. Waits so long for the plug-in to come, for a message
+// that it has begun, and for the next one if nothing is due meanwhile: returns false if none came.
+// Throws WrongExchange if the connection fails.
+bool serve_one(int listener, int timeout_seconds, qel_testkit_t* kit,
                const std::function<void(const Shown&)>& show);
 
 #endif

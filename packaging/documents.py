@@ -50,6 +50,7 @@ def components(tools, jquery):
             ("qel-wire", "Nettle", "libnettle8", "LGPL-3.0-or-later OR GPL-2.0-or-later",
              "nettle_project:nettle", "Linked dynamically."),
             ("qel-wire", "CLI11", "libcli11-dev", "BSD-3-Clause", "", "Compiled into the program."),
+            ("qel-message-testkit", "CLI11", "libcli11-dev", "BSD-3-Clause", "", "Compiled into the program."),
             ("qel-wire", "libpcap", "libpcap0.8", "BSD-3-Clause", "tcpdump:libpcap", "Linked dynamically."),
             ("qel-wire", "utf8proc", "libutf8proc2", "MIT", "", "Linked dynamically."),
             ("libqel-message-protosvc-doc", "Doxygen Awesome", "doxygen-awesome-css", "MIT", "",
@@ -138,7 +139,8 @@ def cyclonedx(version, time, archive, parts):
                 *(component(owner, version, ours) for owner in owners(parts)),
                 *(component(each["name"], each["version"], {"expression": each["licence"]}, each["sha256"],
                             purl=each["purl"], description=each["comment"],
-                            **({"cpe": each["cpe"]} if each["cpe"] else {})) for each in parts)],
+                            **({"cpe": each["cpe"]} if each["cpe"] else {}))
+                  for each in {each["name"]: each for each in parts}.values())],  # some are in two packages
             "dependencies": [
                 {"ref": NAME, "dependsOn": owners(parts)},
                 *({"ref": owner, "dependsOn": [each["name"] for each in parts if each["of"] == owner]}

@@ -1,15 +1,11 @@
-// The test kit as a program, for plug-ins in any language.
-//
-// It serves one connection with the example's framing (examples/framing.h), or speaks in lines: it
-// reads "NAME HEX" for what the plug-in sends and "wait MS" for time that passes, and after each of
-// them writes "NAME HEX" for all that is due, and then "next MS" or "next never". In the end the
-// report goes to standard error.
+// The test kit as a program, for plug-ins in any language. kFooter says what it does.
 
-#include <unistd.h>
-
+#include <CLI/CLI.hpp>
+#include <algorithm>
+#include <cctype>
 #include <cerrno>
+#include <charconv>
 #include <cstdio>
-#include <cstdlib>
 #include <cstring>
 #include <fstream>
 #include <iostream>
@@ -24,36 +20,41 @@
 namespace {
 
 constexpr int kGood = 0;
-constexpr int kWrong = 1;      // something did not go as expected
-constexpr int kWrongCall = 2;  // or a line on standard input that means nothing
+constexpr int kWrong = 1;
+constexpr int kWrongCall = 2;
 
-constexpr char kUsage[] =
-    "usage: qel-testkit [--scenario FILE | --replay FILE [--ignore NAMES]]\n"
-    "                   [--listen PORT [--timeout SECONDS]]\n"
-    "\n"
-    "Plays a chat service for a plug-in, and says what went wrong.\n"
-    "\n"
-    "  --scenario FILE    what to expect of the plug-in, and what to say instead of the service\n"
-    "  --replay FILE      the recorded session to repeat\n"
-    "  --ignore NAMES     fields that may differ from the session, with blanks between them\n"
-    "  --listen PORT      serve one connection to that port of 127.0.0.1, 0 for any that is free,\n"
-    "                     with the example's framing, instead of lines on standard input\n"
-    "  --timeout SECONDS  wait so long for the connection and for each message, 10 unless given\n"
-    "\n"
-    "Lines on standard input: NAME HEX for a message that the plug-in sends, wait MS for time "
-    "that\n"
-    "passes. Lines on standard output: NAME HEX for each message that it is to receive, then next "
-    "MS\n"
-    "or next never. Ends with 0 if everything went as expected, with 1 and a report if not, and "
-    "with\n"
-    "2 if it was called wrongly.\n";
+constexpr char kFooter[] = R"(
+Without --listen, it reads lines from standard input:
+
+  NAME HEX   the plug-in sends this message; without HEX, one of no bytes
+  wait MS    so many milliseconds pass: no other time does
+
+In the beginning, and after each of them, it writes to standard output:
+
+  NAME HEX   for each message that is due: the plug-in receives it
+  next MS    when another one is due, in milliseconds: wait so long, unless
+             the plug-in sends something before
+  next never if none is due until the plug-in sends something
+
+With --listen, messages come and go in frames as those of the example, whose
+framing.h describes them, and time passes by itself.
+
+The test is over with the input or, with --listen, at the first mistake, when
+the plug-in closes the connection, or when it sends nothing for --timeout while
+nothing is due. Then the report goes to standard error: a sentence in each line
+of what went wrong, or nothing.
+
+Exits with 0 if everything went as expected; with 1 and a report if not, if the
+scenario or the session cannot be read, or if the connection fails; with 2 if it
+was called wrongly, or if a line means nothing.
+)";
 
 struct WrongCall : std::runtime_error {
   using std::runtime_error::runtime_error;
 };
 
 struct Options {
-  std::string scenario;
+  std::string scenario;  // a file's name, or empty
   std::string replay;
   std::string ignored;
   int port = -1;
@@ -62,45 +63,35 @@ struct Options {
 
 using Kit = std::unique_ptr<qel_testkit_t, decltype(&qel_testkit_release)>;
 
-int64_t number(const std::string& text, int64_t least, int64_t most) {
-  char* end = nullptr;
-  errno = 0;
-  const long long value = std::strtoll(text.c_str(), &end, 10);
-  if (text.empty() || *end != '\0' || errno != 0 || value < least || value > most) {
-    throw WrongCall("'" + text + "' is no number of " + std::to_string(least) + " to " +
-                    std::to_string(most));
-  }
-  return value;
+// As the usage says what the value is, the check need not.
+CLI::Validator silent(CLI::Validator check) {
+  return check.description("");
 }
 
-Options options_of(int argc, char** argv) {
+void add_options(CLI::App* app, Options* options) {
   constexpr int kMostPorts = 65535;
   constexpr int kMostSeconds = 86400;
-  Options options;
-  for (int i = 1; i < argc; i += 2) {
-    const std::string name = argv[i];
-    if (i + 1 == argc) {
-      throw WrongCall(kUsage);
-    }
-    const std::string value = argv[i + 1];
-    if (name == "--scenario") {
-      options.scenario = value;
-    } else if (name == "--replay") {
-      options.replay = value;
-    } else if (name == "--ignore") {
-      options.ignored = value;
-    } else if (name == "--listen") {
-      options.port = static_cast<int>(number(value, 0, kMostPorts));
-    } else if (name == "--timeout") {
-      options.timeout_seconds = static_cast<int>(number(value, 1, kMostSeconds));
-    } else {
-      throw WrongCall(kUsage);
-    }
+  app->set_help_flag("--help", "what it does");
+  app->footer(kFooter);
+  auto* scenario =
+      app->add_option("--scenario", options->scenario, "what to expect of the plug-in, and to say");
+  auto* replay = app->add_option("--replay", options->replay, "the recorded session to repeat");
+  for (CLI::Option* file : {scenario, replay}) {
+    file->type_name("FILE")->check(silent(CLI::ExistingFile));
   }
-  if (!options.scenario.empty() && !options.replay.empty()) {
-    throw WrongCall(kUsage);
-  }
-  return options;
+  scenario->excludes(replay);
+  app->add_option("--ignore", options->ignored, "the session's fields that may differ")
+      ->type_name("'NAME...'")
+      ->needs(replay);
+  auto* listen = app->add_option("--listen", options->port,
+                                 "serve one connection to 127.0.0.1; 0: to any port")
+                     ->type_name("PORT")
+                     ->check(silent(CLI::Range(0, kMostPorts)));
+  app->add_option("--timeout", options->timeout_seconds,
+                  "wait so long for it and for messages, instead of 10")
+      ->type_name("SECONDS")
+      ->check(silent(CLI::Range(1, kMostSeconds)))
+      ->needs(listen);
 }
 
 std::string contents(const std::string& path) {
@@ -115,6 +106,7 @@ std::string contents(const std::string& path) {
 Kit make_kit(const Options& options) {
   if (options.replay.empty()) {
     const std::string text = options.scenario.empty() ? "" : contents(options.scenario);
+    require(text.find('\0') == std::string::npos, options.scenario + " is no text: a byte is 0");
     return {qel_testkit_new(text.c_str()), &qel_testkit_release};
   }
   const std::string session = contents(options.replay);
@@ -136,14 +128,26 @@ std::string to_hex(const unsigned char* data, int size) {
   return text;
 }
 
+// The whole text as a number that is not negative.
+template <typename Number>
+Number number(const std::string& text, int base, const char* problem) {
+  Number value{};
+  const char* end = text.data() + text.size();
+  const auto read = std::from_chars(text.data(), end, value, base);
+  if (read.ec != std::errc() || read.ptr != end || text[0] == '-') {
+    throw WrongCall(problem);
+  }
+  return value;
+}
+
 std::string from_hex(const std::string& text) {
+  constexpr char kProblem[] = "the bytes are not pairs of hexadecimal digits";
   std::string bytes;
   for (size_t i = 0; i < text.size(); i += 2) {
-    const std::string pair = text.substr(i, 2);
-    if (pair.find_first_not_of("0123456789abcdefABCDEF") != std::string::npos || pair.size() != 2) {
-      throw WrongCall("a line whose bytes are not pairs of hexadecimal digits");
+    if (i + 1 == text.size()) {
+      throw WrongCall(kProblem);
     }
-    bytes += static_cast<char>(std::stoi(pair, nullptr, 16));
+    bytes += static_cast<char>(number<unsigned char>(text.substr(i, 2), 16, kProblem));
   }
   return bytes;
 }
@@ -158,25 +162,39 @@ void write_due(qel_testkit_t* kit) {
             << std::endl;
 }
 
+void take_line(const std::string& line, qel_testkit_t* kit) {
+  if (std::any_of(line.begin(), line.end(), [](unsigned char c) { return std::iscntrl(c) != 0; })) {
+    throw WrongCall("a control character");
+  }
+  std::istringstream words(line);
+  std::string name;
+  std::string value;
+  std::string rest;
+  words >> name >> value >> rest;
+  if (!rest.empty()) {
+    throw WrongCall("neither NAME HEX nor wait MS");
+  }
+  if (name == "wait") {
+    qel_testkit_wait(kit, number<int64_t>(value, 10, "no number of milliseconds"));
+  } else if (!name.empty()) {
+    const std::string bytes = from_hex(value);
+    qel_testkit_sent(kit, name.c_str(), reinterpret_cast<const unsigned char*>(bytes.data()),
+                     static_cast<int>(bytes.size()));
+  } else {
+    return;  // blank
+  }
+  write_due(kit);
+}
+
 void take_lines(qel_testkit_t* kit) {
   write_due(kit);
-  for (std::string line; std::getline(std::cin, line);) {
-    std::istringstream words(line);
-    std::string name;
-    std::string value;
-    std::string rest;
-    words >> name >> value;
-    if (name.empty() || words >> rest) {
-      throw WrongCall("a line that is neither NAME HEX nor wait MS");
+  std::string line;
+  for (int64_t i = 1; std::getline(std::cin, line); ++i) {
+    try {
+      take_line(line, kit);
+    } catch (const WrongCall& problem) {
+      throw WrongCall("line " + std::to_string(i) + ": " + problem.what());
     }
-    if (name == "wait") {
-      qel_testkit_wait(kit, number(value, 0, INT64_MAX));
-    } else {
-      const std::string bytes = from_hex(value);
-      qel_testkit_sent(kit, name.c_str(), reinterpret_cast<const unsigned char*>(bytes.data()),
-                       static_cast<int>(bytes.size()));
-    }
-    write_due(kit);
   }
 }
 
@@ -188,15 +206,11 @@ void serve(const Options& options, qel_testkit_t* kit) {
 
 int run(const Options& options) {
   const Kit kit = make_kit(options);
-  if (kit == nullptr) {
-    throw WrongExchange("out of memory");
-  }
+  require(kit != nullptr, "out of memory");
   std::string failure;
-  if (options.port < 0) {
-    take_lines(kit.get());
-  } else {
+  if (*qel_testkit_report(kit.get()) == '\0') {  // otherwise there is nothing that it could play
     try {
-      serve(options, kit.get());
+      options.port < 0 ? take_lines(kit.get()) : serve(options, kit.get());
     } catch (const WrongExchange& problem) {
       failure = std::string("qel-testkit: ") + problem.what() + "\n";
     }
@@ -210,14 +224,17 @@ int run(const Options& options) {
 
 int main(int argc, char** argv) {
   try {
-    if (argc == 2 && std::strcmp(argv[1], "--help") == 0) {
-      std::cout << kUsage;
-      return kGood;
+    CLI::App app("Plays a chat service for a plug-in, and says what went wrong", "qel-testkit");
+    Options options;
+    add_options(&app, &options);
+    try {
+      app.parse(argc, argv);
+    } catch (const CLI::ParseError& problem) {
+      return app.exit(problem) == 0 ? kGood : kWrongCall;
     }
-    return run(options_of(argc, argv));
+    return run(options);
   } catch (const WrongCall& problem) {
-    const std::string text = problem.what();
-    std::cerr << (text == kUsage ? text : "qel-testkit: " + text + "\n");
+    std::cerr << "qel-testkit: " << problem.what() << "\n";
     return kWrongCall;
   } catch (const std::exception& problem) {
     std::cerr << "qel-testkit: " << problem.what() << "\n";

@@ -68,12 +68,17 @@ qel_testkit_t* qel_testkit_new(const char* scenario);
 qel_testkit_t* qel_testkit_new_replay(const unsigned char* session, size_t size,
                                       const char* ignored);
 
-/** Releases the kit. NULL is fine. */
+/**
+ * Releases the kit.
+ *
+ * @param kit  the kit; NULL is fine
+ */
 void qel_testkit_release(qel_testkit_t* kit);
 
 /**
  * The plug-in has sent this.
  *
+ * @param kit      the kit
  * @param message  which message it is, for example "ChatRequest"
  * @param data     its bytes, which are copied; may be NULL if the size is 0
  * @param size     how many
@@ -83,17 +88,25 @@ void qel_testkit_sent(qel_testkit_t* kit, const char* message, const unsigned ch
 /**
  * Takes what the plug-in is to receive now.
  *
+ * @param kit       the kit
+ * @param delivery  receives it
  * @return whether there is something. If not, the delivery's after_ms says when to ask again.
  */
 bool qel_testkit_next(qel_testkit_t* kit, qel_testkit_delivery_t* delivery);
 
-/** So much time has passed since the last call. Negative numbers are taken as 0. */
+/**
+ * So much time has passed since the last call.
+ *
+ * @param kit           the kit
+ * @param milliseconds  how much; negative numbers are taken as 0
+ */
 void qel_testkit_wait(qel_testkit_t* kit, int64_t milliseconds);
 
 /**
  * The test is over: what is still expected counts as missing. What the plug-in sends afterwards is
  * ignored.
  *
+ * @param kit  the kit
  * @return whether everything went as expected
  */
 bool qel_testkit_end(qel_testkit_t* kit);
@@ -102,6 +115,7 @@ bool qel_testkit_end(qel_testkit_t* kit);
  * What went wrong so far: a sentence in each line, "" if nothing. It never has an access token,
  * unless that is shorter than 8 bytes.
  *
+ * @param kit  the kit
  * @return a text that is valid until the next call with the kit
  */
 const char* qel_testkit_report(const qel_testkit_t* kit);

@@ -20,6 +20,7 @@ extern "C" {
  * which there was no memory is missing.
  *
  * @param text  what to look for; NULL for every line
+ * @return their number
  */
 int qel_testlog_count(const char* text);
 
@@ -31,7 +32,7 @@ int qel_testlog_count(const char* text);
  */
 const char* qel_testlog_find(const char* text);
 
-/** Forgets all lines. */
+/** Forgets all lines. What qel_testlog_find() has returned is no longer valid. */
 void qel_testlog_clear(void);
 
 #ifdef __cplusplus

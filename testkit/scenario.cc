@@ -1,6 +1,5 @@
 #include "scenario.h"
 
-#include <limits>
 #include <map>
 #include <utility>
 
@@ -257,9 +256,6 @@ class Parser {
 }  // namespace
 
 void parse_scenario(const std::string& text, Scenario* scenario) {
-  if (text.size() > static_cast<size_t>(std::numeric_limits<int>::max())) {
-    throw Misread{{1, 1}, "it has 2 GiB or more"};
-  }
   Parser(text, scenario).parse();
 }
 

@@ -1,7 +1,9 @@
 // The C functions. No exception leaves them.
 #include <google/protobuf/stubs/common.h>
 
+#include <cstring>
 #include <exception>
+#include <limits>
 #include <memory>
 #include <new>
 #include <optional>
@@ -24,23 +26,35 @@ struct qel_testkit {
 
 namespace {
 
+// Returns why it failed, or "". A lack of memory is the caller's matter.
+template <typename Run>
+std::string failure_of(const Run& run) {
+  const google::protobuf::LogSilencer silence;  // of texts that are no UTF-8
+  try {
+    run();
+    return "";
+  } catch (const testkit::Misread& misread) {
+    return "The scenario cannot be read: line " + std::to_string(misread.place.line) + ", column " +
+           std::to_string(misread.place.column) + ": " + misread.reason +
+           (misread.reason.back() == '.' ? "\n" : ".\n");
+  } catch (const testkit::Unreadable& unreadable) {
+    return "The session cannot be replayed: " + unreadable.reason + ".\n";
+  } catch (const std::bad_alloc&) {
+    throw;
+  } catch (const std::exception& problem) {
+    return std::string("The test kit has a mistake, or was called wrongly: ") + problem.what() +
+           ".\n";
+  }
+}
+
 // Returns null without memory.
 template <typename Make>
 qel_testkit_t* make_kit(const Make& make) {
-  const google::protobuf::LogSilencer silence;
   try {
     auto result = std::make_unique<qel_testkit>();
-    try {
-      make(result.get());
-    } catch (const testkit::Misread& misread) {
-      result->failure = "The scenario cannot be read: line " + std::to_string(misread.place.line) +
-                        ", column " + std::to_string(misread.place.column) + ": " + misread.reason +
-                        (misread.reason.back() == '.' ? "\n" : ".\n");
-    } catch (const testkit::Unreadable& unreadable) {
-      result->failure = "The session cannot be replayed: " + unreadable.reason + ".\n";
-    }
+    result->failure = failure_of([&] { make(result.get()); });
     return result.release();
-  } catch (const std::exception&) {
+  } catch (const std::bad_alloc&) {
     return nullptr;
   }
 }
@@ -48,14 +62,16 @@ qel_testkit_t* make_kit(const Make& make) {
 // What fails leaves a kit that plays nothing more.
 template <typename Use>
 void use(qel_testkit_t* kit, const Use& use) {
-  const google::protobuf::LogSilencer silence;  // of texts that are no UTF-8
+  if (kit->player == nullptr) {
+    return;
+  }
   try {
-    if (kit->player != nullptr) {
-      use(kit->player.get());
-    }
-  } catch (const std::exception&) {
-    kit->player.reset();
+    kit->failure = failure_of([&] { use(kit->player.get()); });
+  } catch (const std::bad_alloc&) {
     kit->failure = "Out of memory.\n";  // in the string itself
+  }
+  if (!kit->failure.empty()) {
+    kit->player.reset();
   }
 }
 
@@ -63,6 +79,9 @@ void use(qel_testkit_t* kit, const Use& use) {
 
 qel_testkit_t* qel_testkit_new(const char* scenario) {
   return make_kit([scenario](qel_testkit_t* result) {
+    if (scenario != nullptr && std::strlen(scenario) > std::numeric_limits<int>::max()) {
+      throw testkit::Misread{{1, 1}, "it has 2 GiB or more"};  // its reader counts so far
+    }
     result->player = std::make_unique<testkit::Kit>(scenario != nullptr ? scenario : "");
   });
 }

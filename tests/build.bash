@@ -85,6 +85,16 @@ compile_with_cmake() {
   cmake --build built
 }
 
+# take_examples: writes what docs/testing.md has to files: first.c, what is said of its mistake, the lines
+# that qel-testkit reads, and its answers.
+take_examples() {
+  awk '/^```/ { on = !on; block += on; next }
+    on && block == 1 { print >"first.c" }
+    on && block == 3 { print >"mistake" }
+    on && sub(/^< /, "") { print >"lines" }
+    on && sub(/^> /, "") { print >"answers" }' "$SOURCE/docs/testing.md"
+}
+
 # prints TEXT TREE PROGRAM [ARGUMENT...]: what the program prints.
 prints() {
   local emulator=()

@@ -194,23 +194,37 @@ install_testkit() {
   flags+=(-std=c99 -pedantic -Wall -Wextra -Werror "-Wl,-rpath,$PWD/tree/$LIBDIR")
 }
 
-# block N: of docs/testing.md, what stands in its N-th block.
-block() { awk -v n="$1" '/^```/ {on = !on; i += on; next} on && i == n' "$SOURCE/docs/testing.md"; }
-
 @test "the first test of docs/testing.md is good, and finds the mistake that the page makes" {
   install_testkit qel-message-testkit
-  block 1 >first.c
+  take_examples
   "$CC" first.c "${flags[@]}" -o first
   prints good tree ./first
   sed 's/echo\.requestId/1/' first.c >second.c
   "$CC" second.c "${flags[@]}" -o second
   DLOG_STANDIN_PRIORITY=S run -1 ./second
-  diff <(block 3) - <<<"$output"
+  diff mistake - <<<"$output"
+}
+
+@test "a test of a plug-in compiles by the CMake package" {
+  install_testkit qel-message-testkit
+  take_examples
+  configure 'find_package(qel-message-protosvc REQUIRED COMPONENTS testkit)
+    add_executable(first first.c)
+    target_link_libraries(first PRIVATE qel-message-protosvc::testkit)' -DCMAKE_PREFIX_PATH="$PWD/tree"
+  cmake --build built
+  prints good tree built/first
+}
+
+@test "CMake refuses the test kit where it is not installed" {
+  cp -r "$tree" moved
+  rm "moved/$LIBDIR/libqel-message-testkit.so"
+  refused "The component 'testkit' is not in $PWD/moved/$LIBDIR: install qel-message-testkit too." configure \
+    'find_package(qel-message-protosvc REQUIRED COMPONENTS testkit)' -DCMAKE_PREFIX_PATH="$PWD/moved"
 }
 
 @test "a test of a plug-in needs a C compiler, and nothing of Protocol Buffers" {
   install_testkit qel-message-testkit
-  block 1 >first.c
+  take_examples
   "$CC" -H first.c "${flags[@]}" -o first 2>&1 | sed -n 's/^\.\.* //p' | xargs -d '\n' realpath |
     grep -v '^/usr/' | sed 's/.*\///' |
     diff - <(printf '%s\n' qel-message.h qel-message-serialize.h qel-testkit.h)
@@ -240,5 +254,7 @@ TXT
 @test "the scenarios and the program are installed" {
   install_testkit qel-message-testkit
   diff <(ls "$SOURCE/testkit/scenarios") <(ls tree/share/qel-message-protosvc/scenarios)
-  tree/bin/qel-testkit --scenario tree/share/qel-message-protosvc/service.scenario </dev/null
+  take_examples
+  tree/bin/qel-testkit --scenario tree/share/qel-message-protosvc/scenarios/connection.scenario <lines >said
+  diff answers said
 }

@@ -47,7 +47,7 @@ said_by() {
   run run_demo --port "$(cat port)"
   kill "$front_end"
   [ "$status" -ne 0 ]
-  says "front_end: port $(cat port) is taken: choose another with --port, or leave --port out"
+  says "front_end: port $(cat port) is taken: choose another, or 0 for any that is free"
 }
 
 @test "the example without qel-message.h reads a reply and writes an answer" {

@@ -30,6 +30,12 @@ in_document() {
   done
 }
 
+@test "what is in two packages is one component of a release" {
+  in_document cdx "*(c['bom-ref'] for c in d['components']), sep='\n'" | sort | uniq -d | none
+  in_document cdx "*(c['ref'] for c in d['dependencies'] if 'CLI11' in c['dependsOn'])" |
+    diff - <(echo qel-message-testkit qel-wire)
+}
+
 @test "Debian's changelog tells a release from what comes before and after it" {
   mkdir -p packaging/debian
   cp "$SOURCE/packaging/debian_changelog.py" packaging

@@ -12,6 +12,7 @@
 #include <cstdlib>
 #include <filesystem>
 #include <fstream>
+#include <iterator>
 #include <memory>
 #include <string>
 #include <vector>
@@ -27,11 +28,11 @@ using support::hex;
 // For each message, in seconds: long for a busy machine, short for the tests of silence.
 const std::string kTimeout = " --timeout 3";
 
-// A program whose standard error is kept and whose standard output is dropped.
+// A program whose standard error is kept, and whose standard output goes to a file or is dropped.
 class Program {
  public:
-  explicit Program(const std::string& command)
-      : errors_(popen((QEL_EMULATOR " " + command + " 2>&1 >/dev/null").c_str(), "r")) {}
+  explicit Program(const std::string& command, const std::string& output = "/dev/null")
+      : errors_(popen((QEL_EMULATOR " " + command + " 2>&1 >" + output).c_str(), "r")) {}
   ~Program() { end(); }
   Program(const Program&) = delete;
   Program& operator=(const Program&) = delete;
@@ -248,23 +249,25 @@ Fields auth() {
 class FrontEnd : public ::testing::Test {
  protected:
   void SetUp() override {
-    std::string folder = testing::TempDir() + "front-end-XXXXXX";
-    ASSERT_NE(mkdtemp(folder.data()), nullptr);
-    const std::string port_file = folder + "/port";
-    program_ = std::make_unique<Program>(QEL_FRONT_END " --scenario " QEL_DAY " --port-file " +
-                                         port_file + kTimeout);
+    ASSERT_NE(mkdtemp(folder_.data()), nullptr);
+    const std::string port_file = folder_ + "/port";
+    program_ = std::make_unique<Program>(
+        QEL_FRONT_END " --scenario " QEL_DAY " --port-file " + port_file + kTimeout,
+        folder_ + "/transcript");
     for (int tries = 0; tries < 200 && access(port_file.c_str(), R_OK) != 0; ++tries) {
       usleep(50000);
     }
     int port = 0;
     std::ifstream(port_file) >> port;
-    std::filesystem::remove_all(folder);
 
     connection_ = socket(AF_INET, SOCK_STREAM | SOCK_CLOEXEC, 0);
     const sockaddr_in address = loopback(port);
     ASSERT_EQ(connect(connection_, reinterpret_cast<const sockaddr*>(&address), sizeof address), 0);
   }
-  void TearDown() override { close(connection_); }
+  void TearDown() override {
+    close(connection_);
+    std::filesystem::remove_all(folder_);
+  }
 
   void authenticate() {
     send_message(connection_, "ChannelAuthRequest", auth());
@@ -274,7 +277,16 @@ class FrontEnd : public ::testing::Test {
     shutdown(connection_, SHUT_WR);
     program_->expect_end(1, "front_end: " + reason + "\n");
   }
+  // Whether the text is in what it has printed when it has ended.
+  bool has_printed(const std::string& text) {
+    shutdown(connection_, SHUT_WR);
+    program_.reset();
+    std::ifstream file(folder_ + "/transcript");
+    const std::string transcript{std::istreambuf_iterator<char>(file), {}};
+    return transcript.find(text) != std::string::npos;
+  }
 
+  std::string folder_ = testing::TempDir() + "front-end-XXXXXX";
   int connection_ = -1;
   std::unique_ptr<Program> program_;
 };
@@ -353,6 +365,21 @@ TEST_F(FrontEnd, WhenTheConnectionBreaksWithinAFrame_Fails) {
                  5, 0),
             5);
   expect_failure("the connection broke or fell silent");
+}
+
+TEST_F(FrontEnd, WhenALoginComesUnderAnotherName_ShowsNoAccessToken) {
+  send_message(connection_, "InboxEntry", auth());
+  EXPECT_FALSE(has_printed("example-access-token"));
+}
+
+TEST_F(FrontEnd, WhenTheAccessTokenStandsInAnotherField_HidesItThereToo) {
+  send_message(connection_, "ChannelAuthRequest", auth().text(5, "an example-access-token"));
+  EXPECT_TRUE(has_printed("appId: \"an (not shown)\""));
+}
+
+TEST_F(FrontEnd, WhenANameIsNone_DoesNotPrintIt) {
+  send_message(connection_, "\x1b[2J", Fields());
+  EXPECT_TRUE(has_printed("plug-in -> service  no message of the schema, 0 bytes\n"));
 }
 
 TEST(FrontEndAlone, WhenNobodyComes_Fails) {

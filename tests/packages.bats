@@ -53,10 +53,11 @@ run_installed() {
   fi
 }
 
-# compile SOURCE: a program in C of the installed packages, which finds its library as a device's does.
+# compile SOURCE [MODULE]: a program in C of the installed packages, which finds its library as a device's
+# does.
 compile() {
   local flags
-  flags_of "$root/usr" qel-message-protosvc
+  flags_of "$root/usr" "${2:-qel-message-protosvc}"
   "$CC" -std=c99 -Wall -Wextra -Werror -g -no-pie "$1" "${flags[@]}" -o program
 }
 
@@ -143,10 +144,20 @@ TXT
   zgrep 'broken at offset\|explain' "$root/usr/share/man/man1/qel-wire.1.gz"
 }
 
+@test "the first test of docs/testing.md is good, and needs a C compiler alone" {
+  [ -z "$TOOLCHAIN" ] || skip 'it is for workstations'
+  take_examples
+  compile first.c qel-message-testkit
+  DLOG_STANDIN_PRIORITY=S run -0 run_installed ./program
+  [ "$output" = good ]
+}
+
 @test "the test kit's program plays a scenario of its package" {
   [ -z "$TOOLCHAIN" ] || skip 'it is for workstations'
+  take_examples
   run_installed "$root/usr/bin/qel-testkit" \
-    --scenario "$root/usr/share/qel-message-protosvc/service.scenario" </dev/null
+    --scenario "$root/usr/share/qel-message-protosvc/scenarios/connection.scenario" <lines >said
+  diff answers said
 }
 
 @test "nothing is left where the packages are removed" {

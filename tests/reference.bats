@@ -45,12 +45,28 @@ man_pages_with() {
 
 @test "every function of qel-message.h has a man page, which names the function that it stands on" {
   cd "$docs/man/man3"
+  mapfile -t pages < <(printf '%s\n' qel_*_{read,write,release}.3 | grep -v '^qel_test')
   diff <(grep -oE '\bqel_[a-z_]+_(read|write|release)\(' "$SOURCE/proto-lib/qel-message.h" |
-    grep -v internal | tr -d '(' | sort -u) \
-    <(printf '%s\n' qel_*_{read,write,release}.3 | sed 's/[.]3$//' | sort)
-  grep -LF '#include <qel\-message.h>' qel_*_{read,write,release}.3 | none
+    grep -v internal | tr -d '(' | sort -u) <(printf '%s\n' "${pages[@]%.3}" | sort)
+  grep -LF '#include <qel\-message.h>' "${pages[@]}" | none
   sed -sn '/^\.SH "SEE ALSO"/,$p' qel_*_{read,write}.3 | grep -oE '[a-z_]+serialize' | sort -u |
     diff <(functions | grep -v '^forward_stored_message_' | sort) -
+}
+
+@test "every function of the test kit has a man page" {
+  cd "$docs/man/man3"
+  for name in testkit testlog; do
+    diff <(grep -oE "\bqel_${name}_\w+\(" "$SOURCE/testkit/qel-$name.h" | tr -d '(' | sort -u) \
+      <(grep -lF "#include <qel\-$name.h>" "qel_$name"_*.3 | grep -v '_t[.]3$' | sed 's/[.]3$//')
+  done
+}
+
+@test "the man page of a header includes it" {
+  cd "$docs/man/man3"
+  for page in qel-*.h.3; do
+    name=${page%.3}
+    grep -qxF ".B #include <${name//-/\\-}>" "$page" || echo "$page"
+  done | none
 }
 
 @test "every value and macro of qel-message.h has an entry and is on a man page" {
@@ -70,7 +86,7 @@ man_pages_with() {
 }
 
 @test "every record has an entry" {
-  diff <(sed -nE 's/^\} (qel_[a-z_]+_t);/\1/p' "$header" "$SOURCE/proto-lib/qel-message.h" |
+  diff <(sed -nE 's/^\} (qel_[a-z_]+_t);/\1/p' "$header" "$SOURCE"/{proto-lib/qel-message,testkit/qel-testkit}.h |
     grep -vE '^qel_(status|result_code|chat_type|msg_type|content_type)_t' | sort) \
     <(sed -nE 's/.*<title>.*: (.*) Struct Reference<.*/\1/p' struct*.html | sort)
 }
@@ -104,6 +120,7 @@ man_pages_with() {
   cp -r "$SOURCE/docs" docs
   sed '/@param callId /d' "$header" >proto-lib/qel-message-serialize.h
   cp "$SOURCE/proto-lib/qel-message.h" proto-lib
+  ln -s "$SOURCE/testkit" testkit
   touch doxygen-awesome.css
   QEL_VERSION='' QEL_PLANTUML='' QEL_DOXYGEN_THEME=$PWD QEL_DOCS_PAGES='' QEL_DOCS_FOLDER=$PWD \
     run ! doxygen docs/Doxyfile

@@ -24,6 +24,29 @@ serve() {
   return "$served"
 }
 
+# listen SCENARIO: lets this shell be the plug-in, which sends and receives by the descriptor $plugin.
+listen() {
+  local line
+  echo "world { isSignedIn: true } $1" >scenario
+  coproc TESTKIT { exec "$BUILT/qel-testkit" --listen 0 --timeout 2 --scenario scenario 2>report 3>&-; }
+  served=$TESTKIT_PID
+  read -r line <&"${TESTKIT[0]}"
+  exec {plugin}<>"/dev/tcp/127.0.0.1/${line##*:}"
+}
+
+# ends_with STATUS: the program that 'listen' has begun.
+ends_with() {
+  local ended=0
+  wait "$served" || ended=$?
+  [ "$ended" -eq "$1" ]
+}
+
+# ask_for_time TIMES: the plug-in's request.
+ask_for_time() {
+  local id
+  for id in $(seq "$1"); do printf '\22CurrentTimeRequest\0\0\0\2X%b' "\\x$id" >&"$plugin"; done
+}
+
 # record FILE OPTION...: serve, with a session file of the demo's plug-in, by the recorder.
 record() {
   [ -e "$RECORDER" ] || skip 'there is no recorder'
@@ -63,17 +86,59 @@ TXT
 }
 
 @test "lines that mean nothing end it with status 2" {
-  for line in 'ChatRequest 0' 'ChatRequest xx' 'wait long' 'wait -1' 'wait' 'ChatRequest 08 07' ''; do
+  for line in 'ChatRequest 0' 'ChatRequest xx' 'wait long' 'wait -1' 'wait' 'ChatRequest 08 07'; do
     run -2 testkit <<<"$line"
   done
 }
 
+@test "lines: a control character is part of none" {
+  for line in 'wait 1\0' 'wait\t1' 'wait 1\r' 'ChatRequest\0 08'; do
+    # shellcheck disable=SC2059 # its escapes are meant
+    printf "$line\n" >lines
+    run -2 testkit <lines
+  done
+}
+
+@test "lines: a problem has its line's number" {
+  run --separate-stderr -2 testkit <<<$'wait 1\n\nwait long'
+  [ "$stderr" = 'qel-testkit: line 3: no number of milliseconds' ]
+}
+
+@test "lines: a blank one is ignored" {
+  run --separate-stderr -0 testkit <<<$'\n  '
+  [ "$output" = 'next never' ]
+}
+
+@test "lines: the last one needs no end" {
+  run --separate-stderr -0 testkit < <(printf 'wait 1')
+  diff - <(printf '%s\n' 'next never' 'next never') <<<"$output"
+}
+
+@test "lines: none is read if there is nothing to play" {
+  echo 'expekt' >scenario
+  { testkit --scenario scenario 2>report || cat; } <<<'wait 1' >output
+  diff - output <<<'wait 1'
+}
+
 @test "wrong calls end it with status 2" {
-  for options in '--scenario' '--unknown x' '--listen x' '--scenario a --replay b' \
-    '--scenario none' '--timeout 0'; do
+  echo 'strict' >scenario
+  for options in '--scenario' '--unknown x' '--listen x' '--scenario scenario --replay scenario' \
+    '--scenario none' '--scenario .' '--listen 0 --timeout 0' '--timeout 1' '--ignore title' 'word'; do
     # shellcheck disable=SC2086 # several words
     run -2 testkit $options </dev/null
   done
+}
+
+@test "the empty name is that of no file" {
+  for option in --scenario --replay; do
+    run -2 testkit "$option" '' </dev/null
+  done
+}
+
+@test "a scenario with a byte of 0 is refused" {
+  printf 'strict\0expekt' >scenario
+  run -1 testkit --scenario scenario </dev/null
+  [ "$output" = 'qel-testkit: scenario is no text: a byte is 0' ]
 }
 
 @test "a text that is no scenario ends it with status 1, also before anybody connects" {
@@ -98,6 +163,51 @@ TXT
   sed '/^expect ChannelAuthRequest/a answer after 200ms' "$SOURCE/examples/day.scenario" >scenario
   serve --scenario scenario
   grep -x 'plug-in: session complete' said
+}
+
+@test "TCP: a plug-in that says no more when the scenario is over need not close the connection" {
+  listen 'expect CurrentTimeRequest'
+  ask_for_time 1
+  ends_with 0
+}
+
+@test "TCP: what is missing when the plug-in falls silent is reported, and nothing else" {
+  listen 'expect CurrentTimeRequest'
+  ends_with 1
+  diff - report <<<'Line 1 expects a CurrentTimeRequest, which never came.'
+}
+
+@test "TCP: what is due is waited for, beyond the time of silence too" {
+  listen 'expect CurrentTimeRequest answer after 2500ms'
+  ask_for_time 1
+  read -r -N 17 -u "$plugin" name
+  [ "$name" = $'\20CurrentTimeReply' ]
+  exec {plugin}>&-
+  ends_with 0
+}
+
+@test "TCP: a plug-in that closes the connection before the last message is found" {
+  listen 'push ClientEcho after 10s'
+  exec {plugin}>&-
+  ends_with 1
+  diff - <(sed 's/[0-9][0-9]*/N/' report) <<<'A ClientEcho was due N ms later, but the test was over.'
+}
+
+@test "TCP: a plug-in may close the connection without reading its answer" {
+  listen 'expect CurrentTimeRequest'
+  ask_for_time 1
+  until read -r -t 0 -u "$plugin"; do :; done
+  exec {plugin}>&-
+  ends_with 0
+}
+
+@test "TCP: a plug-in may close the connection before its answers are sent" {
+  listen ''
+  kill -STOP "$served" # so that it finds all of them, and the end
+  ask_for_time 7
+  exec {plugin}>&-
+  kill -CONT "$served"
+  ends_with 0
 }
 
 @test "the demo's session, recorded and replayed, gives equal outputs" {
