@@ -28,7 +28,10 @@ serve() {
 listen() {
   local line
   echo "world { isSignedIn: true } $1" >scenario
-  coproc TESTKIT { exec "$BUILT/qel-testkit" --listen 0 --timeout 2 --scenario scenario 2>report 3>&-; }
+  coproc TESTKIT {
+    exec ${EMULATOR:+"$EMULATOR"} "$BUILT/qel-testkit" --listen 0 --timeout 2 --scenario scenario \
+      2>report 3>&-
+  }
   served=$TESTKIT_PID
   read -r line <&"${TESTKIT[0]}"
   exec {plugin}<>"/dev/tcp/127.0.0.1/${line##*:}"
