@@ -10,19 +10,17 @@
 namespace testkit {
 namespace {
 
-using google::protobuf::FieldDescriptor;
 using google::protobuf::Message;
+
+bool is_absent(const Pattern& pattern, const char* name) {
+  return pattern.absent.count({pattern.fields.get(), pattern.type().FindFieldByName(name)}) > 0;
+}
 
 // A message that is delivered belongs to the request, unless the scenario says otherwise.
 void take_over(const char* name, const Message& request, const Pattern& pattern, Message* message) {
-  const FieldDescriptor* from = request.GetDescriptor()->FindFieldByName(name);
-  const FieldDescriptor* to = message->GetDescriptor()->FindFieldByName(name);
-  if (from == nullptr || to == nullptr || message->GetReflection()->HasField(*message, to) ||
-      !request.GetReflection()->HasField(request, from) ||
-      pattern.absent.count({pattern.fields.get(), to}) > 0) {
-    return;
+  if (has(request, name) && !has(*message, name) && !is_absent(pattern, name)) {
+    set_number(message, name, number_in(request, name));
   }
-  message->GetReflection()->SetInt64(message, to, request.GetReflection()->GetInt64(request, from));
 }
 
 }  // namespace
@@ -45,7 +43,7 @@ Kit::Kit(const std::string& scenario) {
 // ---- What the plug-in sends
 
 void Kit::take(const Message& message) {
-  Messages said = service_->take(message);
+  Said said = service_->take(message);
   wrong().add(subject(message), "is wrong", service_->complaints());
   check_rules(message);
   meet(message, std::move(said));
@@ -90,39 +88,46 @@ std::string Kit::expectations() const {
   return text;
 }
 
-// Of several that the message may be, it is the first that it fits, or else the first.
-void Kit::meet(const Message& message, Messages said) {
+// The first expectation that the message fits, or else the first of its name. A request that comes
+// again need not be one that is expected.
+std::vector<Kit::Expected>::iterator Kit::find_expected(const Message& message, bool is_again,
+                                                        std::vector<std::string>* differing) {
   auto found = expected_.end();
-  std::vector<std::string> wrong_with_it;
   for (auto it = expected_.begin(); it != expected_.end(); ++it) {
-    if (&it->expect->pattern.type() != message.GetDescriptor()) {
-      continue;
-    }
-    auto differing = differences(it->expect->pattern, message, wrong().secrets);
-    if (found == expected_.end() || differing.empty()) {
-      found = it;
-      wrong_with_it = std::move(differing);
-    }
-    if (wrong_with_it.empty()) {
-      break;
+    if (&it->expect->pattern.type() == message.GetDescriptor()) {
+      auto reasons = differences(it->expect->pattern, message, wrong().secrets);
+      if (reasons.empty()) {
+        differing->clear();
+        return it;
+      }
+      if (found == expected_.end() && !is_again) {
+        found = it;
+        *differing = std::move(reasons);
+      }
     }
   }
+  return found;
+}
+
+void Kit::meet(const Message& message, Said said) {
+  std::vector<std::string> differing;
+  const auto found = find_expected(message, said.is_again, &differing);
   if (found == expected_.end()) {
     if (is_strict_) {
       wrong().add(subject(message), "is not expected",
                   {expected_.empty() ? "the scenario is over" : expectations()});
     }
-    deliver_all(said, {});
+    deliver_all(said.messages, {});
     return;
   }
   const Expected met = *found;
   expected_.erase(found);
-  wrong().add(subject(message), "is not what " + *met.where + " expects", wrong_with_it);
+  wrong().add(subject(message), "is not what " + *met.where + " expects", differing);
   waiting_since_ = now();
   if (scenario_.answered.count(met.expect->number) > 0) {
-    asked_[met.expect->number] = {copy_of(message), std::move(said)};
+    asked_[met.expect->number] = {copy_of(message), std::move(said.messages)};
   } else {
-    deliver_all(said, {});
+    deliver_all(said.messages, {});
   }
   play(met.next, met.end);
 }
@@ -194,11 +199,7 @@ void Kit::push(const Push& statement) {
   }
   const Pattern& pattern = statement.pattern;
   const auto message = new_message(pattern.type());
-  const FieldDescriptor* id = pattern.type().FindFieldByName("requestId");
   service_->number(message.get());
-  if (id != nullptr && pattern.absent.count({pattern.fields.get(), id}) > 0) {
-    message->GetReflection()->ClearField(message.get(), id);
-  }
   put(pattern, message.get());
   deliver(*message, statement.faults);
 }
@@ -249,19 +250,20 @@ bool Kit::break_as(const Faults& faults, Delivery* delivery) {
 }
 
 void Kit::put_in_line(Sent sent, bool is_swapped) {
-  if (is_swapped && !held_back_.has_value()) {
-    held_back_ = std::move(sent);
+  if (is_swapped) {
+    held_back_.push_back(std::move(sent));
     return;
   }
-  const int64_t due = sent.due;
-  const auto place =
-      std::upper_bound(line_.begin(), line_.end(), due,
-                       [](int64_t time, const Sent& other) { return time < other.due; });
-  line_.insert(place, std::move(sent));
-  if (held_back_.has_value()) {
-    Sent held = *std::exchange(held_back_, std::nullopt);
-    held.due = std::max(held.due, due);
-    put_in_line(std::move(held), false);
+  int64_t due = sent.due;
+  held_back_.push_back(std::move(sent));
+  while (!held_back_.empty()) {  // the last is the one that they wait for
+    Sent next = std::move(held_back_.back());
+    held_back_.pop_back();
+    next.due = due = std::max(due, next.due);
+    const auto place =
+        std::upper_bound(line_.begin(), line_.end(), due,
+                         [](int64_t time, const Sent& other) { return time < other.due; });
+    line_.insert(place, std::move(next));
   }
 }
 
@@ -298,12 +300,17 @@ void Kit::time_passed() {
 }
 
 void Kit::finish() {
+  std::set<std::string> missing;
   for (const Expected& expected : expected_) {
-    wrong().add(with_capital(*expected.where) + " expects " +
-                with_article(expected.expect->pattern.type().name()) + ", which never came.");
+    const std::string& name = expected.expect->pattern.type().name();
+    missing.insert(name);
+    if (!expected.is_late) {
+      wrong().add(with_capital(*expected.where) + " expects " + with_article(name) +
+                  ", which never came.");
+    }
   }
-  if (held_back_.has_value()) {
-    wrong().add(with_capital(with_article(held_back_->delivery.name)) +
+  for (const Sent& sent : held_back_) {
+    wrong().add(with_capital(with_article(sent.delivery.name)) +
                 " was to be swapped with the next message, but none came.");
   }
   for (const Sent& sent : line_) {
@@ -317,8 +324,10 @@ void Kit::finish() {
                 with_article(statement->pattern.type().name()) +
                 ", but the plug-in did not sign in.");
   }
-  for (const std::string& sentence : service_->unanswered()) {
-    wrong().add(sentence);
+  for (const Unanswered& push : service_->unanswered()) {
+    if (missing.count(push.answer) == 0) {  // which was said
+      wrong().add(push.sentence);
+    }
   }
 }
 

@@ -63,7 +63,9 @@ class Kit : public Player {
   void play();
   void play(Script::const_iterator begin, Script::const_iterator end);
   void expect(const Statement& first, Script::const_iterator next, Script::const_iterator end);
-  void meet(const google::protobuf::Message& message, Messages said);
+  std::vector<Expected>::iterator find_expected(const google::protobuf::Message& message,
+                                                bool is_again, std::vector<std::string>* differing);
+  void meet(const google::protobuf::Message& message, Said said);
   std::string expectations() const;
   void check_rules(const google::protobuf::Message& message);
   void count(const google::protobuf::Message& message, const AtMost& most, Rule* rule);
@@ -84,7 +86,7 @@ class Kit : public Player {
   std::map<int, Asked> asked_;          // by the number of the expectation
   std::vector<const Push*> too_early_;  // until the plug-in has signed in
   std::deque<Sent> line_;               // in the order of their times
-  std::optional<Sent> held_back_;       // until the next one
+  std::vector<Sent> held_back_;         // until the next one
 };
 
 }  // namespace testkit

@@ -86,7 +86,11 @@ class PatternParser {
     const std::string name = tokens_.name("expected the name of a field, or '}'");
     const FieldDescriptor* field = type.FindFieldByName(name);
     if (field == nullptr) {
-      throw Misread{place, type.name() + " has no field '" + name + "'"};
+      const std::set<std::string> words{"always", "answer", "at",     "expect", "in",
+                                        "never",  "push",   "strict", "world"};
+      throw Misread{place,
+                    type.name() + " has no field '" + name + "'" +
+                        (words.count(name) > 0 ? ". Is there a '}' missing before it?" : "")};
     }
     return *field;
   }
@@ -109,21 +113,23 @@ class PatternParser {
     if (!has_colon && !tokens_.is_at("{")) {
       pattern_.present.emplace(message, &field);
     } else if (field.is_repeated() && tokens_.take("[")) {
-      list(message, field);
+      list(message, field, place);
     } else {
       value(message, field);
     }
   }
 
   // An empty one is a field that is not there.
-  void list(Message* message, const FieldDescriptor& field) {
-    while (!tokens_.take("]")) {
+  void list(Message* message, const FieldDescriptor& field, const Place& place) {
+    if (tokens_.take("]")) {
+      require_new(*message, field, place);
+      pattern_.absent.emplace(message, &field);
+      return;
+    }
+    do {
       value(message, field);
       tokens_.take(",");
-    }
-    if (!is_filled(*message, field)) {
-      pattern_.absent.emplace(message, &field);
-    }
+    } while (!tokens_.take("]"));
   }
 
   void value(Message* message, const FieldDescriptor& field) {
@@ -171,6 +177,10 @@ class PatternParser {
   void unknown(const Descriptor* type, UnknownFieldSet* fields) {
     const Place place = tokens_.place();
     const int number = tokens_.number("expected the number of a field");
+    const bool has_colon = tokens_.take(":");
+    if (!has_colon && !tokens_.is_at("{")) {
+      tokens_.fail("expected ':' or '{' behind the number of a field");
+    }
     if (number < 1 || number > FieldDescriptor::kMaxNumber) {
       throw Misread{place, "fields have numbers from 1 to " +
                                std::to_string(int{FieldDescriptor::kMaxNumber})};
@@ -180,7 +190,7 @@ class PatternParser {
       throw Misread{place, "the field " + std::to_string(number) + " is known: write its name, '" +
                                known->name() + "'"};
     }
-    if (!tokens_.take(":")) {
+    if (!has_colon) {
       UnknownFieldSet inner;
       if (++depth_ > kDeepest) {
         tokens_.fail("too many messages in each other");
@@ -347,7 +357,7 @@ class Comparison {
       compare_list(wanted, came, field, name);
     } else if (is_wanted && field.message_type() != nullptr) {
       compare_message(wanted, came, field, name);
-    } else if (is_odd || is_odd_wanted) {
+    } else if (is_wanted && (is_odd || is_odd_wanted)) {
       compare_unknown(wanted, came, field.number(), name);
     } else if (is_wanted && !is_there) {
       found.push_back(name + " is missing, which should be " + shown(wanted, field, -1, secrets_));

@@ -11,14 +11,14 @@
  * Pointers may be NULL only where that is said. Without memory for a call, the kit does nothing
  * from then on, and reports that.
  *
- * A test lets the plug-in begin, then repeats until nothing comes any more:
+ * A test lets the plug-in begin, then repeats, until nothing comes any more and the plug-in waits
+ * for nothing:
  *
  *     if (qel_testkit_next(kit, &delivery)) {
  *       ... the plug-in receives it, and what it sends goes to qel_testkit_sent() ...
- *     } else if (delivery.after_ms > 0) {
- *       qel_testkit_wait(kit, delivery.after_ms); ... and so much time passes for the plug-in ...
  *     } else {
- *       break;
+ *       ... of delivery.after_ms and the plug-in's own timer, the one that ends sooner ...
+ *       qel_testkit_wait(kit, sooner); ... and so much time passes for the plug-in ...
  *     }
  */
 #ifndef QEL_TESTKIT_H

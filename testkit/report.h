@@ -23,7 +23,14 @@ class Secrets {
   std::string hidden_in(std::string text) const;
 
  private:
-  std::set<std::string> tokens_;
+  // One may begin another, so the longest is the first.
+  struct IsLonger {
+    bool operator()(const std::string& one, const std::string& other) const {
+      return one.size() != other.size() ? one.size() > other.size() : one < other;
+    }
+  };
+
+  std::set<std::string, IsLonger> tokens_;
 };
 
 // A number of the plug-in's messages, and what it is.

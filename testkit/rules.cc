@@ -4,6 +4,8 @@
 #include <google/protobuf/stubs/common.h>
 
 #include <algorithm>
+#include <functional>
+#include <map>
 
 #include "messages.h"
 
@@ -35,24 +37,39 @@ class Check {
   void operator()(const InviteRequest& request) { users(request.invitingmembers()); }
 
   void operator()(const ChatRequest& request) {
+    std::map<int64_t, Written> before = state_.written;
     for (const ChatMessageParam& message : request.chatmessageparams()) {
+      const Written written{request.chatroomid(), message.chatmsg()};
+      const bool has_text = !message.chatmsg().empty() || message.has_securechatmsg();
       require(message.msgid() != 0, "its msgId is 0, which is that of no message");
-      require(!message.chatmsg().empty() || message.msgtype() != TEXT, "its text is empty");
-      require(message.msgttl() >= 0, "its msgTtl is negative");
-      new_or_repeated(request.chatroomid(), message);
+      require(has_text || message.msgtype() != TEXT, "its text is empty");
+      require(message.msgttl() >= 0,
+              "its msgTtl " + std::to_string(message.msgttl()) + " is negative");
+      new_or_repeated(message.msgid(), written, before);
+      before.emplace(message.msgid(), written);
     }
   }
 
   void operator()(const ReadMessageRequest& request) {
-    known(request.inboxentry().sender(), request.inboxentry().msgid());
+    if (request.has_inboxentry()) {
+      const InboxEntry& entry = request.inboxentry();
+      const Known* message = known(entry.sender(), entry.msgid(), request.chatroomid());
+      require(
+          message == nullptr || message->sent_time == 0 || message->sent_time == entry.senttime(),
+          "the message " + std::to_string(entry.msgid()) + " has another sentTime");
+    }
   }
 
-  void operator()(const UnsealMessageRequest& request) { known(request.sender(), request.msgid()); }
+  void operator()(const UnsealMessageRequest& request) {
+    known(request.sender(), request.msgid(), request.chatroomid());
+  }
 
   void operator()(const ChangeChatroomMetaRequest& request) {
-    require(request.has_title() != request.has_msgttl(),
-            "it should change the title or the lifetime, one of them");
-    require(request.msgttl() >= 0, "its msgTtl is negative");
+    require(request.has_title() || request.has_msgttl() || request.has_profileurl() ||
+                request.has_notionoff(),
+            "it changes nothing");
+    require(request.msgttl() >= 0,
+            "its msgTtl " + std::to_string(request.msgttl()) + " is negative");
   }
 
   void operator()(const EndChatRequest& request) {
@@ -62,12 +79,6 @@ class Check {
         chatroom(entry.chatroomid());
       }
     }
-  }
-
-  void operator()(const SaveCallLogRequest& request) {
-    const int64_t user = state_.world.userid();
-    require((request.sender() == user) != (request.receiver() == user),
-            "the user has to be the call's sender or its receiver");
   }
 
   void chatroom(int64_t id) {
@@ -89,77 +100,112 @@ class Check {
             "it has the user 0, which is the id of nobody");
   }
 
-  void known(int64_t sender, int64_t message) {
-    require(state_.known.count({sender, message}) > 0,
-            "there is no message " + std::to_string(message) + " of the user " +
-                std::to_string(sender));
+  // Null if there is none.
+  const Known* known(int64_t sender, int64_t message, int64_t chatroom) {
+    const auto found = state_.known.find({sender, message});
+    if (found == state_.known.end()) {
+      require(false, "there is no message " + std::to_string(message) + " of the user " +
+                         std::to_string(sender));
+      return nullptr;
+    }
+    const Known& result = found->second;
+    require(result.chatroom == 0 || result.chatroom == chatroom,
+            "the message " + std::to_string(message) + " is one of the chatroom " +
+                std::to_string(result.chatroom));
+    return &result;
   }
 
-  // A message that waits for its answer may be sent again, as the same: then nobody gets it twice.
-  void new_or_repeated(int64_t room, const ChatMessageParam& message) {
-    constexpr int64_t kPatience = 1000;  // milliseconds: until then, it is another message
-    const auto same_id = state_.written.find(message.msgid());
-    const auto is_same = [room, &message](const Written& written) {
-      return written.chatroom == room && written.text == message.chatmsg();
+  // A message may be sent again, as the same: then nobody gets it twice.
+  void new_or_repeated(int64_t id, const Written& message,
+                       const std::map<int64_t, Written>& before) {
+    const auto is_same = [&message](const Written& written) {
+      return written.chatroom == message.chatroom && written.text == message.text;
     };
-    if (same_id != state_.written.end()) {
+    const auto same_id = before.find(id);
+    if (same_id != before.end()) {
       require(is_same(same_id->second),
-              "its msgId " + std::to_string(message.msgid()) + " is that of another message");
+              "its msgId " + std::to_string(id) + " is that of another message");
       return;
     }
-    for (const auto& [id, written] : state_.written) {
-      require(!is_same(written) || written.is_answered || state_.now - written.since < kPatience,
-              "it has the text of the message " + std::to_string(id) +
-                  ", which is not answered yet, but another msgId");
+    for (const auto& [other, written] : before) {
+      require(!state_.world.hasdistincttexts() || !is_same(written),
+              "it has the text of the message " + std::to_string(other) + ", but another msgId");
     }
   }
 
   const State& state_;
 };
 
-void find_broken_texts(const Message& message, const std::string& path,
-                       std::vector<std::string>* found) {
+using Inside = std::function<void(const Message& message, const std::string& path)>;
+
+// The message, and those inside it.
+void for_each_inside(const Message& message, const std::string& path, const Inside& use) {
+  use(message, path);
   std::vector<const FieldDescriptor*> fields;
   const auto& values = *message.GetReflection();
   values.ListFields(message, &fields);
   for (const FieldDescriptor* field : fields) {
-    const std::string name = path + field->name();
-    const int count = field->is_repeated() ? values.FieldSize(message, field) : 1;
-    for (int i = 0; i < count; ++i) {
-      if (field->message_type() != nullptr) {
-        find_broken_texts(field->is_repeated() ? values.GetRepeatedMessage(message, field, i)
-                                               : values.GetMessage(message, field),
-                          name + ".", found);
-      } else if (field->type() == FieldDescriptor::TYPE_STRING) {
-        const std::string text = field->is_repeated() ? values.GetRepeatedString(message, field, i)
-                                                      : values.GetString(message, field);
-        if (!google::protobuf::internal::IsStructurallyValidUTF8(text.data(),
-                                                                 static_cast<int>(text.size()))) {
-          found->push_back(name);
-        }
+    const std::string inside = path + field->name() + ".";
+    if (field->message_type() != nullptr && field->is_repeated()) {
+      for (int i = 0; i < values.FieldSize(message, field); ++i) {
+        for_each_inside(values.GetRepeatedMessage(message, field, i), inside, use);
       }
+    } else if (field->message_type() != nullptr) {
+      for_each_inside(values.GetMessage(message, field), inside, use);
     }
+  }
+}
+
+bool is_utf8(const std::string& text) {
+  return google::protobuf::internal::IsStructurallyValidUTF8(text.data(),
+                                                             static_cast<int>(text.size()));
+}
+
+// The schema has no lists of texts.
+void find_broken_texts(const Message& message, const std::string& path,
+                       std::vector<std::string>* found) {
+  std::vector<const FieldDescriptor*> fields;
+  message.GetReflection()->ListFields(message, &fields);
+  for (const FieldDescriptor* field : fields) {
+    if (field->type() == FieldDescriptor::TYPE_STRING &&
+        !is_utf8(message.GetReflection()->GetString(message, field))) {
+      found->push_back(path + field->name() + " is not UTF-8");
+    }
+  }
+}
+
+void find_unknown_fields(const Message& message, const std::string& path,
+                         std::vector<std::string>* found) {
+  const auto& unknown = message.GetReflection()->GetUnknownFields(message);
+  for (int i = 0; i < unknown.field_count(); ++i) {
+    const int number = unknown.field(i).number();
+    const FieldDescriptor* field = message.GetDescriptor()->FindFieldByNumber(number);
+    found->push_back(field == nullptr
+                         ? "the schema has no field " + path + std::to_string(number)
+                         : path + field->name() + " has a value that the schema does not have");
   }
 }
 
 }  // namespace
 
-std::vector<std::string> mistakes_in(const Message& request, const State& state) {
-  Check check(state);
-  const FieldDescriptor* chatroom = request.GetDescriptor()->FindFieldByName("chatroomId");
-  if (chatroom != nullptr && request.GetReflection()->HasField(request, chatroom)) {
-    check.chatroom(request.GetReflection()->GetInt64(request, chatroom));
-  }
-  visit<ChannelAuthRequest, CreateChatroomRequest, InviteRequest, ChatRequest, ReadMessageRequest,
-        UnsealMessageRequest, ChangeChatroomMetaRequest, EndChatRequest, SaveCallLogRequest>(
-      request, [&check](const auto& of_type) { check(of_type); });
-  return check.found;
+std::vector<std::string> mistakes_in_form(const Message& message) {
+  std::vector<std::string> found;
+  for_each_inside(message, "", [&found](const Message& inside, const std::string& path) {
+    find_unknown_fields(inside, path, &found);
+    find_broken_texts(inside, path, &found);
+  });
+  return found;
 }
 
-std::vector<std::string> broken_texts(const Message& message) {
-  std::vector<std::string> found;
-  find_broken_texts(message, "", &found);
-  return found;
+std::vector<std::string> mistakes_in(const Message& request, const State& state) {
+  Check check(state);
+  if (has(request, "chatroomId")) {
+    check.chatroom(number_in(request, "chatroomId"));
+  }
+  visit<ChannelAuthRequest, CreateChatroomRequest, InviteRequest, ChatRequest, ReadMessageRequest,
+        UnsealMessageRequest, ChangeChatroomMetaRequest, EndChatRequest>(
+      request, [&check](const auto& of_type) { check(of_type); });
+  return check.found;
 }
 
 }  // namespace testkit

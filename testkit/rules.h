@@ -11,11 +11,11 @@
 
 namespace testkit {
 
-// What is wrong with a request, in words.
-std::vector<std::string> mistakes_in(const google::protobuf::Message& request, const State& state);
+// What is wrong with a message whatever the service knows, in words.
+std::vector<std::string> mistakes_in_form(const google::protobuf::Message& message);
 
-// The names of fields whose texts are not UTF-8, also in the messages inside it.
-std::vector<std::string> broken_texts(const google::protobuf::Message& message);
+// What is wrong with a request.
+std::vector<std::string> mistakes_in(const google::protobuf::Message& request, const State& state);
 
 }  // namespace testkit
 

@@ -12,8 +12,7 @@ using google::protobuf::Descriptor;
 
 constexpr char kWords[] =
     "expected 'expect', 'in any order', 'answer', 'push', 'at most', 'never', 'always', 'strict' "
-    "or 'world', or behind a message to deliver 'after', 'twice', 'dropped', 'swapped with the "
-    "next', 'cut at', 'corrupt byte' or 'as'";
+    "or 'world'";
 
 class Parser {
  public:
@@ -22,7 +21,7 @@ class Parser {
   void parse() {
     while (!tokens_.is_at_end()) {
       if (tokens_.take("world")) {
-        put(parse_pattern(*World::descriptor(), &tokens_), &scenario_.world);
+        world();
       } else if (tokens_.is_at("in")) {
         scenario_.script.push_back(any_order());
       } else {
@@ -32,25 +31,36 @@ class Parser {
   }
 
  private:
+  void world() {
+    const Place place = tokens_.place();
+    const Pattern pattern = parse_pattern(*World::descriptor(), &tokens_);
+    require_values(pattern, place);
+    if (!pattern.fields->GetReflection()->GetUnknownFields(*pattern.fields).empty()) {
+      throw Misread{place, "the world has no fields by their numbers"};
+    }
+    put(pattern, &scenario_.world);
+  }
+
   Statement any_order() {
     Statement result{where(), AnyOrder{}};
     for (const char* word : {"in", "any", "order", "{"}) {
       tokens_.expect(word);
     }
     auto& scripts = std::get<AnyOrder>(result.what).scripts;
-    while (!tokens_.take("}")) {
+    do {
       if (tokens_.is_at("expect")) {
         scripts.emplace_back();
       } else if (scripts.empty()) {
-        tokens_.fail("expected 'expect' or '}'");
+        tokens_.fail("expected 'expect'");
       }
       scripts.back().push_back(statement());
-    }
+    } while (!tokens_.take("}"));
     return result;
   }
 
   Statement statement() {
     const std::string place = where();
+    const std::string also = std::exchange(may_follow_, "");
     if (tokens_.take("expect")) {
       return {place, expect()};
     }
@@ -73,26 +83,37 @@ class Parser {
     if (tokens_.take("strict")) {
       return {place, Strict{}};
     }
-    tokens_.fail(kWords);
+    tokens_.fail(kWords + also);
   }
 
   Expect expect() {
     Expect result;
     result.pattern = message_of_plugin();
-    result.within = within();
     result.number = ++expectations_;
     if (!is_reply(result.pattern.type())) {
       last_request_ = result.number;
       requests_[result.number] = &result.pattern.type();
     }
-    if (tokens_.take("called")) {
-      const Place place = tokens_.place();
-      const std::string name = tokens_.name("expected a name for the request");
-      if (!names_.emplace(name, last_request_).second || last_request_ != result.number) {
-        throw Misread{place, "the name '" + name + "' is that of another request, or of a reply"};
+    for (bool goes_on = true; goes_on;) {
+      if (tokens_.take("called")) {
+        call(result.number);
+      } else if (tokens_.take("within")) {
+        result.within = time();
+      } else {
+        goes_on = false;
       }
     }
+    may_follow_ = ", or behind an expectation 'within' or 'called'";
     return result;
+  }
+
+  // Gives the request a name.
+  void call(int expectation) {
+    const Place place = tokens_.place();
+    const std::string name = tokens_.name("expected a name for the request");
+    if (requests_.count(expectation) == 0 || !names_.emplace(name, expectation).second) {
+      throw Misread{place, "the name '" + name + "' is that of another request, or of a reply"};
+    }
   }
 
   // The service's own, or some fields of it, or another message.
@@ -144,15 +165,19 @@ class Parser {
 
   AtMost at_most(int count) {
     AtMost result{count, message_of_plugin(), kNoLimit};
-    result.within = within();
+    if (tokens_.take("within")) {
+      result.within = time();
+    }
+    may_follow_ = ", or behind the message 'within'";
     return result;
   }
 
+  // Parts of messages are none that could be sent.
   const Descriptor& message_name() {
     const Place place = tokens_.place();
     const std::string name = tokens_.name("expected the name of a message");
     const Descriptor* type = message_type(name);
-    if (type == nullptr) {
+    if (type == nullptr || type->FindFieldByName("requestId") == nullptr) {
       throw Misread{place, "there is no message '" + name + "'"};
     }
     return *type;
@@ -172,11 +197,15 @@ class Parser {
     return result;
   }
 
-  static void require_deliverable(const Pattern& pattern, const Place& place) {
+  static void require_values(const Pattern& pattern, const Place& place) {
     if (!pattern.present.empty()) {
-      throw Misread{place, "the field '" + pattern.present.begin()->second->name() +
-                               "' of a message to deliver needs a value"};
+      throw Misread{
+          place, "the field '" + pattern.present.begin()->second->name() + "' needs a value here"};
     }
+  }
+
+  static void require_deliverable(const Pattern& pattern, const Place& place) {
+    require_values(pattern, place);
     if (pattern.fields != nullptr && is_from_plugin(pattern.type())) {
       throw Misread{place, "the service does not send '" + pattern.type().name() + "'"};
     }
@@ -184,6 +213,9 @@ class Parser {
 
   void faults(Faults* result) {
     std::set<std::string> words;
+    may_follow_ =
+        ", or behind a message to deliver 'after', 'twice', 'dropped', 'swapped with the next', "
+        "'cut at', 'corrupt byte' or 'as'";
     for (Place place = tokens_.place(); is_at_fault(); place = tokens_.place()) {
       const std::string word = tokens_.take();
       if (!words.insert(word).second) {
@@ -192,6 +224,9 @@ class Parser {
       fault(word, result);
       if (words.count("dropped") > 0 && words.size() > 1) {
         throw Misread{place, "nothing else can happen to a message that is dropped"};
+      }
+      if (result->is_twice && result->is_swapped) {
+        throw Misread{place, "a message that is swapped with the next comes once"};
       }
     }
   }
@@ -228,8 +263,6 @@ class Parser {
     }
   }
 
-  int64_t within() { return tokens_.take("within") ? time() : kNoLimit; }
-
   // In milliseconds.
   int64_t time() {
     constexpr int64_t kSecond = 1000;
@@ -247,6 +280,7 @@ class Parser {
 
   Tokens tokens_;
   Scenario& scenario_;
+  std::string may_follow_;  // what else than a statement, in words
   int expectations_ = 0;
   int last_request_ = 0;                       // the number of its expectation, or 0
   std::map<int, const Descriptor*> requests_;  // by the same number

@@ -6,6 +6,7 @@
 #include <limits>
 #include <utility>
 
+#include "qel-message.h"
 #include "rules.h"
 
 namespace testkit {
@@ -15,7 +16,12 @@ using google::protobuf::Descriptor;
 using google::protobuf::FieldDescriptor;
 using google::protobuf::Message;
 
-enum ResultCode { kOk = 0, kSomeRefused = 1001, kBadToken = 2001, kSomeNotInvited = 3003 };
+enum ResultCode {
+  kOk = 0,
+  kBadToken = 2001,
+  kSomeRefused = QEL_RESULT_REFUSED_1001,
+  kSomeNotInvited = QEL_RESULT_REFUSED_3003
+};
 
 void set_result(Message* reply, ResultCode code, const char* text) {
   const FieldDescriptor* field = reply->GetDescriptor()->FindFieldByName("result");
@@ -26,14 +32,25 @@ void set_result(Message* reply, ResultCode code, const char* text) {
   }
 }
 
-// A reply without a result grants the request, and so does one that refuses some of its users.
-bool grants(const Message& reply) {
-  if (!has(reply, "result")) {
-    return true;
+// Those that refuse some of its users grant the rest.
+bool grants(int code) {
+  switch (code) {
+    case kOk:
+    case QEL_RESULT_REFUSED_1000:
+    case QEL_RESULT_REFUSED_1001:
+    case QEL_RESULT_REFUSED_3003:
+    case QEL_RESULT_REFUSED_3009:
+      return true;
+    default:
+      return false;
   }
-  const auto& result = static_cast<const Result&>(
-      reply.GetReflection()->GetMessage(reply, reply.GetDescriptor()->FindFieldByName("result")));
-  return result.code() == kOk || result.has_wrongreceiverdetail();
+}
+
+// Also if it has no result.
+bool grants(const Message& reply) {
+  const FieldDescriptor* field = reply.GetDescriptor()->FindFieldByName("result");
+  return field == nullptr ||
+         grants(static_cast<const Result&>(reply.GetReflection()->GetMessage(reply, field)).code());
 }
 
 void set_refused(const WrongReceiverDetail& refused, ResultCode code, const char* text,
@@ -45,23 +62,20 @@ void set_refused(const WrongReceiverDetail& refused, ResultCode code, const char
   }
 }
 
-// Also in the messages inside it.
-bool has_unknown_fields(const Message& message) {
-  const std::unique_ptr<Message> known = copy_of(message);
-  known->DiscardUnknownFields();
-  return known->ByteSize() != message.ByteSize();
-}
-
 }  // namespace
 
 Service::Service(const World& world, std::vector<Pattern> required)
     : state_(world),
       required_(std::move(required)),
-      next_push_id_(world.firstpushid()),
-      next_chatroom_id_(world.firstchatroomid()) {}
+      next_push_id_(static_cast<uint64_t>(world.firstpushid())),
+      next_chatroom_id_(static_cast<uint64_t>(world.firstchatroomid())) {}
 
 std::vector<std::string> Service::complaints() {
   return std::exchange(complaints_, {});
+}
+
+void Service::complain_of(const std::vector<std::string>& mistakes) {
+  complaints_.insert(complaints_.end(), mistakes.begin(), mistakes.end());
 }
 
 bool Service::require(bool holds, const std::string& otherwise) {
@@ -79,11 +93,8 @@ void Service::set_time(int64_t milliseconds) {
 
 // ---- What the plug-in sends
 
-Messages Service::take(const Message& message) {
-  require(!has_unknown_fields(message), "it has fields or values that the schema does not have");
-  for (const std::string& field : broken_texts(message)) {
-    require(false, field + " is not UTF-8");
-  }
+Said Service::take(const Message& message) {
+  complain_of(mistakes_in_form(message));
   if (!require(is_from_plugin(*message.GetDescriptor()), "a plug-in does not send it") ||
       !require(state_.is_signed_in || message.GetDescriptor() == ChannelAuthRequest::descriptor(),
                "it comes before the login was granted")) {
@@ -91,29 +102,28 @@ Messages Service::take(const Message& message) {
   }
   for (const Pattern& pattern : required_) {
     if (&pattern.type() == message.GetDescriptor()) {
-      for (const std::string& reason : differences(pattern, message, {})) {
-        require(false, reason);
-      }
+      complain_of(differences(pattern, message, {}));
     }
   }
-  return is_reply(*message.GetDescriptor()) ? take_acknowledgement(message) : take_request(message);
+  if (is_reply(*message.GetDescriptor())) {
+    return {take_acknowledgement(message), false};
+  }
+  return take_request(message);
 }
 
 // One that is sent again as it was is the same request.
-Messages Service::take_request(const Message& message) {
+Said Service::take_request(const Message& message) {
   const int64_t id = number_in(message, "requestId");
   const auto open = open_.find(id);
   if (open != open_.end() && open->second.request->GetDescriptor() == message.GetDescriptor() &&
       open->second.request->SerializeAsString() == message.SerializeAsString()) {
-    return copies_of(open->second.said);
+    return {copies_of(open->second.said), true};
   }
   require(id != 0, "it has no requestId, or 0");
   require(id == 0 || open == open_.end(),
           "its requestId " + std::to_string(id) +
               " is that of another request, which has no reply yet");
-  for (const std::string& mistake : mistakes_in(message, state_)) {
-    require(false, mistake);
-  }
+  complain_of(mistakes_in(message, state_));
   Messages said = say(message);
   if (const auto* chat = dynamic_cast<const ChatRequest*>(&message)) {
     remember(*chat);
@@ -121,14 +131,13 @@ Messages Service::take_request(const Message& message) {
   if (reply_type(*message.GetDescriptor()) != nullptr) {
     open_[id] = {copy_of(message), copies_of(said)};
   }
-  return said;
+  return {std::move(said), false};
 }
 
 void Service::remember(const ChatRequest& request) {
   for (const ChatMessageParam& message : request.chatmessageparams()) {
-    const Written written{request.chatroomid(), message.chatmsg(), state_.now, false};
-    state_.written.emplace(message.msgid(), written);
-    state_.known.emplace(state_.world.userid(), message.msgid());
+    state_.written.emplace(message.msgid(), Written{request.chatroomid(), message.chatmsg()});
+    state_.known[{state_.world.userid(), message.msgid()}] = {request.chatroomid(), 0};
   }
 }
 
@@ -140,28 +149,33 @@ Messages Service::take_acknowledgement(const Message& message) {
     return {};
   }
   Pushed& push = found->second;
-  const auto* online = dynamic_cast<const ForwardOnlineMessage*>(push.message.get());
-  require(online == nullptr || !online->skipreply(),
-          "the message with the requestId " + std::to_string(id) + " wants no answer");
+  const std::string name = "the message with the requestId " + std::to_string(id);
+  require(push.wants_answer, name + " wants no answer");
   ++push.answers;
-  require(push.answers <= push.deliveries,
-          "the message with the requestId " + std::to_string(id) + " was answered before");
-  require(online == nullptr || number_in(message, "chatroomId") == online->chatroomid(),
-          "its chatroomId is not that of the message");
-
-  const auto* page = dynamic_cast<const ForwardUnreadMessage*>(push.message.get());
-  if (page == nullptr || push.answers > 1) {
-    return {};
+  require(push.answers <= push.deliveries, name + " was answered before");
+  if (const auto* online = dynamic_cast<const ForwardOnlineMessage*>(push.message.get())) {
+    const int64_t chatroom = number_in(message, "chatroomId");
+    require(chatroom == online->chatroomid(), "its chatroomId is " + std::to_string(chatroom) +
+                                                  ", but that of " + name + " is " +
+                                                  std::to_string(online->chatroomid()));
   }
-  for (const InboxEntry& entry : page->inboxentries()) {
+  const auto* page = dynamic_cast<const ForwardUnreadMessage*>(push.message.get());
+  return page == nullptr || push.answers > 1
+             ? Messages()
+             : turn_page(*page, static_cast<const ForwardUnreadMessageReply&>(message));
+}
+
+// The next one, if the plug-in asks for it.
+Messages Service::turn_page(const ForwardUnreadMessage& page,
+                            const ForwardUnreadMessageReply& answer) {
+  for (const InboxEntry& entry : page.inboxentries()) {
     read_.insert(entry.msgid());
   }
-  const auto& answer = static_cast<const ForwardUnreadMessageReply&>(message);
   const auto next = pages_.find(answer.nextpaginationkey());
   Messages said;
   if (answer.has_nextpaginationkey() &&
-      require(answer.nextpaginationkey() == page->nextpaginationkey(),
-              "its nextPaginationKey is not that of the page") &&
+      require(answer.nextpaginationkey() == page.nextpaginationkey(),
+              "its nextPaginationKey is not that of the page, " + page.nextpaginationkey()) &&
       next != pages_.end()) {
     said.push_back(page_from(next->second, answer.maxcount()));
   }
@@ -210,7 +224,7 @@ void Service::complete(const ChannelAuthRequest& request, Message* reply) {
 
 void Service::complete(const CreateChatroomRequest& request, Message* message) {
   auto* reply = static_cast<CreateChatroomReply*>(message);
-  AllowChatReply chatroom = new_chatroom(state_, next_chatroom_id_++);
+  AllowChatReply chatroom = new_chatroom(state_, static_cast<int64_t>(next_chatroom_id_++));
   set_refused(bring(request.receivers(), state_, &chatroom), kSomeRefused,
               "some receivers were refused", reply->mutable_result());
   reply->set_chatroomid(chatroom.chatroomid());
@@ -301,7 +315,7 @@ std::unique_ptr<Message> Service::page_from(int first, int most) {
 // ---- What the plug-in gets
 
 void Service::number(Message* push) {
-  set_number(push, "requestId", next_push_id_++);
+  set_number(push, "requestId", static_cast<int64_t>(next_push_id_++));
 }
 
 void Service::note_delivery(const std::string& name, const std::string& bytes, bool is_intact) {
@@ -320,30 +334,30 @@ void Service::note_push(std::unique_ptr<Message> message, bool is_intact) {
   const Descriptor* answer = reply_type(*message->GetDescriptor());
   if (const auto* page = dynamic_cast<const ForwardUnreadMessage*>(message.get())) {
     for (const InboxEntry& entry : page->inboxentries()) {
-      state_.known.emplace(entry.sender(), entry.msgid());
+      state_.know(entry, entry.chatroomid());
     }
   }
   const auto* online = dynamic_cast<const ForwardOnlineMessage*>(message.get());
   if (online != nullptr) {
-    state_.known.emplace(online->inboxentry().sender(), online->inboxentry().msgid());
+    state_.know(online->inboxentry(), online->chatroomid());
   }
   if (answer == nullptr) {
     return;
   }
   Pushed& pushed = pushed_[{answer->name(), number_in(*message, "requestId")}];
   ++pushed.deliveries;
-  pushed.needs_answer =
-      pushed.needs_answer || (is_intact && (online == nullptr || !online->skipreply()));
+  pushed.wants_answer = online == nullptr || !online->skipreply();
+  pushed.needs_answer = pushed.needs_answer || (is_intact && pushed.wants_answer);
   pushed.message = std::move(message);
 }
 
-std::vector<std::string> Service::unanswered() const {
-  std::vector<std::string> result;
+std::vector<Unanswered> Service::unanswered() const {
+  std::vector<Unanswered> result;
   for (const auto& [answer, pushed] : pushed_) {
     if (pushed.needs_answer && pushed.answers == 0) {
-      result.push_back("The " + pushed.message->GetDescriptor()->name() + " with the requestId " +
-                       std::to_string(answer.second) + " was not answered by a " + answer.first +
-                       ".");
+      result.push_back({answer.first, "The " + pushed.message->GetDescriptor()->name() +
+                                          " with the requestId " + std::to_string(answer.second) +
+                                          " was not answered by a " + answer.first + "."});
     }
   }
   return result;
@@ -357,11 +371,6 @@ void Service::note_reply(const Message& reply) {
   }
   const std::unique_ptr<Message> request = std::move(open->second.request);
   open_.erase(open);
-  if (const auto* chat = dynamic_cast<const ChatRequest*>(request.get())) {
-    for (const ChatMessageParam& message : chat->chatmessageparams()) {
-      state_.written.at(message.msgid()).is_answered = true;
-    }
-  }
   if (grants(reply)) {
     grant(*request, reply);
   }
@@ -369,7 +378,9 @@ void Service::note_reply(const Message& reply) {
 
 void Service::grant(const Message& request, const Message& reply) {
   if (const auto* create = dynamic_cast<const CreateChatroomRequest*>(&request)) {
-    state_.create_chatroom(*create, number_in(reply, "chatroomId"));
+    if (has(reply, "chatroomId")) {
+      state_.create_chatroom(*create, number_in(reply, "chatroomId"));
+    }
   } else if (const auto* change = dynamic_cast<const ChangeChatroomMetaRequest*>(&request)) {
     state_.change_chatroom(*change);
   } else if (const auto* invited = dynamic_cast<const InviteRequest*>(&request)) {

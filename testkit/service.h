@@ -18,6 +18,18 @@
 
 namespace testkit {
 
+// What the service says to a message, the reply first.
+struct Said {
+  Messages messages;
+  bool is_again;  // as the message is a request that came before, and has no reply yet
+};
+
+// A push without the answer that it needs.
+struct Unanswered {
+  std::string answer;  // which message it is
+  std::string sentence;
+};
+
 // What a request changes is changed once the plug-in has got a reply that grants it: one that is
 // lost, broken or replaced changes nothing.
 class Service {
@@ -25,8 +37,7 @@ class Service {
   // Of each message, the fields of its pattern have to be there.
   Service(const World& world, std::vector<Pattern> required);
 
-  // What the service says to the plug-in's message, the reply first.
-  Messages take(const google::protobuf::Message& message);
+  Said take(const google::protobuf::Message& message);
   // What was wrong with the messages since the last call.
   std::vector<std::string> complaints();
 
@@ -34,8 +45,7 @@ class Service {
   void number(google::protobuf::Message* push);
   // The plug-in gets the message now. If it is a push, it has to be answered, unless it is broken.
   void note_delivery(const std::string& name, const std::string& bytes, bool is_intact);
-  // The pushes that were not answered.
-  std::vector<std::string> unanswered() const;
+  std::vector<Unanswered> unanswered() const;
 
   bool is_signed_in() const { return state_.is_signed_in; }
 
@@ -52,14 +62,17 @@ class Service {
   // What was delivered under a requestId, and is answered.
   struct Pushed {
     std::unique_ptr<google::protobuf::Message> message;
-    bool needs_answer = false;  // rather than may have one
+    bool wants_answer = false;
+    bool needs_answer = false;  // as it came as it should
     int deliveries = 0;
     int answers = 0;
   };
 
+  void complain_of(const std::vector<std::string>& mistakes);
   bool require(bool holds, const std::string& otherwise);
-  Messages take_request(const google::protobuf::Message& message);
+  Said take_request(const google::protobuf::Message& message);
   Messages take_acknowledgement(const google::protobuf::Message& message);
+  Messages turn_page(const ForwardUnreadMessage& page, const ForwardUnreadMessageReply& answer);
   void remember(const ChatRequest& request);
 
   Messages say(const google::protobuf::Message& request);
@@ -79,8 +92,8 @@ class Service {
 
   State state_;
   std::vector<Pattern> required_;
-  int64_t next_push_id_;
-  int64_t next_chatroom_id_;
+  uint64_t next_push_id_;  // they wrap around
+  uint64_t next_chatroom_id_;
   std::map<int64_t, Open> open_;      // by requestId
   std::map<std::string, int> pages_;  // by key: the index of the first message
   std::set<int64_t> read_;            // the stored messages that were acknowledged

@@ -48,8 +48,15 @@ State::State(const World& of_test)
     : world(of_test), is_signed_in(of_test.issignedin()), now(of_test.clockmillis()) {
   for (const auto* entries : {&world.stored(), &world.past()}) {
     for (const InboxEntry& entry : *entries) {
-      known.emplace(entry.sender(), entry.msgid());
+      know(entry, entry.chatroomid());
     }
+  }
+}
+
+void State::know(const InboxEntry& entry, int64_t chatroom) {
+  known[{entry.sender(), entry.msgid()}] = {chatroom, entry.senttime()};
+  if (chatroom != 0 && chatroom_with(chatroom) == nullptr) {
+    world.add_chatrooms()->set_chatroomid(chatroom);
   }
 }
 

@@ -4,7 +4,6 @@
 
 #include <cstdint>
 #include <map>
-#include <set>
 #include <string>
 #include <utility>
 
@@ -17,8 +16,12 @@ namespace testkit {
 struct Written {
   int64_t chatroom;
   std::string text;
-  int64_t since;  // when it came first
-  bool is_answered;
+};
+
+// A message that the plug-in may name. What is 0 may be any.
+struct Known {
+  int64_t chatroom;
+  int64_t sent_time;
 };
 
 struct State {
@@ -29,6 +32,9 @@ struct State {
   const AllowChatReply* chatroom_with(int64_t id) const;
   AllowChatReply* chatroom_with(int64_t id);
 
+  // A message came to the plug-in, from a chatroom that is the user's from now on.
+  void know(const InboxEntry& entry, int64_t chatroom);
+
   // What a request changes once it is granted.
   void create_chatroom(const CreateChatroomRequest& request, int64_t id);
   void change_chatroom(const ChangeChatroomMetaRequest& request);
@@ -37,9 +43,9 @@ struct State {
 
   World world;
   bool is_signed_in;
-  int64_t now;                                  // milliseconds since 1970
-  std::map<int64_t, Written> written;           // by msgId
-  std::set<std::pair<int64_t, int64_t>> known;  // sender and msgId of each message
+  int64_t now;                                         // milliseconds since 1970
+  std::map<int64_t, Written> written;                  // by msgId
+  std::map<std::pair<int64_t, int64_t>, Known> known;  // by sender and msgId
 };
 
 // Makes the users members of the chatroom. Returns who was refused, and why.

@@ -157,8 +157,8 @@ TEST_F(TestKit, NewChatrooms_HaveIdsOfTheirOwn) {
     send("CreateChatroomRequest", std::string("chatType: GROUP receivers: 6001 requestId: ") + id);
   }
   const Lines replies = received();
-  EXPECT_NE(replies[0].find("chatroomId: 42 result { code: 0 "), std::string::npos) << replies[0];
-  EXPECT_NE(replies[1].find("chatroomId: 43"), std::string::npos);
+  EXPECT_NE(replies[0].find("chatroomId: 50 result { code: 0 "), std::string::npos) << replies[0];
+  EXPECT_NE(replies[1].find("chatroomId: 51"), std::string::npos);
 }
 
 TEST_F(TestKit, Chatroom_IsDescribedAsFarAsIsAskedFor) {
@@ -223,8 +223,7 @@ struct Complaint {
 
 const Complaint kComplaints[] = {
     {"NoRequestId", "CurrentTimeRequest", "", "it has no requestId, or 0"},
-    {"UnknownChatroom", "UnsealMessageRequest",
-     "requestId: 1 chatroomId: 43 sender: 6001 msgId: 8001 msgDetail: ''",
+    {"UnknownChatroom", "IsTyping", "requestId: 1 chatroomId: 43 state: 'x'",
      "there is no chatroom 43, or the user has left it"},
     {"NoRequest", "TypingUpdated", "requestId: 1", "a plug-in does not send it"},
     {"AnswerToNothing", "ClientEchoReply", "requestId: 3",
@@ -239,26 +238,26 @@ const Complaint kComplaints[] = {
     {"NegativeLifetimeOfAMessage", "ChatRequest",
      "requestId: 1 chatroomId: 42 chatMessageParams { msgId: 1 msgType: TEXT chatMsg: 'x' msgTtl: "
      "-1 }",
-     "its msgTtl is negative"},
+     "its msgTtl -1 is negative"},
     {"NegativeLifetime", "ChangeChatroomMetaRequest", "requestId: 1 chatroomId: 42 msgTtl: -1",
-     "its msgTtl is negative"},
-    {"TitleAndLifetime", "ChangeChatroomMetaRequest",
-     "requestId: 1 chatroomId: 42 title: 'x' msgTtl: 1",
-     "it should change the title or the lifetime, one of them"},
+     "its msgTtl -1 is negative"},
+    {"ChangeOfNothing", "ChangeChatroomMetaRequest", "requestId: 1 chatroomId: 42",
+     "it changes nothing"},
     {"ReceiptOfAnUnknownMessage", "ReadMessageRequest",
      "requestId: 1 chatroomId: 42 inboxEntry { msgId: 8001 sender: 6002 sentTime: 1 }",
      "there is no message 8001 of the user 6002"},
     {"UnsealingAnUnknownMessage", "UnsealMessageRequest",
      "requestId: 1 chatroomId: 42 sender: 8001 msgId: 6001",
      "there is no message 6001 of the user 8001"},
-    {"CallOfOthers", "SaveCallLogRequest",
-     "requestId: 1 chatroomId: 42 callId: 'c' callLogType: 'v' sender: 6001 receiver: 6002 "
-     "conversationSeconds: 1",
-     "the user has to be the call's sender or its receiver"},
-    {"CallOfTheUserAlone", "SaveCallLogRequest",
-     "requestId: 1 chatroomId: 42 callId: 'c' callLogType: 'v' sender: 5001 receiver: 5001 "
-     "conversationSeconds: 1",
-     "the user has to be the call's sender or its receiver"},
+    {"ReceiptInAnotherChatroom", "ReadMessageRequest",
+     "requestId: 1 chatroomId: 41 inboxEntry { msgId: 8001 sender: 6001 sentTime: 1700000008001 }",
+     "there is no chatroom 41, or the user has left it; the message 8001 is one of the chatroom "
+     "42"},
+    {"ReceiptWithAnotherTime", "ReadMessageRequest",
+     "requestId: 1 chatroomId: 42 inboxEntry { msgId: 8001 sender: 6001 sentTime: 0 }",
+     "the message 8001 has another sentTime"},
+    {"ReceiptOfNothing", "ReadMessageRequest", "requestId: 1 chatroomId: 42",
+     "inboxEntry is missing"},
     {"InvitingNobody", "InviteRequest", "requestId: 1 chatroomId: 42 invitingMembers: [6007, 0]",
      "it has the user 0, which is the id of nobody"},
     {"CreatingWithNobody", "CreateChatroomRequest", "requestId: 1 chatType: GROUP receivers: 0",
@@ -338,23 +337,73 @@ TEST_F(TestKit, MessageThatIsSentAgain_IsTheSame) {
   EXPECT_EQ(end(), "");
 }
 
-TEST_F(TestKit, MessageThatIsSentAgainAsAnother_IsReported) {
-  start_signed_in("expect ChatRequest answer dropped");
+TEST_F(TestKit, MessageThatIsSentAgainAsAnother_IsReportedWhereTextsDiffer) {
+  start_signed_in("world { hasDistinctTexts: true }");
   send("ChatRequest", std::string(kChat) + "msgId: 1 chatMsg: 'x' } requestId: 1");
-  qel_testkit_wait(kit_, 1000);
   send("ChatRequest", std::string(kChat) + "msgId: 2 chatMsg: 'x' } requestId: 2");
   EXPECT_EQ(end(),
             "Message 2 of the plug-in, a ChatRequest, is wrong: it has the text of the message 1, "
-            "which is not answered yet, but another msgId.\n");
+            "but another msgId.\n");
 }
 
-TEST_F(TestKit, SameTextSoonOrOnceItIsAnswered_IsAnotherMessage) {
+TEST_F(TestKit, SameText_IsAnotherMessageElsewhere) {
   start_signed_in("");
   send("ChatRequest", std::string(kChat) + "msgId: 1 chatMsg: 'x' } requestId: 1");
   send("ChatRequest", std::string(kChat) + "msgId: 2 chatMsg: 'x' } requestId: 2");
+  EXPECT_EQ(end(), "");
+}
+
+TEST_F(TestKit, SeveralMessagesInOneRequest_AreFine) {
+  start_signed_in("");
+  send("ChatRequest", std::string(kChat) +
+                          "msgId: 1 chatMsg: 'x' } chatMessageParams { msgId: 2 "
+                          "chatMsg: 'y' } requestId: 1");
+  EXPECT_EQ(end(), "");
+}
+
+TEST_F(TestKit, SameMsgIdTwiceInOneRequest_IsReported) {
+  start_signed_in("");
+  send("ChatRequest", std::string(kChat) +
+                          "msgId: 1 chatMsg: 'x' } chatMessageParams { msgId: 1 "
+                          "chatMsg: 'y' } requestId: 1");
+  EXPECT_EQ(end(),
+            "Message 1 of the plug-in, a ChatRequest, is wrong: its msgId 1 is that of another "
+            "message.\n");
+}
+
+struct Textless {
+  const char* name;
+  const char* fields;
+};
+
+const Textless kTextless[] = {
+    {"Picture", "msgType: MEDIA"},
+    {"SecureMessage", "msgType: TEXT secureChatMsg: 'sealed'"},
+};
+
+class MessageWithoutAText : public TestKit, public ::testing::WithParamInterface<Textless> {};
+
+TEST_P(MessageWithoutAText, IsFine) {
+  start_signed_in("");
+  send("ChatRequest", std::string("requestId: 1 chatroomId: 42 chatMessageParams { msgId: 1 ") +
+                          GetParam().fields + " }");
+  EXPECT_EQ(end(), "");
+}
+
+INSTANTIATE_TEST_SUITE_P(Each, MessageWithoutAText, ::testing::ValuesIn(kTextless),
+                         [](const auto& row) { return row.param.name; });
+
+TEST_F(TestKit, ChatroomOfAMessageThatCame_IsOneOfTheUsers) {
+  start_signed_in(
+      "push ForwardOnlineMessage { chatroomId: 77 skipReply: true inboxEntry { msgId: 1 sender: "
+      "6007 "
+      "sentTime: 5 } } push ForwardUnreadMessage { inboxEntries { msgId: 2 chatroomId: 78 } }");
   received();
-  qel_testkit_wait(kit_, 1000);
-  send("ChatRequest", std::string(kChat) + "msgId: 3 chatMsg: 'x' } requestId: 3");
+  send("ForwardUnreadMessageReply", "requestId: 700002");
+  send("AllowChatRequest", "requestId: 1 chatroomId: 77");
+  send("AllowChatRequest", "requestId: 2 chatroomId: 78");
+  send("ReadMessageRequest",
+       "requestId: 3 chatroomId: 77 inboxEntry { msgId: 1 sender: 6007 sentTime: 5 }");
   EXPECT_EQ(end(), "");
 }
 
@@ -444,6 +493,29 @@ TEST_F(TestKit, CreatedChatroom_HasTheIdOfTheReply) {
   received();
   send("AllowChatRequest", "requestId: 2 chatroomId: 60");
   EXPECT_EQ(end(), "");
+}
+
+TEST_F(TestKit, ChatroomThatIsRefusedWithItsReceivers_IsNotCreated) {
+  start_signed_in("expect CreateChatroomRequest answer { result { code: 4001 } }");
+  send("CreateChatroomRequest", "requestId: 1 chatType: GROUP receivers: 999");
+  received();
+  send("AllowChatRequest", "requestId: 2 chatroomId: 50");
+  EXPECT_NE(end().find("there is no chatroom 50"), std::string::npos);
+}
+
+TEST_F(TestKit, ChatroomThatIsCreatedWithoutAnId_IsNone) {
+  start_signed_in("expect CreateChatroomRequest answer { !chatroomId }");
+  send("CreateChatroomRequest", "requestId: 1 chatType: GROUP receivers: 6001");
+  received();
+  send("AllowChatRequest", "requestId: 2 chatroomId: 0");
+  EXPECT_NE(end().find("there is no chatroom 0"), std::string::npos);
+}
+
+TEST_F(TestKit, IdsBeyondTheLast_WrapAround) {
+  start_signed_in(
+      "world { firstPushId: 9223372036854775807 } push TypingUpdated push TypingUpdated");
+  EXPECT_EQ(received(), (Lines{"TypingUpdated: requestId: 9223372036854775807",
+                               "TypingUpdated: requestId: -9223372036854775808"}));
 }
 
 TEST_F(TestKit, UnreadMessagesThatWereAcknowledged_DoNotComeAgain) {
@@ -555,6 +627,14 @@ TEST_F(TestKit, AccessTokenThatIsCutOrEscaped_IsNotReportedEither) {
   EXPECT_NE(end().find("aaaa(not ...\" instead of"), std::string::npos) << report();
 }
 
+TEST_F(TestKit, AccessTokenThatBeginsWithAnother_IsNotReportedEither) {
+  start("world { accessToken: 'abcdefgh' } expect ChangeChatroomMetaRequest { title: 'x' }");
+  send("ChannelAuthRequest",
+       "requestId: 1 userId: 5001 deviceId: 7 appId: 'a' accessToken: 'abcdefghREST'");
+  send("ChangeChatroomMetaRequest", "requestId: 2 chatroomId: 42 title: 'abcdefghREST'");
+  EXPECT_EQ(end().find("REST"), std::string::npos);
+}
+
 TEST_F(TestKit, AccessTokenOfThePlugin_IsNotReportedEither) {
   start(nullptr);
   send("ChannelAuthRequest",
@@ -659,6 +739,35 @@ TEST_F(TestKit, InAnyOrder_PrefersWhatFits) {
             "invitingMembers[0] is 6002 instead of 6001.\n");
 }
 
+TEST_F(TestKit, RequestThatComesAgain_NeedNotBeTheNextExpectedOne) {
+  start_signed_in(
+      "expect IsTyping { state: 'a' } expect CurrentTimeRequest { userId: 1 } answer dropped "
+      "expect "
+      "CurrentTimeRequest { userId: 2 }");
+  send("IsTyping", "requestId: 1 chatroomId: 42 state: 'a'");
+  send("CurrentTimeRequest", "requestId: 2 userId: 1");
+  send("CurrentTimeRequest", "requestId: 2 userId: 1");
+  send("CurrentTimeRequest", "requestId: 3 userId: 2");
+  EXPECT_EQ(end(), "");
+}
+
+TEST_F(TestKit, MissingMessageThatWasReportedLate_IsNotReportedAgain) {
+  start_signed_in("push ClientEcho expect ClientEchoReply within 1s");
+  received();
+  qel_testkit_wait(kit_, 1001);
+  EXPECT_EQ(end(), "No ClientEchoReply came within 1000 ms, as line 1 expects.\n");
+}
+
+TEST_F(TestKit, NumberOutsideAnEnumeration_IsAnyIfItIsNotNamed) {
+  start_signed_in("expect IsTyping expect IsTyping { contentType }");
+  for (const char* id : {"\1", "\2"}) {
+    send_bytes("IsTyping", std::string("\x58") + id + "\x60\x2a\x6a\x01x\x70\x09");
+  }
+  EXPECT_EQ(report(),
+            "Message 1 of the plug-in, an IsTyping, is wrong: contentType has a value that the "
+            "schema does not have. And 1 more time.\n");
+}
+
 TEST_F(TestKit, InAnyOrder_WhatIsMissingIsReported) {
   start_signed_in(
       "strict in any order {\nexpect CurrentTimeRequest\nexpect GetAllReadAckRequest }");
@@ -738,8 +847,7 @@ TEST_F(TestKit, FieldsThatTheSchemaDoesNotHave_AreReported) {
   send_bytes("CurrentTimeRequest", "\x58\x01\x98\x06\x01");
   EXPECT_EQ(
       end(),
-      "Message 1 of the plug-in, a CurrentTimeRequest, is wrong: it has fields or values that "
-      "the schema does not have.\n");
+      "Message 1 of the plug-in, a CurrentTimeRequest, is wrong: the schema has no field 99.\n");
 }
 
 TEST_F(TestKit, AtMost_AllowsSoMany) {
@@ -872,8 +980,8 @@ TEST_F(TestKit, AnswerWithAnotherChatroom_IsReported) {
   send("ForwardOnlineMessageReply", "requestId: 5 chatroomId: 42");
   EXPECT_EQ(
       end(),
-      "Message 1 of the plug-in, a ForwardOnlineMessageReply, is wrong: its chatroomId is not "
-      "that of the message.\n");
+      "Message 1 of the plug-in, a ForwardOnlineMessageReply, is wrong: its chatroomId is 42, "
+      "but that of the message with the requestId 5 is 43.\n");
 }
 
 TEST_F(TestKit, PushThatWantsNoAnswer_HasNone) {
@@ -988,6 +1096,15 @@ TEST_F(TestKit, MessageThatIsNotTaken_IsReported) {
   EXPECT_EQ(report(), "A TypingUpdated was due, but the test did not take it.\n");
 }
 
+TEST_F(TestKit, SwappedMessages_ComeBehindTheNextInTheOtherOrder) {
+  start_signed_in(
+      "push TypingUpdated swapped with the next push TypingUpdated swapped with the next push "
+      "TypingUpdated");
+  EXPECT_EQ(received(),
+            (Lines{"TypingUpdated: requestId: 700003", "TypingUpdated: requestId: 700002",
+                   "TypingUpdated: requestId: 700001"}));
+}
+
 TEST_F(TestKit, LateMessage_ComesWhenItsTimeHasCome) {
   start_signed_in("push ClientEcho after 5s push TypingUpdated after 200ms");
   EXPECT_EQ(received(), Lines{});
@@ -1047,8 +1164,7 @@ struct Misread {
 const Misread kMisread[] = {
     {"Word", "expekt ChatRequest",
      "line 1, column 1: expected 'expect', 'in any order', 'answer', 'push', 'at most', 'never', "
-     "'always', 'strict' or 'world', or behind a message to deliver 'after', 'twice', 'dropped', "
-     "'swapped with the next', 'cut at', 'corrupt byte' or 'as', but here is 'expekt'"},
+     "'always', 'strict' or 'world', but here is 'expekt'"},
     {"MessageName", "# one\n  expect ChatRequests",
      "line 2, column 10: there is no message "
      "'ChatRequests'"},
@@ -1074,7 +1190,7 @@ const Misread kMisread[] = {
     {"AnswerWithoutAName", "expect IsTyping answer { state: 'x' }",
      "line 1, column 24: IsTyping has no reply, so this answer needs a name, but here is '{'"},
     {"NoValueToDeliver", "push ClientEcho { requestId }",
-     "line 1, column 1: the field 'requestId' of a message to deliver needs a value"},
+     "line 1, column 1: the field 'requestId' needs a value here"},
     {"Time", "push ClientEcho after 5",
      "line 1, column 24: expected 's' or 'ms' behind the number, but the text ends"},
     {"TimeWithAPoint", "push ClientEcho after 1.5s",
@@ -1108,11 +1224,37 @@ const Misread kMisread[] = {
     {"NameOfNothing", "expect ChatRequest answer to a",
      "line 1, column 30: no request before is called 'a'"},
     {"AnyOrderWithoutExpectations", "in any order { push ClientEcho }",
-     "line 1, column 16: expected 'expect' or '}', but here is 'push'"},
+     "line 1, column 16: expected 'expect', but here is 'push'"},
     {"AnyOrderInAnother", "in any order { expect ChatRequest in any order { } }",
      "line 1, column 35: expected 'expect', 'in any order', 'answer', 'push', 'at most', 'never', "
+     "'always', 'strict' or 'world', or behind an expectation 'within' or 'called', but here is "
+     "'in'"},
+    {"AnyOrderOfNothing", "in any order { }",
+     "line 1, column 16: expected 'expect', but here is '}'"},
+    {"WordBehindAMessageToDeliver", "push ClientEcho delay",
+     "line 1, column 17: expected 'expect', 'in any order', 'answer', 'push', 'at most', 'never', "
      "'always', 'strict' or 'world', or behind a message to deliver 'after', 'twice', 'dropped', "
-     "'swapped with the next', 'cut at', 'corrupt byte' or 'as', but here is 'in'"},
+     "'swapped with the next', 'cut at', 'corrupt byte' or 'as', but here is 'delay'"},
+    {"WordBehindARule", "never ChatRequest until",
+     "line 1, column 19: expected 'expect', 'in any order', 'answer', 'push', 'at most', 'never', "
+     "'always', 'strict' or 'world', or behind the message 'within', but here is 'until'"},
+    {"SwappedAndTwice", "push ClientEcho swapped with the next twice",
+     "line 1, column 39: a message that is swapped with the next comes once"},
+    {"PartOfAMessage", "push InboxEntry", "line 1, column 6: there is no message 'InboxEntry'"},
+    {"WorldWithoutAValue", "world { isSignedIn }",
+     "line 1, column 7: the field 'isSignedIn' needs a value here"},
+    {"WorldWithANumber", "world { 99: 5 }",
+     "line 1, column 7: the world has no fields by their numbers"},
+    {"ListThatIsEmptyAndNot",
+     "push CreateChatroomReply push InviteReply { result { "
+     "wrongReceiverDetail { existing: 3 existing: [] } } }",
+     "line 1, column 88: the field 'existing' is there twice"},
+    {"NoColon", "expect ChatRequest { chatroomId 42 }",
+     "line 1, column 36: expected ':' or '{' behind the number of a field, but here is '}'"},
+    {"ListWithoutBrackets", "expect InviteRequest { invitingMembers: 1, 2 }",
+     "line 1, column 46: expected ':' or '{' behind the number of a field, but here is '}'"},
+    {"NoBraceBeforeTheNext", "expect ChatRequest { chatroomId: 1 expect ChatRequest",
+     "line 1, column 36: ChatRequest has no field 'expect'. Is there a '}' missing before it?"},
     {"Quote", "push TypingUpdated { state: 'x", "line 1, column 31: Unexpected end of string"},
 };
 
