@@ -119,6 +119,13 @@ TEST_F(TestKit, Service_TellsTheTimeThatHasPassed) {
                                "currentTimeMillis: 1700000102500"}));
 }
 
+TEST_F(TestKit, NegativeTime_IsNone) {
+  start_signed_in("push TypingUpdated after 1s");
+  qel_testkit_wait(kit_, -5000);
+  received();
+  EXPECT_EQ(next_after_, 1000);
+}
+
 TEST_F(TestKit, WrongToken_IsRefusedAndNotShown) {
   start(nullptr);
   send("ChannelAuthRequest",
@@ -493,6 +500,36 @@ TEST_F(TestKit, CreatedChatroom_HasTheIdOfTheReply) {
   received();
   send("AllowChatRequest", "requestId: 2 chatroomId: 60");
   EXPECT_EQ(end(), "");
+}
+
+TEST_F(TestKit, ChatroomThatIsCreatedAnew_HasOtherMembersAndItsMarks) {
+  start_signed_in("world { firstChatroomId: 42 }");
+  send("CreateChatroomRequest", "requestId: 1 chatType: GROUP receivers: 6007 chatroomTitle: 'x'");
+  received();
+  send("AllowChatRequest",
+       "requestId: 2 chatroomId: 42 needOrderedChatroomMemberList: true needReadAck: true");
+  EXPECT_EQ(
+      received()[0],
+      "AllowChatReply: requestId: 2 chatroomId: 42 result { code: 0 msg: \"ok\" } "
+      "lastReadAckTimestamp: 1700000008001 ownerUserId: 5001 orderedChatroomMemberList { "
+      "userId: 5001 available: true name: \"Ana\" isAccepted: true } "
+      "orderedChatroomMemberList { userId: 6007 available: true name: \"Hana\" isAccepted: true "
+      "} readAckEntries { userId: 6001 msgId: 8001 timestamp: 1700000008001 chatroomId: 42 } "
+      "lastDeliveryAckTimestamp: 1700000008002 msgTtl: 3600");
+}
+
+TEST_F(TestKit, ChangedChatroom_HasTheNewTitleAndLifetimeAndMembers) {
+  start_signed_in("");
+  send("ChangeChatroomMetaRequest", "requestId: 1 chatroomId: 42 title: 'Dinner'");
+  send("ChangeChatroomMetaRequest", "requestId: 2 chatroomId: 42 msgTtl: 60");
+  send("InviteRequest", "requestId: 3 chatroomId: 42 invitingMembers: 6007");
+  received();
+  send("AllowChatRequest",
+       "requestId: 4 chatroomId: 42 needOrderedChatroomMemberList: true needChatroomMeta: true");
+  const std::string reply = received()[0];
+  EXPECT_NE(reply.find("title: \"Dinner\""), std::string::npos) << reply;
+  EXPECT_NE(reply.find("msgTtl: 60"), std::string::npos) << reply;
+  EXPECT_NE(reply.find("userId: 6007"), std::string::npos) << reply;
 }
 
 TEST_F(TestKit, ChatroomThatIsRefusedWithItsReceivers_IsNotCreated) {
