@@ -592,6 +592,13 @@ const Difference kDifferences[] = {
      "chatMsg is "
      "\"0123456789012345678901234567890123456789012345678901234567890123456789012345678901234567890"
      "123456789...\" instead of \"a\""},
+    {"TextOf100Bytes", "chatMsg: 'a'",
+     "chatMsg: "
+     "'0123456789012345678901234567890123456789012345678901234567890123456789012345678901234567890"
+     "123456789'",
+     "chatMsg is "
+     "\"0123456789012345678901234567890123456789012345678901234567890123456789012345678901234567890"
+     "123456789\" instead of \"a\""},
     {"Enumeration", "msgType: MEDIA", "msgType: TEXT", "msgType is TEXT instead of MEDIA"},
     {"NumberOfNoMember", "msgType: 77", "msgType: TEXT", "msgType is TEXT instead of 77"},
     {"UnknownField", "99: 'x'", "", "the unknown field 99 is missing, which should be \"x\""},
@@ -1070,6 +1077,11 @@ TEST_F(TestKit, NumbersOutsideAnEnumerationAndUnknownFields_AreDelivered) {
                                "5 } } skipReply: true 99: 18446744073709551615"}));
 }
 
+TEST_F(TestKit, MemberOfAnEnumeration_MayBeItsNumber) {
+  start_signed_in("push TypingUpdated { contentType: 0 }");
+  EXPECT_EQ(received(), (Lines{"TypingUpdated: requestId: 700001 contentType: CONTENT_TEXT"}));
+}
+
 TEST_F(TestKit, Push_MayHaveNoRequestId) {
   start_signed_in("push TypingUpdated { !requestId state: 'x' }");
   EXPECT_EQ(received(), (Lines{"TypingUpdated: state: \"x\""}));
@@ -1266,6 +1278,8 @@ const Misread kMisread[] = {
      "line 1, column 35: expected 'expect', 'in any order', 'answer', 'push', 'at most', 'never', "
      "'always', 'strict' or 'world', or behind an expectation 'within' or 'called', but here is "
      "'in'"},
+    {"AnotherWord", "at least 5 ChatRequest",
+     "line 1, column 4: expected 'most', but here is 'least'"},
     {"AnyOrderOfNothing", "in any order { }",
      "line 1, column 16: expected 'expect', but here is '}'"},
     {"WordBehindAMessageToDeliver", "push ClientEcho delay",
