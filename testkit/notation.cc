@@ -141,13 +141,19 @@ class PatternParser {
     }
     const Place place = tokens_.place();
     const std::string sign = tokens_.take("-") ? "-" : "";
-    if (field.enum_type() != nullptr && tokens_.is_at(Tokenizer::TYPE_INTEGER)) {
-      const int number = tokens_.number("expected a number");
-      set_member(message, field, sign.empty() ? number : -number);
-      return;
-    }
     const bool is_text = tokens_.is_at(Tokenizer::TYPE_STRING);
-    std::string text = sign + tokens_.take();
+    std::string text;
+    if (field.enum_type() != nullptr && tokens_.is_at(Tokenizer::TYPE_INTEGER)) {
+      const int number = tokens_.number("expected a number") * (sign.empty() ? 1 : -1);
+      if (field.enum_type()->FindValueByNumber(number) == nullptr) {
+        fields.MutableUnknownFields(message)->AddVarint(field.number(),
+                                                        static_cast<uint64_t>(int64_t{number}));
+        return;
+      }
+      text = std::to_string(number);
+    } else {
+      text = sign + tokens_.take();
+    }
     while (is_text && tokens_.is_at(Tokenizer::TYPE_STRING)) {  // those that follow belong to it
       text += " " + tokens_.take();
     }
@@ -157,19 +163,6 @@ class PatternParser {
     if (!parser.ParseFieldValueFromString(text, &field, message)) {
       throw Misread{place,
                     "this is no value of the field '" + field.name() + "': " + error.reason()};
-    }
-  }
-
-  static void set_member(Message* message, const FieldDescriptor& field, int number) {
-    const Reflection& fields = *message->GetReflection();
-    const auto* member = field.enum_type()->FindValueByNumber(number);
-    if (member == nullptr) {
-      fields.MutableUnknownFields(message)->AddVarint(field.number(),
-                                                      static_cast<uint64_t>(int64_t{number}));
-    } else if (field.is_repeated()) {
-      fields.AddEnum(message, &field, member);
-    } else {
-      fields.SetEnum(message, &field, member);
     }
   }
 
@@ -258,7 +251,7 @@ std::string shown(const Message& message, const FieldDescriptor& field, int inde
     return text;
   }
   if (message.GetDescriptor() == ChannelAuthRequest::descriptor()) {
-    return "(not shown)";
+    return Secrets::kHidden;
   }
   const Reflection& fields = *message.GetReflection();
   return quoted(field.is_repeated() ? fields.GetRepeatedString(message, &field, index)

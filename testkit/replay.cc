@@ -27,9 +27,7 @@ bool is_mask(const std::string& token) {
 
 std::string masked(std::string text, const Masks& masks) {
   for (const auto& [token, mask] : masks) {
-    for (size_t at = 0; (at = text.find(token, at)) != std::string::npos; at += mask.size()) {
-      text.replace(at, token.size(), mask);
-    }
+    text = replaced(std::move(text), token, mask);
   }
   return text;
 }

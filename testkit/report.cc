@@ -8,8 +8,6 @@
 namespace testkit {
 namespace {
 
-constexpr char kHidden[] = "(not shown)";
-
 // The first few, as nobody reads thousands.
 std::string joined(const std::vector<std::string>& parts) {
   constexpr size_t kMost = 5;
@@ -33,10 +31,7 @@ void Secrets::add(const std::string& token) {
 
 std::string Secrets::hidden_in(std::string text) const {
   for (const std::string& token : tokens_) {
-    for (size_t at = 0; (at = text.find(token, at)) != std::string::npos;) {
-      text.replace(at, token.size(), kHidden);
-      at += sizeof kHidden - 1;
-    }
+    text = replaced(std::move(text), token, kHidden);
   }
   return text;
 }
@@ -87,6 +82,13 @@ std::string Report::text() const {
   }
   text += is_full() ? "There is more, and nothing is delivered any longer.\n" : "";
   return secrets.hidden_in(text);  // also a token that came later
+}
+
+std::string replaced(std::string text, const std::string& part, const std::string& other) {
+  for (size_t at = 0; (at = text.find(part, at)) != std::string::npos; at += other.size()) {
+    text.replace(at, part.size(), other);
+  }
+  return text;
 }
 
 std::string with_article(const std::string& name) {

@@ -14,6 +14,8 @@ namespace testkit {
 // The texts that are not to be shown, wherever they stand.
 class Secrets {
  public:
+  // Stands in the place of a token.
+  static constexpr char kHidden[] = "(not shown)";
   // A text of fewer bytes may be a part of any sentence, and is shown.
   static constexpr size_t kLeast = 8;
 
@@ -73,6 +75,9 @@ class Report {
   int subject_ = 0;  // the last
   std::set<std::string> said_of_subject_;
 };
+
+// The text with something else in all the places of a part.
+std::string replaced(std::string text, const std::string& part, const std::string& other);
 
 // "a ChatRequest"
 std::string with_article(const std::string& name);
