@@ -232,6 +232,14 @@ install_testkit() {
     diff - <(grep -oE '\<qel_testkit_[a-z_]+\(' "$SOURCE/testkit/qel-testkit.h" | tr -d '(' | sort -u)
 }
 
+@test "the test kit reads and writes nothing, starts no thread and looks at no clock" {
+  install_testkit qel-message-testkit
+  "$NM" -D --undefined-only "tree/$LIBDIR/libqel-message-testkit.so" | sed -E 's/^ *[Uw] //; s/@.*//' >taken
+  grep -qx memcpy taken
+  grep -vxE '_.*|mem[a-z]+|str[a-z]+|is[a-z]+|to(low|upp)er|malloc|free|abort' taken | none
+  grep -E '_(open|read|write|time|clock)|fstream|filebuf|4c(out|err)E|chrono|thread|mutex' taken | none
+}
+
 @test "log lines are collected by what is installed" {
   install_testkit qel-message-testlog
   cat >log.c <<'TXT'

@@ -325,6 +325,7 @@ static void fail(plugin_t* plugin, int step) {
 }
 
 static void give_up(plugin_t* plugin, int step) {
+  plugin->has_given_up = true;
   if (has_bug(plugin, BUG_SAME_ID_AGAIN)) {
     plugin->next_id = plugin->request_ids[step];
     settle(plugin, step);
@@ -508,6 +509,25 @@ static void type_too(plugin_t* plugin, const unsigned char* data, int size) {
   free(state);
 }
 
+/* Whether a reply lacks a field that it may lack. */
+static bool is_incomplete(const char* message, const unsigned char* data, int size) {
+  if (strcmp(message, "CreateChatroomReply") == 0) {
+    QEL_SCOPED(create_chatroom_reply, created);
+    return qel_create_chatroom_reply_read(&created, data, size) == QEL_OK &&
+           created.msgTtl == QEL_ABSENT;
+  }
+  if (strcmp(message, "AllowChatReply") == 0) {
+    QEL_SCOPED(allow_chat_reply, room);
+    return qel_allow_chat_reply_read(&room, data, size) == QEL_OK && room.memberCount == 0;
+  }
+  if (strcmp(message, "ChangeChatroomMetaReply") == 0) {
+    QEL_SCOPED(reply, reply);
+    return qel_change_chatroom_meta_reply_read(&reply, data, size) == QEL_OK &&
+           reply.chatroomId == 0;
+  }
+  return false;
+}
+
 /* In the answer's form, which is the same. */
 static void send_echo(plugin_t* plugin) {
   QEL_SCOPED(buffer, buffer);
@@ -538,6 +558,10 @@ void plugin_start(plugin_t* plugin) {
 }
 
 void plugin_receive(plugin_t* plugin, const char* message, const unsigned char* data, int size) {
+  if ((has_bug(plugin, BUG_DEAF_AFTER_GIVING_UP) && plugin->has_given_up) ||
+      (has_bug(plugin, BUG_WHOLE_REPLY_IS_REQUIRED) && is_incomplete(message, data, size))) {
+    return;
+  }
   make_mistake(plugin, message, data, size);
   if (strcmp(message, "ClientEcho") == 0) {
     take_echo(plugin, data, size);

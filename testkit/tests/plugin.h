@@ -33,6 +33,8 @@ typedef enum {
   BUG_BROKEN_IS_SUCCESS,
   BUG_REFUSED_USERS_ARE_FAILURE,
   BUG_TEXT_IS_REQUIRED,
+  BUG_WHOLE_REPLY_IS_REQUIRED,
+  BUG_DEAF_AFTER_GIVING_UP,
   BUG_ANY_LOGIN_FITS,
   BUG_ANY_CHATROOM_FITS,
   BUG_ANY_CHAT_REPLY_FITS,
@@ -102,6 +104,7 @@ typedef struct plugin {
   int timers[STEP_COUNT];          /* milliseconds until it is given up; 0: never */
   int64_t next_id;
   int pages;
+  bool has_given_up;
   int64_t chatroom;                /* the one that it created */
   qel_message_inboxentry_t pushed; /* the last, without its text */
 } plugin_t;
